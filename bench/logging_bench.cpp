@@ -1,0 +1,241 @@
+// What a log call costs, each case beside the least that the same result can cost. The figures to quote are ratios of
+// the two in one run.
+
+#include <benchmark/benchmark.h>
+#include <fcntl.h>
+#include <malloc.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <cstdio>
+#include <cstdlib>
+#include <ctime>
+#include <filesystem>
+#include <mutex>
+#include <new>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "common/uZqLogAppenders.h"
+#include "common/uZqLogLayouts.h"
+#include "common/uZqLogger.h"
+
+namespace {
+
+std::atomic<std::size_t> Allocations = 0;
+
+}  // namespace
+
+[[gnu::noinline]] void* operator new(std::size_t ASize) {
+  Allocations.fetch_add(1, std::memory_order_relaxed);
+  if (void* const Block = std::malloc(ASize)) return Block;
+  throw std::bad_alloc();
+}
+[[gnu::noinline]] void operator delete(void* ABlock) noexcept { std::free(ABlock); }
+[[gnu::noinline]] void operator delete(void* ABlock, std::size_t) noexcept { std::free(ABlock); }
+
+namespace {
+
+using namespace zq;
+
+constexpr char16_t cMessage[] = u"The quick brown fox jumps over the lazy dog and comes back 12";  // 60 characters
+constexpr char cLine[] =
+    "2021-12-23 10:53:18:123 - Info root - The quick brown fox jumps over the lazy dog and comes back 12\r\n";
+
+/// A new folder of its own on the disk that the temporary folder is on.
+struct TFolder {
+  TFolder() : Path((std::filesystem::temp_directory_path() / "zqbench.XXXXXX").string()) {
+    if (::mkdtemp(Path.data()) == nullptr) std::abort();
+  }
+  ~TFolder() { std::filesystem::remove_all(Path); }
+  std::string Path;
+};
+
+/// root.bench.line, whose messages reach one rolling appender on the root logger.
+struct TLogging {
+  explicit TLogging(Cardinal AMaxSize = 0, Word ABackups = 5) {
+    const auto Appender = Logger()->GetAppenders()->Add(
+        TZqLogBaseClass::Of<TZqRollingFileAppender>(), TZqLogBaseClass::Of<TZqSimpleLayout>());
+    const auto File = Appender.As<IZqRollingFileAppender>();
+    File->SetFileName(FromUTF8(Folder.Path + "/app.log"));
+    File->SetMaxFileSize(AMaxSize);
+    File->SetMaxBackupCount(ABackups);
+    Log = Logger()->GetLogger(u"bench.line");
+  }
+  ~TLogging() { Logger()->ClearAppenders(); }
+  TFolder Folder;
+  IntfRef<IZqLogger> Log;
+};
+
+struct TPlainFile {
+  TPlainFile() : Handle(::open((Folder.Path + "/app.log").c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666)) {}
+  ~TPlainFile() { ::close(Handle); }
+  void Put(const char* AText, std::size_t ALength) const {
+    if (::write(Handle, AText, ALength) != static_cast<ssize_t>(ALength)) std::abort();
+  }
+  TFolder Folder;
+  int Handle;
+};
+
+// One log call that writes, against the same bytes, preformatted, through one write(2).
+void LineByOneWrite(benchmark::State& AState) {
+  const TPlainFile File;
+  for (auto _ : AState) File.Put(cLine, sizeof cLine - 1);
+}
+void LineByLogger(benchmark::State& AState) {
+  const TLogging Logging;
+  const UnicodeString Message = cMessage;
+  Logging.Log->Info(Message);
+  const std::size_t Before = Allocations;
+  for (auto _ : AState) Logging.Log->Info(Message);
+  AState.counters["allocations"] = static_cast<double>(Allocations - Before) / static_cast<double>(AState.iterations());
+}
+BENCHMARK(LineByOneWrite)->Iterations(300000)->Repetitions(5)->ReportAggregatesOnly();
+BENCHMARK(LineByLogger)->Iterations(300000)->Repetitions(5)->ReportAggregatesOnly();
+
+// A call below the level, chain of three loggers, against two uncontended pairs of std::recursive_mutex.
+void TwoRecursiveMutexPairs(benchmark::State& AState) {
+  std::recursive_mutex A;
+  std::recursive_mutex B;
+  for (auto _ : AState) {
+    A.lock();
+    benchmark::ClobberMemory();
+    A.unlock();
+    B.lock();
+    benchmark::ClobberMemory();
+    B.unlock();
+  }
+}
+void CallBelowTheLevel(benchmark::State& AState) {
+  const TLogging Logging;
+  Logger()->SetLevel(llError);
+  const UnicodeString Message = cMessage;
+  const std::size_t Before = Allocations;
+  for (auto _ : AState) Logging.Log->Info(Message);
+  AState.counters["allocations"] = static_cast<double>(Allocations - Before) / static_cast<double>(AState.iterations());
+  Logger()->SetLevel(llDebug);
+}
+BENCHMARK(TwoRecursiveMutexPairs)->Repetitions(5)->ReportAggregatesOnly();
+BENCHMARK(CallBelowTheLevel)->Repetitions(5)->ReportAggregatesOnly();
+
+// Threads on one appender, against the same bytes written under one std::mutex. Items are lines in all.
+template <class TCall>
+void OnThreads(benchmark::State& AState, TCall ACall) {
+  constexpr std::size_t cLines = 100000;
+  const auto Threads = static_cast<std::size_t>(AState.range(0));
+  for (auto _ : AState) {
+    std::vector<std::thread> Running;
+    for (std::size_t t = 0; t < Threads; ++t)
+      Running.emplace_back([&] {
+        for (std::size_t i = 0; i < cLines; ++i) ACall();
+      });
+    for (std::thread& Thread : Running) Thread.join();
+  }
+  AState.SetItemsProcessed(static_cast<std::int64_t>(static_cast<std::size_t>(AState.iterations()) * Threads * cLines));
+}
+void ThreadsUnderOneMutex(benchmark::State& AState) {
+  const TPlainFile File;
+  std::mutex Mutex;
+  OnThreads(AState, [&] {
+    const std::lock_guard Guard(Mutex);
+    File.Put(cLine, sizeof cLine - 1);
+  });
+}
+void ThreadsOnOneAppender(benchmark::State& AState) {
+  const TLogging Logging;
+  const UnicodeString Message = cMessage;
+  OnThreads(AState, [&] { Logging.Log->Info(Message); });
+}
+BENCHMARK(ThreadsUnderOneMutex)->Arg(2)->Arg(4)->UseRealTime()->Iterations(2)->Repetitions(5)->ReportAggregatesOnly();
+BENCHMARK(ThreadsOnOneAppender)->Arg(2)->Arg(4)->UseRealTime()->Iterations(2)->Repetitions(5)->ReportAggregatesOnly();
+
+// 200,000 lines that roll at 1 MiB with 5 backups, against a loop that formats, writes and rolls the same way by hand.
+constexpr std::size_t cRollLines = 200000;
+constexpr std::size_t cRollSize = 1 << 20;
+
+class THandRoller {
+ public:
+  explicit THandRoller(const std::string& AFolder) : FBase(AFolder + "/app") { Open(); }
+  ~THandRoller() { End(); }
+  void Line(const char* AText) {
+    if (FSize >= cRollSize) Roll();
+    char Buffer[512];
+    timespec Time{};
+    ::clock_gettime(CLOCK_REALTIME, &Time);
+    tm Local{};
+    ::localtime_r(&Time.tv_sec, &Local);
+    Put(Buffer, std::snprintf(Buffer, sizeof Buffer, "%04d-%02d-%02d %02d:%02d:%02d:%03ld - Info root - %s\r\n",
+                    Local.tm_year + 1900, Local.tm_mon + 1, Local.tm_mday, Local.tm_hour, Local.tm_min, Local.tm_sec,
+                    Time.tv_nsec / 1000000, AText));
+  }
+
+ private:
+  void Put(const char* AText, int ALength) {
+    if (::write(FHandle, AText, static_cast<std::size_t>(ALength)) != ALength) std::abort();
+    FSize += static_cast<std::size_t>(ALength);
+  }
+  void Mark(const char* AText, const char* AEnd) {
+    char Buffer[128];
+    const std::time_t Time = std::time(nullptr);
+    tm Local{};
+    ::localtime_r(&Time, &Local);
+    Put(Buffer, std::snprintf(Buffer, sizeof Buffer, "%s%04d-%02d-%02d %02d:%02d:%02d%s", AText, Local.tm_year + 1900,
+                    Local.tm_mon + 1, Local.tm_mday, Local.tm_hour, Local.tm_min, Local.tm_sec, AEnd));
+  }
+  void Open() {
+    FHandle = ::open((FBase + ".log").c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0666);
+    FSize = 0;
+    Mark("Log started on : ", "\r\n");
+  }
+  void End() {
+    Mark("Log stopped on : ", "");
+    ::close(FHandle);
+  }
+  void Roll() {
+    End();
+    const auto Name = [&](int i) { return i == 0 ? FBase + ".log" : FBase + "." + std::to_string(i) + ".log"; };
+    std::error_code Ignored;
+    std::filesystem::remove(Name(4), Ignored);
+    for (int i = 4; i-- > 0;) std::filesystem::rename(Name(i), Name(i + 1), Ignored);
+    Open();
+  }
+
+  std::string FBase;
+  int FHandle = -1;
+  std::size_t FSize = 0;
+};
+
+void RollByHand(benchmark::State& AState) {
+  for (auto _ : AState) {
+    const TFolder Folder;
+    THandRoller Roller(Folder.Path);
+    for (std::size_t i = 0; i < cRollLines; ++i)
+      Roller.Line("The quick brown fox jumps over the lazy dog and comes back 12");
+  }
+}
+void RollByAppender(benchmark::State& AState) {
+  const UnicodeString Message = cMessage;
+  for (auto _ : AState) {
+    const TLogging Logging(cRollSize, 5);
+    for (std::size_t i = 0; i < cRollLines; ++i) Logging.Log->Info(Message);
+  }
+}
+BENCHMARK(RollByHand)->Unit(benchmark::kMillisecond)->Iterations(1)->Repetitions(5)->ReportAggregatesOnly();
+BENCHMARK(RollByAppender)->Unit(benchmark::kMillisecond)->Iterations(1)->Repetitions(5)->ReportAggregatesOnly();
+
+// Heap in use after 10,000 and after 1,000,000 lines: the two counters are to be equal.
+void HeapOfManyLines(benchmark::State& AState) {
+  const UnicodeString Message = cMessage;
+  const TLogging Logging(cRollSize, 5);
+  for (auto _ : AState) {
+    for (std::size_t i = 0; i < 10000; ++i) Logging.Log->Info(Message);
+    const std::size_t Early = ::mallinfo2().uordblks;
+    for (std::size_t i = 10000; i < 1000000; ++i) Logging.Log->Info(Message);
+    AState.counters["heap10k"] = static_cast<double>(Early);
+    AState.counters["heap1M"] = static_cast<double>(::mallinfo2().uordblks);
+  }
+}
+BENCHMARK(HeapOfManyLines)->Unit(benchmark::kMillisecond)->Iterations(1);
+
+}  // namespace

@@ -1,0 +1,207 @@
+#include "common/uZqClasses.h"
+
+namespace zq {
+
+using namespace uZqClasses;
+
+// ---- Counted objects
+// -------------------------------------------------------------------------------------------------
+
+Integer TZqRefCount::Up(bool AClaim) noexcept {
+  const Integer Result = FCount.fetch_add(1, std::memory_order_relaxed) + 1;
+  TZqAutoDestroy Undecided = radComputed;
+  if (AClaim && State() == Undecided) FState.compare_exchange_strong(Undecided, radTrue, std::memory_order_relaxed);
+  return Result;
+}
+
+HRESULT TZqObject::QueryInterface(const TGUID& AIID, void** AObj) {
+  return GetInterface(AIID, AObj) ? S_OK : E_NOINTERFACE;
+}
+
+Integer TZqObject::_AddRef() { return FCount.Up(true); }
+
+Integer TZqObject::_Release() {
+  // Asked before the count goes down: an owner may free the object as soon as it is 0.
+  const bool Ends = FCount.State() == radTrue && !FDestroying.load(std::memory_order_acquire);
+  const Integer Result = FCount.Down();
+  if (Result == 0 && Ends) Free();
+  return Result;
+}
+
+void TZqObject::AfterConstruction() {
+  Implements::AfterConstruction();
+  FCount.Down();
+}
+
+void TZqObject::BeforeDestruction() {
+  FDestroying.store(true, std::memory_order_release);
+  if (RefCount() != 0) throw Exception(_SObjRefCountNotZero, {ClassName()});
+  Implements::BeforeDestruction();
+}
+
+// ---- Linked objects
+// --------------------------------------------------------------------------------------------------
+
+TZqObjectEx::~TZqObjectEx() {  // finds partners only where the construction failed or a destructor made new ones
+  try {
+    TellPartners();
+  } catch (...) {  // a destructor has nobody to tell
+  }
+}
+
+void TZqObjectEx::BeforeDestruction() {
+  Implements::BeforeDestruction();
+  TellPartners();
+}
+
+bool TZqObjectEx::AddPartner(TObject* AObject) {
+  if (FFreeNotifies == nullptr) FFreeNotifies = std::make_unique<TListOf<TObject*>>();
+  if (FFreeNotifies->IndexOf(AObject) >= 0) return false;
+  FFreeNotifies->Add(AObject);
+  return true;
+}
+
+void TZqObjectEx::FreeNotification(TZqObjectEx* AObject) {
+  if (AddPartner(AObject)) AObject->FreeNotification(this);
+}
+
+void TZqObjectEx::FreeNotificationEx(const IntfRef<IZqObjectFreeNotificationEvent>& AObject) {
+  TObject* const Partner = AObject->Implementor();
+  if (auto* const Linked = dynamic_cast<TZqObjectEx*>(Partner)) return FreeNotification(Linked);
+  if (!AddPartner(Partner)) return;
+  const TNeutral Kept(this);
+  if (const auto Other = AObject.Supports<IZqObjectEx>()) Other->FreeNotificationEx(this);
+}
+
+void TZqObjectEx::RemoveNotification(const TObject* AObject) {
+  if (FFreeNotifies == nullptr) return;
+  const Integer Last = FFreeNotifies->Count() - 1;
+  if (FFreeNotifies->Last() == AObject) FFreeNotifies->Delete(Last);
+  else FFreeNotifies->Remove(const_cast<TObject*>(AObject));
+  if (FFreeNotifies->Count() == 0) FFreeNotifies.reset();
+}
+
+void TZqObjectEx::RemoveFreeNotification(TZqObjectEx* AObject) {
+  RemoveNotification(AObject);
+  AObject->RemoveNotification(this);
+}
+
+void TZqObjectEx::RemoveFreeNotificationEx(const IntfRef<IZqObject>& AObject) {
+  RemoveNotification(AObject->Implementor());
+  if (const auto Other = AObject.Supports<IZqObjectEx>()) Other->RemoveNotification(this);
+}
+
+void TZqObjectEx::TellPartner(TObject* AObject) {
+  const TNeutral Kept(dynamic_cast<TZqObject*>(AObject));
+  const auto Event = Supports<IZqObjectFreeNotificationEvent>(AObject);
+  Assert(static_cast<bool>(Event));
+  Event->OnObjectDestroyed(this);
+  RemoveFreeNotificationEx(Event);
+  RemoveNotification(AObject);  // an entry that isn't its own implementor
+}
+
+void TZqObjectEx::TellPartners() {
+  while (FFreeNotifies != nullptr) TellPartner(FFreeNotifies->Last());
+}
+
+void TZqObjectEx::Assign(TZqObjectEx* ASource) {
+  if (ASource == nullptr) AssignError(nullptr);
+  ASource->AssignTo(this);
+}
+
+void TZqObjectEx::AssignTo(TZqObjectEx* ADest) { ADest->AssignError(this); }
+
+void TZqObjectEx::AssignError(const TZqObjectEx* ASource) const {
+  throw EConvertError(SAssignError, {ASource == nullptr ? UnicodeString(u"nil") : ASource->ClassName(), ClassName()});
+}
+
+UnicodeString TZqObjectEx::GetNamePath() {
+  TZqObjectEx* const Owner = GetOwner();
+  const UnicodeString Path = Owner == nullptr ? UnicodeString() : Owner->GetNamePath();
+  return Path.IsEmpty() ? ClassName() : Path + u"." + ClassName();
+}
+
+void TZqFreeNotifies::Add(TZqFreeNotifies* AFreeNotifies) {
+  if (FList.Locked()->IndexOf(AFreeNotifies) >= 0) return;
+  FList.Add(AFreeNotifies);
+  AFreeNotifies->Add(this);
+}
+
+void TZqFreeNotifies::Remove(TZqFreeNotifies* AFreeNotifies) { FList.Remove(AFreeNotifies); }
+
+void TZqFreeNotifies::BeforeDestruction() {
+  const auto List = FList.Locked();
+  while (List->Count() > 0) {
+    TZqFreeNotifies* const Partner = List->Last();
+    Partner->Remove(this);
+    Partner->FOnObjectDestroyedProc(FOwner);
+    List->Remove(Partner);
+  }
+  TObject::BeforeDestruction();
+}
+
+void TZqObjectAdapter::BeforeDestruction() {
+  Implements::BeforeDestruction();
+  if (FOwnership == ooOwned) zq::Free(FObject);
+  FObject = nullptr;
+}
+
+// ---- Components
+// ------------------------------------------------------------------------------------------------------
+
+TZqComponent::~TZqComponent() { ClearBindings(); }
+
+Integer TZqComponent::_AddRef() { return FCount.Up(Owner() == nullptr); }
+
+Integer TZqComponent::_Release() {
+  const bool Ends = FCount.State() == radTrue;  // asked first, as in TZqObject
+  const Integer Result = FCount.Down();
+  if (Result == 0 && Ends && !ComponentState().Contains(csDestroying)) Free();
+  return Result;
+}
+
+void TZqComponent::AfterConstruction() {
+  Implements::AfterConstruction();
+  FCount.Down();
+}
+
+void TZqComponent::BeforeDestruction() {
+  if (RefCount() != 0) throw Exception(_SCompRefCountNotZero, {ClassName(), Name()});
+  Implements::BeforeDestruction();
+  ClearBindings();  // while the getters and setters of the final class still work
+}
+
+void TZqComponent::BindOneWay(TObject* ASource, const UnicodeString& ASourceProperty, TObject* ADest,
+    const UnicodeString& ADestProperty, const TCreateOptions& ACreateOptions) {
+  FBindings.Add(TBindings::CreateManagedBinding({TBindings::CreateAssociationScope({Associate(ASource, u"src")})},
+      u"src." + ASourceProperty, {TBindings::CreateAssociationScope({Associate(ADest, u"dst")})},
+      u"dst." + ADestProperty, nullptr, nullptr, ACreateOptions));
+}
+
+void TZqComponent::Bind(const UnicodeString& AProperty, TObject* ABindToObj, const UnicodeString& ABindToProperty,
+    const TCreateOptions& ACreateOptions) {
+  BindOneWay(this, AProperty, ABindToObj, ABindToProperty, ACreateOptions);
+  BindOneWay(ABindToObj, ABindToProperty, this, AProperty, ACreateOptions);
+}
+
+void TZqComponent::Bind(const UnicodeString& AProperty, TComponent* ABindToCtrl, const TCreateOptions& ACreateOptions) {
+  Assert(ABindToCtrl->GetObservers().CanObserve(TObservers::ControlValueID));
+  auto* const Link = New<TLinkControlToProperty>(this);
+  Link->SetControlComponent(ABindToCtrl);
+  Link->SetTrack(true);
+  Link->SetSourceComponent(this);
+  Link->SetComponentProperty(AProperty);
+  Link->SetActive(true);
+  BindOneWay(this, AProperty, ABindToCtrl, Link->ControlMember(), ACreateOptions);
+}
+
+void TZqComponent::ClearBindings() {
+  for (TBindingExpression* const Expression : FBindings) TBindings::RemoveBinding(Expression, nullptr);
+  FBindings.Clear();
+}
+
+void TZqComponent::NotifyBindings(const UnicodeString& APropertyName) {
+  TBindings::Notify(this, APropertyName, nullptr);
+}
+
+}  // namespace zq

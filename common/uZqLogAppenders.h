@@ -1,0 +1,206 @@
+#pragma once
+
+#include <memory>
+
+#include "common/uZqLogger.h"
+#include "runtime/io/files.h"
+#include "runtime/io/text_file.h"
+
+namespace zq {
+
+/// State machine under all appenders: opened by the first Write, closed by Close, opened again by the next Write.
+///
+/// Without a layout an appender takes every message and writes nothing. Lock and Unlock keep its operations apart, also
+/// when several loggers share it. Its end closes it; an appender that can't write its last bytes goes all the same.
+class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZqLogAppenderEx> {
+ public:
+  using Implements::Implements;
+  [[nodiscard]] IntfRef<IZqLogLayout> Layout() const { return FLayout; }
+
+  virtual void Initialize();
+  /// Reads the appender's settings under its name.
+  virtual void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig);
+  /// Initialises the appender if need be; a descendant calls it first and then writes.
+  void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
+  void Close() override;
+  void SetLayout(const IntfRef<IZqLogLayout>& ALayout) override;
+  void SetLayout(TZqLogBaseClass ALayout) override;
+  void SetLayout(const ShortString& ALayout) override;
+
+  void Lock() const noexcept { FLock.Enter(); }
+  void Unlock() const noexcept { FLock.Leave(); }
+
+ protected:
+  ~TZqBaseAppender() override = default;
+  void AfterConstruction() override;
+  void BeforeDestruction() override;
+
+  // For descendants: Initialize runs in this scope, and who rolls a file sees it and doesn't start another one.
+  class TInitializing {
+   public:
+    explicit TInitializing(TZqBaseAppender& AAppender) noexcept : FAppender(AAppender) { ++FAppender.FInitializing; }
+    TInitializing(const TInitializing&) = delete;
+    TInitializing& operator=(const TInitializing&) = delete;
+    ~TInitializing() { --FAppender.FInitializing; }
+
+   private:
+    TZqBaseAppender& FAppender;
+  };
+  using TScope = TLockScope<TCriticalSection>;
+
+  IntfRef<IZqLogLayout> FLayout;
+  bool FInitialized = false;
+  Integer FInitializing = 0;
+  mutable TCriticalSection FLock;
+};
+
+/// Writer of UTF-8 text lines that counts its bytes. Each call is one system call, so what returned is in the file, and
+/// a killed process loses none of it. Any thread may write.
+///
+/// A failed step raises EInOutError.
+class ZQ_API TZqTextFile : public TObject {
+ public:
+  /// Makes missing folders; appends to an existing file.
+  explicit TZqTextFile(const TFileName& AFileName);
+  /// Closes; a failure there goes unseen. Close shows it.
+  ~TZqTextFile() override;
+
+  /// Bytes in the file by this writer's count.
+  [[nodiscard]] Cardinal Size() const;
+  void Write(const UnicodeString& AValue);
+  /// With CR LF behind it.
+  void WriteLn(const UnicodeString& AValue);
+  void Close();
+
+ private:
+  TTextFile FFile;
+  Int64 FSizeAtOpen = 0;
+  mutable TCriticalSection FCritSect;
+};
+
+struct ZQ_API IZqFileAppender : Extends<IZqLogAppender> {
+  static constexpr TGUID IID = "{36A4304E-7A72-4C9C-A6B8-AE1B4B533E9E}"_guid;
+  virtual TFileName GetFileName() const = 0;
+  virtual bool GetAppendExisting() const = 0;
+  virtual UnicodeString GetFileExt() const = 0;
+  /// Closes the present file. A name without extension gets FileExt, one with an extension changes it. With an empty
+  /// name nothing is written.
+  virtual void SetFileName(const TFileName& AValue) = 0;
+  /// False: an existing file is not continued when it is opened.
+  virtual void SetAppendExisting(bool AValue) = 0;
+  /// Closes the present file and changes the extension of its name. The dot may be left out.
+  virtual void SetFileExt(const UnicodeString& AValue) = 0;
+
+ protected:
+  ~IZqFileAppender() = default;
+};
+
+/// Writes each message as a line into a UTF-8 text file, between a header and a footer.
+///
+/// By default the file is named after the host program and lies in a folder of that name below the common documents.
+class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppender> {
+ public:
+  TZqFileAppender(TZqLogger* ALogger, const UnicodeString& AName);
+
+  void Initialize() override;
+  void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) override;
+  void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
+  /// Raises EInOutError when the footer can't be written; the file is closed all the same.
+  void Close() override;
+  using TZqBaseAppender::SetLayout;
+  /// Closes the present file; a layout that has an extension of its own changes the file's.
+  void SetLayout(const IntfRef<IZqLogLayout>& ALayout) override;
+
+  TFileName GetFileName() const override;
+  bool GetAppendExisting() const override;
+  UnicodeString GetFileExt() const override;
+  void SetFileExt(const UnicodeString& AValue) override;
+  void SetAppendExisting(bool AValue) override;
+  void SetFileName(const TFileName& AValue) override;
+
+ protected:
+  ~TZqFileAppender() override = default;
+  // Writes the footer and closes the file, also when the footer fails, which raises then.
+  void EndFile();
+
+  TFileName FFileName;
+  std::unique_ptr<TZqTextFile> FFileStream;
+  bool FAppendExisting = true;
+  UnicodeString FFileExt = u".log";
+};
+
+struct ZQ_API IZqRollingFileAppender : Extends<IZqFileAppender> {
+  static constexpr TGUID IID = IZqFileAppender::IID;
+  /// Bytes. 0: no limit.
+  virtual Cardinal GetMaxFileSize() const = 0;
+  /// Files of the series, the log file among them. 0: nothing is written.
+  virtual Word GetMaxBackupCount() const = 0;
+  virtual void SetMaxFileSize(Cardinal AValue) = 0;
+  /// Deletes what the series has beyond it at once; 0 deletes the log file too.
+  virtual void SetMaxBackupCount(Word AValue) = 0;
+  /// Ends the file, renumbers the series and begins a new file.
+  virtual void RollOver() = 0;
+
+ protected:
+  ~IZqRollingFileAppender() = default;
+};
+
+/// The parts of one file name of a series.
+class ZQ_API TZqFileInfo : public TObject {
+ public:
+  TZqFileInfo() = default;
+  ~TZqFileInfo() override = default;
+  UnicodeString FileNameLeft;   ///< name of the log file without folder and last extension
+  Integer Index = 0;            ///< number in the name; 0 for none
+  UnicodeString FileNameRight;  ///< what stands between the number and the last extension
+};
+
+/// Keeps the log file below a size: a file at the limit becomes "app.1.log", the backups before it move one up, and the
+/// series never has more than MaxBackupCount files. Other files beside it are left alone.
+///
+/// The roll takes place in the call that found the file too large; other threads that log wait for it.
+class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRollingFileAppender> {
+ public:
+  using Implements::Implements;
+
+  /// A file that must not be continued is kept as a backup.
+  void Initialize() override;
+  void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) override;
+  void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
+  /// Takes a name from the folder apart, without path. The caller owns the result.
+  [[nodiscard]] virtual std::unique_ptr<TZqFileInfo> CreateFileInfo(const UnicodeString& AFileName);
+  Cardinal GetMaxFileSize() const override;
+  Word GetMaxBackupCount() const override;
+  void SetMaxFileSize(Cardinal AValue) override;
+  void SetMaxBackupCount(Word AValue) override;
+  virtual void CheckBackupCount();
+  virtual void CheckRollover();
+  void RollOver() override;
+
+ protected:
+  ~TZqRollingFileAppender() override = default;
+  // Whether a name from the folder is the log file or one of its backups: those alone are renamed and deleted.
+  [[nodiscard]] virtual bool IsOfSeries(const UnicodeString& AFileName) const;
+
+  Cardinal FMaxFileSize = 10485760;
+  Word FMaxBackupCount = 5;
+
+ private:
+  struct TEntry {
+    UnicodeString Name;
+    std::unique_ptr<TZqFileInfo> Info;
+  };
+  std::vector<TEntry> ScanSeries();
+  void Renumber(const TEntry& AEntry, std::size_t APosition);
+  [[nodiscard]] UnicodeString Folder() const;
+  [[nodiscard]] UnicodeString Base() const;
+};
+
+namespace uZqLogAppenders {
+void Start();
+}  // namespace uZqLogAppenders
+
+}  // namespace zq

@@ -1,0 +1,687 @@
+#include "common/uZqLogger.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "common/uZqLogAppenders.h"
+#include "common/uZqWindows.h"
+#include "runtime/containers/string_list.h"
+#include "runtime/core/typeinfo.h"
+#include "runtime/platform/clock.h"
+#include "runtime/platform/version_service.h"
+#include "runtime/text/datetime.h"
+#include "runtime/text/format.h"
+#include "runtime/text/numbers.h"
+
+namespace zq {
+
+namespace {
+
+constexpr Cardinal cLockTries = 5001;  // one millisecond each
+constexpr Integer cMaxNesting = 32;    // an appender that logs into its own logger is cut off here
+constexpr char16_t cAppenderListRequest[] = u".AppenderList.Remove";
+constexpr char16_t cLoggerListRequest[] = u".LoggerList.Remove";
+
+std::atomic<TZqLogger*> RootLogger = nullptr;
+constinit std::mutex RootLock;
+std::atomic<TZqLogBaseClassList*> LayoutClasses = nullptr;
+std::atomic<TZqLogBaseClassList*> AppenderClasses = nullptr;
+std::vector<TZqLogBase*>* Appenders = nullptr;  // every appender alive
+constinit std::mutex AppendersLock;
+constinit TCriticalSection EndLock;  // held while an appender or a list ends: linked components must not at one time
+
+// Holds a log lock for a scope, for a requester that is a name and an operation.
+class TLogLockScope {
+ public:
+  TLogLockScope(TZqLogLock& ALock, const UnicodeString& AOwner, const char16_t* AOperation) : FLock(ALock) {
+    FLock.Enter(AOwner, AOperation, true);
+  }
+  TLogLockScope(const TLogLockScope&) = delete;
+  TLogLockScope& operator=(const TLogLockScope&) = delete;
+  ~TLogLockScope() { FLock.Leave(); }
+
+ private:
+  TZqLogLock& FLock;
+};
+
+TZqDataRec VariantRec(const Variant& AValue) {
+  TZqDataRec Result;
+  Result.DataType = rtkVariant;
+  Result.VVariant = &AValue;
+  return Result;
+}
+
+TZqDataRec ObjectRec(const TObject* AValue) {
+  TZqDataRec Result;
+  Result.DataType = rtkObject;
+  Result.VObject = AValue;
+  return Result;
+}
+
+TZqDataRec ExceptionRec(const Exception& AValue) {
+  TZqDataRec Result;
+  Result.DataType = rtkException;
+  Result.VException = &AValue;
+  return Result;
+}
+
+UnicodeString MethodOf(const TObject* AObject, const UnicodeString& AMethodName) {
+  return AObject->ClassName() + u"." + AMethodName;
+}
+
+}  // namespace
+
+// ---------------------------------------------------------------------------------------- TZqLogLock
+
+bool TZqLogLock::Take(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise) {
+  if (FLock.TryEnterFor(cLockTries)) return true;
+  if (ARaise)
+    throw Exception(u"A lock was requested by %s (ThreadId: %d), however  logger has already been locked by %s!",
+        {AOwner + AOperation, GetCurrentThreadId(), LockedBy()});
+  return false;
+}
+
+bool TZqLogLock::Enter(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise) {
+  if (!Take(AOwner, AOperation, ARaise)) return false;
+  FOwner.store(&AOwner, std::memory_order_relaxed);
+  FOperation.store(AOperation, std::memory_order_relaxed);
+  FThread.store(GetCurrentThreadId(), std::memory_order_relaxed);
+  return true;
+}
+
+bool TZqLogLock::Enter(const UnicodeString& ALockRequestedBy, bool ARaise) {
+  if (!Take(ALockRequestedBy, u"", ARaise)) return false;
+  const std::lock_guard Guard(FTextLock);
+  FText = ALockRequestedBy;
+  FOwner.store(nullptr, std::memory_order_relaxed);
+  FThread.store(GetCurrentThreadId(), std::memory_order_relaxed);
+  return true;
+}
+
+UnicodeString TZqLogLock::LockedBy() const {
+  const std::lock_guard Guard(FTextLock);
+  const UnicodeString* const Owner = FOwner.load(std::memory_order_relaxed);
+  const UnicodeString Requester = Owner == nullptr ? FText : *Owner + FOperation.load(std::memory_order_relaxed);
+  return Format(u"%s (ThreadId: %d)", {Requester, FThread.load(std::memory_order_relaxed)});
+}
+
+// ---------------------------------------------------------------------------------------- TZqLoggerList
+
+TZqLoggerList::~TZqLoggerList() {
+  try {
+    Assert(FList.empty());
+  } catch (const Exception&) {  // a destructor has nobody to tell
+  }
+}
+
+void TZqLoggerList::AddLogger(TZqLogger* ALogger) {
+  const TLogLockScope Scope(FLock, FLogger->FFullName, cLoggerListRequest);
+  FList.push_back(ALogger);
+}
+
+void TZqLoggerList::RemoveLogger(TZqLogger* ALogger) {
+  const TLogLockScope Scope(FLock, FLogger->FFullName, cLoggerListRequest);
+  std::erase(FList, ALogger);
+}
+
+IntfRef<IZqLogger> TZqLoggerList::GetLogger(Integer AIndex) const {
+  if (AIndex < 0 || AIndex >= Count()) throw EListError(u"List index out of bounds (%d)", {AIndex});
+  return FList[static_cast<std::size_t>(AIndex)];
+}
+
+TZqLogger* TZqLoggerList::FindLogger(const UnicodeString& AName) {
+  const TLogLockScope Scope(FLock, FLogger->FFullName, cLoggerListRequest);
+  const auto Found =
+      std::find_if(FList.rbegin(), FList.rend(), [&](const TZqLogger* AChild) { return AChild->FName == AName; });
+  return Found == FList.rend() ? nullptr : *Found;
+}
+
+// ---------------------------------------------------------------------------------------- TZqLogAppenderList
+
+TZqLogAppenderList::TZqLogAppenderList(TZqLogger* ALogger) : TComponent(nullptr), FLogger(ALogger) {}
+
+void TZqLogAppenderList::BeforeDestruction() {
+  TakeItems([](const auto&) { return true; });  // an appender that ends here writes its footer: with no lock held
+  const TLockScope Ending(EndLock);
+  TComponent::BeforeDestruction();
+}
+
+void TZqLogAppenderList::Add(const IntfRef<IZqLogAppender>& AAppender) {
+  Assert(static_cast<bool>(AAppender));
+  const TLogLockScope Scope(FLock, FLogger->FFullName, cAppenderListRequest);
+  {
+    const TLockScope Guard(FItemsLock);
+    TComponent* const Added = AAppender->Component();
+    for (const auto& Item : FList)
+      if (Item == AAppender || (Added != nullptr && Item->Component() == Added)) return;
+    FList.push_back(AAppender);
+    FCount = static_cast<Integer>(FList.size());
+  }
+  if (TComponent* const Component = AAppender->Component()) Component->FreeNotification(this);
+}
+
+IntfRef<IZqLogAppender> TZqLogAppenderList::Add(TZqLogBaseClass AAppender) {
+  const IntfRef<IZqLogBase> Made(AAppender.Create(FLogger, AAppender.ClassName()));
+  IntfRef<IZqLogAppender> Result = Made.As<IZqLogAppender>();
+  Add(Result);
+  return Result;
+}
+
+IntfRef<IZqLogAppender> TZqLogAppenderList::Add(const ShortString& AAppender) {
+  return Add(RegisteredAppenders()->GetClass(AAppender));
+}
+
+IntfRef<IZqLogAppender> TZqLogAppenderList::Add(TZqLogBaseClass AAppender, TZqLogBaseClass ALayout) {
+  IntfRef<IZqLogAppender> Result = Add(AAppender);
+  Result.As<IZqLogAppenderEx>()->SetLayout(ALayout);
+  return Result;
+}
+
+IntfRef<IZqLogAppender> TZqLogAppenderList::Add(const ShortString& AAppender, const ShortString& ALayout) {
+  IntfRef<IZqLogAppender> Result = Add(AAppender);
+  Result.As<IZqLogAppenderEx>()->SetLayout(ALayout);
+  return Result;
+}
+
+// The entries leave the list under its short lock and are dropped by the caller outside of it: dropping may end an
+// appender, which runs host code.
+template <class TLeaves>
+TZqLogAppenderList::TItems TZqLogAppenderList::TakeItems(TLeaves ALeaves) {
+  const TLockScope Guard(FItemsLock);
+  const auto Kept =
+      std::stable_partition(FList.begin(), FList.end(), [&](const auto& AItem) { return !ALeaves(AItem); });
+  TItems Result(std::make_move_iterator(Kept), std::make_move_iterator(FList.end()));
+  FList.erase(Kept, FList.end());
+  FCount = static_cast<Integer>(FList.size());
+  return Result;
+}
+
+void TZqLogAppenderList::Remove(const IntfRef<IZqLogAppender>& AAppender) {
+  TItems Dropped;
+  const TLogLockScope Scope(FLock, FLogger->FFullName, cAppenderListRequest);
+  TComponent* const Component = AAppender->Component();
+  Dropped = TakeItems([&](const auto& AItem) {
+    return AItem == AAppender || (Component != nullptr && AItem->Component() == Component);
+  });
+  if (Component != nullptr) Component->RemoveFreeNotification(this);
+}
+
+void TZqLogAppenderList::Clear() {
+  TItems Dropped;
+  const TLogLockScope Scope(FLock, FLogger->FFullName, cAppenderListRequest);
+  Dropped = TakeItems([](const auto&) { return true; });
+}
+
+IntfRef<IZqLogAppender> TZqLogAppenderList::ItemOrNone(std::size_t AIndex) const {
+  const TLockScope Guard(FItemsLock);
+  return AIndex < FList.size() ? FList[AIndex] : nullptr;
+}
+
+IntfRef<IZqLogAppender> TZqLogAppenderList::GetAppender(Integer AIndex) const {
+  IntfRef<IZqLogAppender> Result = AIndex < 0 ? nullptr : ItemOrNone(static_cast<std::size_t>(AIndex));
+  if (!Result) throw EListError(u"List index out of bounds (%d)", {AIndex});
+  return Result;
+}
+
+void TZqLogAppenderList::Notification(TComponent* AComponent, TOperation AOperation) {
+  TComponent::Notification(AComponent, AOperation);
+  if (AOperation == opRemove && AComponent != this)
+    TakeItems([&](const auto& AItem) { return AItem->Component() == AComponent; });
+}
+
+// ---------------------------------------------------------------------------------------- TZqLogger
+
+TZqLogger::TZqLogger(TZqLogger* AParentLogger, UnicodeString AName)
+    : FName(std::move(AName)),
+      FFullName(AParentLogger == nullptr ? FName : AParentLogger->FFullName + u"." + FName),
+      FParent(AParentLogger),
+      FParentLogger(AParentLogger),
+      FAppenders(New<TZqLogAppenderList>(this)),
+      FChildLoggers(this) {}
+
+void TZqLogger::AfterConstruction() {
+  TObject::AfterConstruction();
+  const TLogLockScope Scope(FLock, FFullName, u".AfterConstruction");
+  if (TZqLogger* const Above = FParent) Above->FChildLoggers.AddLogger(this);
+}
+
+void TZqLogger::BeforeDestruction() {
+  {
+    const TLogLockScope Scope(FLock, FFullName, u".BeforeDestruction");
+    if (TZqLogger* const Above = FParent) Above->FChildLoggers.RemoveLogger(this);
+    ClearChildLoggers();
+  }
+  FConfigurator.Reset();
+  try {
+    if (RefCount() != 0) AssertionFailed(Format(u"The refcount of \"%s\" is not equal to 0!", {FFullName}));
+  } catch (const Exception&) {  // for a debugger to see: the destruction goes on
+  }
+  TZqLogger* Self = this;
+  RootLogger.compare_exchange_strong(Self, nullptr);
+  TObject::BeforeDestruction();
+}
+
+// The children live on without a parent. That their FParent goes too keeps them from reaching into a dead one.
+void TZqLogger::ClearChildLoggers() {
+  std::vector<IntfRef<IZqLogger>> Dropped;
+  const TLogLockScope Scope(FChildLoggers.FLock, FFullName, u".ClearChildLoggers");
+  for (; !FChildLoggers.FList.empty(); FChildLoggers.FList.pop_back()) {
+    TZqLogger* const Child = FChildLoggers.FList.back();
+    Child->FParent = nullptr;
+    Dropped.push_back(std::move(Child->FParentLogger));
+  }
+}
+
+HRESULT TZqLogger::QueryInterface(const TGUID& AIID, void** AObj) {
+  Assert(this != RootLogger, u"Do not get the IZqLogger interface from the rootlogger!");
+  return GetInterface(AIID, AObj) ? S_OK : E_NOINTERFACE;
+}
+
+Integer TZqLogger::_AddRef() { return FRefCount.fetch_add(1, std::memory_order_relaxed) + 1; }
+
+// Another thread may find a child in its parent's list at the moment when its last reference goes. So the step from 1
+// to 0 is made under the lock of that list, and the child leaves the list in the same step: nobody finds a dead one.
+Integer TZqLogger::_Release() {
+  Integer Count = FRefCount.load(std::memory_order_relaxed);
+  while (Count > 1)
+    if (FRefCount.compare_exchange_weak(Count, Count - 1, std::memory_order_acq_rel)) return Count - 1;
+  TZqLogger* const Above = FParent;
+  if (Above == nullptr) return FRefCount.fetch_sub(1, std::memory_order_acq_rel) - 1;
+  {
+    const TLogLockScope Scope(Above->FChildLoggers.FLock, Above->FFullName, cLoggerListRequest);
+    Count = FRefCount.fetch_sub(1, std::memory_order_acq_rel) - 1;
+    if (Count == 0) Above->FChildLoggers.RemoveLogger(this);
+  }
+  if (Count == 0) Free();
+  return Count;
+}
+
+IntfRef<IZqLogger> TZqLogger::GetParentLogger() const { return FParent.load(); }
+
+TZqLogLevel TZqLogger::GetLevel() const {
+  const TZqLogger* Current = this;
+  while (Current->FParentLevel.load(std::memory_order_relaxed)) {
+    const TZqLogger* const Above = Current->FParent.load(std::memory_order_relaxed);
+    if (Above == nullptr) break;
+    Current = Above;
+  }
+  return Current->FLevel.load(std::memory_order_relaxed);
+}
+
+void TZqLogger::SetLevel(TZqLogLevel AValue) {
+  FLevel.store(AValue, std::memory_order_relaxed);
+  FParentLevel.store(false, std::memory_order_relaxed);
+}
+
+void TZqLogger::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
+  const TLogLockScope Scope(FLock, FFullName, u".SetConfig");
+  FConfigurator = AConfig;
+  if (AConfig) return;
+  const TLogLockScope Children(FChildLoggers.FLock, FFullName, u".SetConfig");
+  for (TZqLogger* const Child : FChildLoggers.FList) Child->SetConfig(nullptr);
+}
+
+IntfRef<TZqLogger> TZqLogger::FindOrMakeChild(const UnicodeString& AName, bool& AMade) {
+  const TLogLockScope Scope(FChildLoggers.FLock, FFullName, cLoggerListRequest);
+  TZqLogger* const Found = FChildLoggers.FindLogger(AName);
+  AMade = Found == nullptr;
+  return AMade ? New<TZqLogger>(this, AName) : Found;
+}
+
+IntfRef<IZqLogger> TZqLogger::GetLogger(const UnicodeString& AName) {
+  const TLogLockScope Scope(FLock, FFullName, u".GetLogger");
+  TStringList Path;
+  ZqTokenize(AName, &Path, u".", nullptr);
+  IntfRef<TZqLogger> Current(this);
+  for (Integer i = 0; i < Path.Count(); ++i) {
+    bool Made = false;
+    Current = Current->FindOrMakeChild(Path.Strings(i), Made);
+    const TZqLogger* const Root = RootLogger;
+    if (Made) Current->SetConfig(Root == nullptr ? nullptr : Root->FConfigurator);
+  }
+  return Current;
+}
+
+IntfRef<IZqLogger> TZqLogger::GetLogger(const TObject* AObject) { return GetLogger(AObject->ClassName()); }
+
+TZqLogAppenderList* TZqLogger::LockAppenders() {
+  FAppenders->FLock.Enter(FFullName, u".LockAppenders", true);
+  return FAppenders.get();
+}
+
+// A list whose lock stays busy is skipped. What an appender logs itself comes back here on the same thread; the depth
+// is bounded, so that one that answers every message with a message doesn't end the host.
+void TZqLogger::WriteToAppenders(const UnicodeString& ASender, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
+    PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  TZqLogAppenderList& List = *FAppenders;
+  if (!List.FLock.Enter(FFullName, u".DoLog", false)) return;
+  struct TScope {
+    explicit TScope(TZqLogAppenderList& AList) : Locked(AList) { ++Locked.FNesting; }
+    ~TScope() {
+      --Locked.FNesting;
+      Locked.FLock.Leave();
+    }
+    TZqLogAppenderList& Locked;
+  } const Scope(List);
+  if (List.FNesting > cMaxNesting) return;
+  const auto AtStart = static_cast<std::size_t>(List.Count());
+  for (std::size_t i = 0; i < AtStart; ++i)
+    if (const auto Appender = List.ItemOrNone(i))
+      Appender->Write(ASender, FFullName, ALogLevel, ALogMessage, AValue, ALogIndent);
+}
+
+// Level and count are tested first, so that a message that nobody writes takes no lock. Each lock is left before the
+// message goes on to the parent.
+void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
+    PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  try {
+    for (TZqLogger* Current = this; Current != nullptr;) {
+      if (Current->FAppenders->Count() != 0 && Current->GetLevel() <= ALogLevel)
+        Current->WriteToAppenders(ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
+      Current = Current->GetAdditive() ? Current->FParent.load(std::memory_order_relaxed) : nullptr;
+    }
+  } catch (const Exception&) {  // logging never raises into its caller
+  }
+}
+
+void TZqLogger::Trace(const UnicodeString& ALogMessage) { Log(llTrace, ALogMessage); }
+void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName) {
+  Log(llTrace, Format(u"%s($%p).%s", {AObject->ClassName(), AObject, AMethodName}));
+}
+void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) {
+  Trace(AObject, Format(AMethodName, AArgs));
+}
+void TZqLogger::Debug(const UnicodeString& ALogMessage) { Log(llDebug, ALogMessage); }
+void TZqLogger::Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) { Log(llDebug, Format(ALogMessage, AArgs)); }
+void TZqLogger::Debug(const UnicodeString& AMessage, const Variant& AValue) { Log(llDebug, AMessage, AValue); }
+void TZqLogger::Debug(const UnicodeString& AMessage, const TObject* AValue) { Log(llDebug, AMessage, AValue); }
+void TZqLogger::Debug(const UnicodeString& AMessage, const Exception& AValue) { Log(llDebug, AMessage, AValue); }
+void TZqLogger::Info(const UnicodeString& ALogMessage) { Log(llInfo, ALogMessage); }
+void TZqLogger::Warn(const UnicodeString& ALogMessage) { Log(llWarn, ALogMessage); }
+void TZqLogger::Error(const UnicodeString& ALogMessage) { Log(llError, ALogMessage); }
+void TZqLogger::Error(const UnicodeString& ALogMessage, const Exception& AException) {
+  Log(llError, ALogMessage + u"\r\n" + AException.Message());
+}
+void TZqLogger::Fatal(const UnicodeString& ALogMessage) { Log(llFatal, ALogMessage); }
+void TZqLogger::Fatal(const UnicodeString& ALogMessage, TVarArgs AArgs) { Log(llFatal, Format(ALogMessage, AArgs)); }
+void TZqLogger::Fatal(const Exception& AException) { Log(llFatal, AException.Message(), AException); }
+void TZqLogger::Fatal(const UnicodeString& ALogMessage, const Exception& AException) {
+  Log(llFatal, ALogMessage, AException);
+}
+void TZqLogger::Count(const UnicodeString& ACounter, Integer AValue) {
+  Debug(u"#counter::" + ACounter + u"#", Variant(AValue));
+}
+
+void TZqLogger::EnterMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel) {
+  Log(ALogLevel, AMethodName, liIndentIncrease);
+}
+void TZqLogger::EnterMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel) {
+  Log(ALogLevel, Format(AMethodName, AArgs), liIndentIncrease);
+}
+void TZqLogger::EnterMethod(const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel) {
+  Log(ALogLevel, MethodOf(AObject, AMethodName), liIndentIncrease);
+}
+void TZqLogger::EnterMethod(
+    const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel) {
+  Log(ALogLevel, Format(MethodOf(AObject, AMethodName), AArgs), liIndentIncrease);
+}
+void TZqLogger::ExitMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel) {
+  Log(ALogLevel, AMethodName, liIndentDecrease);
+}
+void TZqLogger::ExitMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel) {
+  Log(ALogLevel, Format(AMethodName, AArgs), liIndentDecrease);
+}
+void TZqLogger::ExitMethod(const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel) {
+  Log(ALogLevel, MethodOf(AObject, AMethodName), liIndentDecrease);
+}
+
+void TZqLogger::Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, TZqLogIndent ALogIndent) {
+  DoLog(FFullName, ALogLevel, ALogMessage, nullptr, ALogIndent);
+}
+void TZqLogger::Log(
+    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Variant& AValue, TZqLogIndent ALogIndent) {
+  const TZqDataRec Value = VariantRec(AValue);
+  DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
+}
+void TZqLogger::Log(
+    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const TObject* AValue, TZqLogIndent ALogIndent) {
+  const TZqDataRec Value = ObjectRec(AValue);
+  DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
+}
+void TZqLogger::Log(
+    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Exception& AValue, TZqLogIndent ALogIndent) {
+  const TZqDataRec Value = ExceptionRec(AValue);
+  DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
+}
+void TZqLogger::Log(const IntfRef<IZqLogData>& ALogData) {
+  const TZqLogData& Event = *ALogData->Data();
+  Log(Event.LogLevel, Event.LogMessage, Event.Indent);
+}
+
+TZqLogger* Logger() {
+  if (TZqLogger* const Root = RootLogger.load(std::memory_order_acquire)) return Root;
+  const std::lock_guard Guard(RootLock);
+  if (TZqLogger* const Root = RootLogger.load(std::memory_order_acquire)) return Root;
+  auto* const Root = New<TZqLogger>(nullptr, u"root");
+  Root->SetLevel(llDebug);
+  RootLogger.store(Root, std::memory_order_release);
+  return Root;
+}
+
+// ---------------------------------------------------------------------------------------- TZqLogBase and registries
+
+TZqLogBase::TZqLogBase(TZqLogger* ALogger, const UnicodeString& AName) : Implements(nullptr), FLogger(ALogger) {
+  if (!AName.IsEmpty() && (AName[1] < u'0' || AName[1] > u'9')) SetName(AName);
+}
+
+void TZqLogBase::AfterConstruction() {
+  Implements::AfterConstruction();
+  if (dynamic_cast<TZqBaseAppender*>(this) == nullptr) return;
+  const std::lock_guard Guard(AppendersLock);
+  Assert(Appenders != nullptr, u"An appender is made before the library has started");
+  Appenders->push_back(this);
+}
+
+void TZqLogBase::BeforeDestruction() {
+  if (dynamic_cast<TZqBaseAppender*>(this) != nullptr) {
+    const std::lock_guard Guard(AppendersLock);
+    if (Appenders != nullptr) std::erase(*Appenders, this);
+  }
+  const TLockScope Ending(EndLock);
+  if (RefCount() != 0) LeaveLists();
+  Implements::BeforeDestruction();
+}
+
+// An appender that is freed by hand: the lists that hold it let go now, and none of them is the last to end it.
+void TZqLogBase::LeaveLists() {
+  const bool AutoDestroyed = AutoDestroy();
+  SetAutoDestroy(false);
+  TellWatchers();
+  SetAutoDestroy(AutoDestroyed);
+}
+
+std::vector<TZqLogBase*> LiveAppenders() {
+  const std::lock_guard Guard(AppendersLock);
+  return Appenders == nullptr ? std::vector<TZqLogBase*>() : *Appenders;
+}
+
+void TZqLogBaseClassList::Add(TZqLogBaseClass AClass) {
+  if (std::find(FList.begin(), FList.end(), AClass) == FList.end()) FList.push_back(AClass);
+}
+
+TZqLogBaseClass TZqLogBaseClassList::GetClass(const ShortString& AClassName) const {
+  const UnicodeString Name = AClassName.ToString();
+  for (const TZqLogBaseClass& Class : FList)
+    if (SameText(Class.ClassName(), Name)) return Class;
+  throw EListError(u"Class %s not found!", {Name});
+}
+
+namespace {
+
+TZqLogBaseClassList* MadeOnFirstUse(std::atomic<TZqLogBaseClassList*>& AList) {
+  if (AList.load(std::memory_order_acquire) == nullptr) AList.store(new TZqLogBaseClassList, std::memory_order_release);
+  return AList.load(std::memory_order_acquire);
+}
+
+}  // namespace
+
+TZqLogBaseClassList* RegisteredLayouts() { return MadeOnFirstUse(LayoutClasses); }
+TZqLogBaseClassList* RegisteredAppenders() { return MadeOnFirstUse(AppenderClasses); }
+
+void uZqLogger::Start() {
+  Appenders = new std::vector<TZqLogBase*>;
+  DescribeType<TZqLogLevel>(u"uZqLogger")
+      .EnumNames({u"llAll", u"llTrace", u"llDebug", u"llInfo", u"llWarn", u"llError", u"llFatal", u"llDoNotLog"});
+  DescribeType<TZqLogIndent>(u"uZqLogger").EnumNames({u"liIndentNone", u"liIndentIncrease", u"liIndentDecrease"});
+}
+
+void uZqLogger::Stop() {
+  Free(RootLogger.load());
+  delete LayoutClasses.exchange(nullptr);
+  delete AppenderClasses.exchange(nullptr);
+  const std::lock_guard Guard(AppendersLock);
+  delete std::exchange(Appenders, nullptr);
+}
+
+// ---------------------------------------------------------------------------------------- log events
+
+namespace {
+
+struct TSystemName {
+  Word Code;
+  const char16_t* Name;
+};
+constexpr TSystemName cSystemNames[] = {{1, u"Win 3.1"}, {3, u"Windows 95"}, {5, u"Windows 95 OSR2"},
+    {7, u"Windows 98"}, {9, u"Windows 98 SE"}, {11, u"Windows Milennium"}, {12, u"Windows NT"}, {14, u"Windows NT 3.0"},
+    {16, u"Windows NT 4.0"}, {500, u"Windows 2000"}, {511, u"Windows XP"}, {520, u"Windows Server 2003"},
+    {601, u"Vista"}, {611, u"Windows 7"}, {621, u"Windows 8"}};
+
+UnicodeString SystemName(Word ACode) {
+  for (const TSystemName& Row : cSystemNames)
+    if (Row.Code == ACode) return Row.Name;
+  return u"Unidentified OS";
+}
+
+UnicodeString SystemVersion() {
+  const TSystemRelease Release = Platform().Version().Release();
+  return Format(u"%d.%d", {Release.Major, Release.Minor}) +
+         Format(u"; Build: %x, \"%s\"", {Release.Build, Release.Text});
+}
+
+}  // namespace
+
+TZqLogData::TZqLogData(TZqLogLevel ALogLevel, UnicodeString ALogMessage)
+    : LogLevel(ALogLevel),
+      LogMessage(std::move(ALogMessage)),
+      ComputerName(ZqGetComputerName()),
+      UserName(ZqGetUserName()),
+      ActiveForm(u"n.a."),
+      ActiveControl(u"n.a."),
+      OS(SystemName(ZqGetWindowsVersion())),
+      Version(SystemVersion()),
+      Timestamp(Now()),
+      Resolution(u"n.a.") {}
+
+// ---------------------------------------------------------------------------------------- value text
+
+namespace {
+
+// Dumps an object and the persistent objects that it publishes. An object that is being dumped further up gets its head
+// line only: objects may lead back to each other.
+class TDumper {
+ public:
+  void Dump(TObject* AObject, const UnicodeString& AIndent) {
+    const auto* const Component = dynamic_cast<const TComponent*>(AObject);
+    Text += AIndent + u"object " + (Component == nullptr ? UnicodeString() : Component->Name()) + u": " +
+            AObject->ClassName() + u"\r\n";
+    if (std::find(FOpen.begin(), FOpen.end(), AObject) != FOpen.end()) return;
+    FOpen.push_back(AObject);
+    for (const PPropInfo Property : GetPropList(AObject)) DumpProperty(AObject, Property, AIndent + u"  ");
+    FOpen.pop_back();
+  }
+  UnicodeString Text;
+
+ private:
+  void DumpProperty(TObject* AObject, PPropInfo AProperty, const UnicodeString& AIndent) {
+    if (!AProperty->IsReadable() || !AProperty->IsWritable()) return;
+    try {
+      switch (AProperty->Kind()) {
+        case tkInteger:
+        case tkChar:
+        case tkEnumeration:
+        case tkFloat:
+        case tkString:
+        case tkSet:
+        case tkWChar:
+        case tkLString:
+        case tkWString:
+        case tkVariant: {
+          const Variant Value = GetPropValue(AObject, AProperty, AProperty->Kind() == tkEnumeration);
+          Text += AIndent + AProperty->Name + u" = " + ZqVarToStr(Value, u"", false) + u"\r\n";
+          break;
+        }
+        case tkClass:
+          if (auto* const Part = dynamic_cast<TPersistent*>(GetObjectProp(AObject, AProperty))) Dump(Part, AIndent);
+          break;
+        default: break;
+      }
+    } catch (const Exception& e) {
+      Text += AIndent + u"Exception " + e.ClassName() + u"(" + e.Message() +
+              u") was raised while trying to read property: " + AProperty->Name + u"\r\n";
+    }
+  }
+
+  std::vector<const TObject*> FOpen;
+};
+
+UnicodeString DumpObject(const TObject* AObject) {
+  if (AObject == nullptr) return {};
+  TDumper Dumper;
+  Dumper.Dump(const_cast<TObject*>(AObject), u"");  // getters need not be const
+  return Dumper.Text;
+}
+
+UnicodeString AddressText(const void* AValue) { return IntToHex(reinterpret_cast<NativeUInt>(AValue), 4); }
+
+}  // namespace
+
+UnicodeString ZqDataRecToString(PZqDataRec AValue) {
+  switch (AValue->DataType) {
+    case rtkByte: return IntToStr(AValue->VByte);
+    case rtkWord: return IntToStr(AValue->VWord);
+    case rtkLongWord: return IntToStr(AValue->VLongWord);
+    case rtkShortInt: return IntToStr(AValue->VShortInt);
+    case rtkSmallInt: return IntToStr(AValue->VSmallint);
+    case rtkLongInt: return IntToStr(AValue->VLongInt);
+    case rtkInt64: return IntToStr(AValue->VInt64);
+    case rtkSingle: return Format(u"%f", {AValue->VSingle});
+    case rtkDouble: return Format(u"%f", {AValue->VDouble});
+    case rtkExtended: return Format(u"%f", {AValue->VExtended});
+    case rtkChar: return UnicodeString(AValue->VChar);
+    case rtkWChar: return UnicodeString(AValue->VWChar);
+    case rtkAChar: return TZqEncoding::ConvertA(AnsiString(std::string_view(&AValue->VAChar, 1)));
+    case rtkString: return *AValue->VString;
+    case rtkAString: return TZqEncoding::ConvertA(*AValue->VAString);
+    case rtkWString: return *AValue->VWString;
+    case rtkBoolean: return BoolToStr(AValue->VBoolean, false);
+    case rtkEnumeration: return IntToStr(AValue->VEnumeration);
+    case rtkSet: return IntToStr(AValue->VSet);
+    case rtkDate: return DateToStr(TDateTime(AValue->VDate));
+    case rtkTime: return TimeToStr(AValue->VTime);
+    case rtkDatetime: return DateTimeToStr(AValue->VDatetime);
+    case rtkVariant: return ZqVarToStr(*AValue->VVariant, u"", false);
+    case rtkObject: return DumpObject(AValue->VObject);
+    case rtkInterface: return AddressText(AValue->VInterface);
+    case rtkPointer: return AddressText(AValue->VPointer);
+    case rtkException: return AValue->VException->ClassName() + u":" + AValue->VException->Message();
+    case rtkClass: return AValue->VClass.ClassName();
+    case rtkArray: return u"Array";
+    case rtkDynArray: return u"DynArray";
+    case rtkRecord: return u"Record";
+    case rtkMethod: return u"Method";
+    case rtkProcedure: return u"Procedure";
+    default: return u"unknown";
+  }
+}
+
+}  // namespace zq

@@ -1,0 +1,571 @@
+#pragma once
+
+#include <atomic>
+#include <memory>
+#include <mutex>
+#include <string_view>
+#include <vector>
+
+#include "common/uZqClasses.h"
+#include "common/uZqSysUtils.h"
+#include "common/uZqTypes.h"
+#include "runtime/component/component.h"
+#include "runtime/core/interfaces.h"
+#include "runtime/core/variants.h"
+#include "runtime/core/varrec.h"
+#include "runtime/sync/critical_section.h"
+
+namespace zq {
+
+enum class TZqLogLevel : Byte { llAll, llTrace, llDebug, llInfo, llWarn, llError, llFatal, llDoNotLog };
+using enum TZqLogLevel;
+
+/// Texts of the levels as they stand in log lines.
+struct TZqLogLevelTexts {
+  std::u16string_view Texts[8];
+  [[nodiscard]] constexpr std::u16string_view operator[](TZqLogLevel ALevel) const noexcept {
+    return Texts[static_cast<Byte>(ALevel)];
+  }
+};
+inline constexpr TZqLogLevelTexts ZqLogLevels{
+    {u"All", u"Trace", u"Debug", u"Info", u"Warn", u"Error", u"Fatal", u"Disabled"}};
+
+enum class TZqLogIndent : Byte { liIndentNone, liIndentIncrease, liIndentDecrease };
+using enum TZqLogIndent;
+
+/// The value that travels with a message; DataType says which member is valid. Lives for the log call only: pointers
+/// are the caller's, and an appender keeps neither them nor the record.
+struct TZqDataRec {
+  TZqDataRec() noexcept : VInt64(0) {}
+
+  TZqTypeKind DataType = rtkUnknown;
+  union {
+    Int64 VInt64;
+    ShortInt VShortInt;
+    SmallInt VSmallint;
+    Integer VLongInt;
+    Byte VByte;
+    Word VWord;
+    Cardinal VLongWord;
+    Single VSingle;
+    Double VDouble;
+    Extended VExtended;
+    Char VChar;
+    const UnicodeString* VString;
+    AnsiChar VAChar;
+    WideChar VWChar;
+    const AnsiString* VAString;
+    const WideString* VWString;
+    Boolean VBoolean;
+    Integer VDate;  ///< day number
+    TDateTime VTime;
+    TDateTime VDatetime;
+    const TObject* VObject;
+    const void* VPointer;
+    const void* VInterface;
+    struct {
+      const void* Code;
+      const void* Data;
+    } VMethod;
+    const Variant* VVariant;
+    const void* VRecord;
+    const Exception* VException;
+    Integer VEnumeration;
+    Integer VSet;
+    TClass VClass;
+    const void* VProcedure;
+    const void* VArray;
+    const void* VDynArray;
+  };
+};
+using PZqDataRec = const TZqDataRec*;
+
+class TZqLogAppenderList;
+class TZqLogBase;
+class TZqLogData;
+class TZqLogger;
+class TZqLoggerList;
+
+using TZqLogBaseClass = TClassRef<TZqLogBase(TZqLogger*, const UnicodeString&)>;
+
+// ---------------------------------------------------------------------------------------- appender contract
+
+struct ZQ_API IZqLogBase : Extends<IInterface> {
+  static constexpr TGUID IID = "{0061FD2F-FEF2-4D47-A7B2-2B69A7EB2CE1}"_guid;
+  virtual UnicodeString GetName() const = 0;
+  /// The component behind the interface, which it owns; an appender of a host that is none answers null.
+  virtual TComponent* Component() = 0;
+
+ protected:
+  ~IZqLogBase() = default;
+};
+
+/// Takes messages from loggers. Called on the thread that logs, under the lock of the logger's appender list; what it
+/// raises ends the message's way there and reaches nobody.
+struct ZQ_API IZqLogAppender : Extends<IZqLogBase> {
+  static constexpr TGUID IID = "{D10CACCF-3B7D-4CBB-96D3-7C22BEF8FE7E}"_guid;
+  /// ASender is the full name of the logger that was called, ALoggerName that of the logger whose appender this is.
+  virtual void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) = 0;
+  virtual void Close() = 0;
+
+ protected:
+  ~IZqLogAppender() = default;
+};
+
+/// Turns messages into text, for one appender and under its lock.
+struct ZQ_API IZqLogLayout : Extends<IZqLogBase> {
+  static constexpr TGUID IID = "{5008EFF8-569C-4FD3-8C1D-FCCEF0DF632E}"_guid;
+  virtual UnicodeString GetFooter() = 0;
+  virtual UnicodeString GetHeader() = 0;
+  /// Without a line end.
+  virtual UnicodeString FormatLine(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) = 0;
+
+ protected:
+  ~IZqLogLayout() = default;
+};
+
+/// An appender that writes through a layout. Bears the GUID of IZqLogAppender.
+struct ZQ_API IZqLogAppenderEx : Extends<IZqLogAppender> {
+  static constexpr TGUID IID = IZqLogAppender::IID;
+  virtual void SetLayout(const IntfRef<IZqLogLayout>& ALayout) = 0;
+  virtual void SetLayout(TZqLogBaseClass ALayout) = 0;
+  /// Raises EListError for a name that is not registered.
+  virtual void SetLayout(const ShortString& ALayout) = 0;
+
+ protected:
+  ~IZqLogAppenderEx() = default;
+};
+
+/// A layout that decides the extension of its log file.
+struct ZQ_API IZqLogLayoutEx : Extends<IZqLogLayout> {
+  static constexpr TGUID IID = "{69516E7B-351A-4F40-AED4-7CD5FDCB3FFD}"_guid;
+  virtual UnicodeString GetFileExt() = 0;
+
+ protected:
+  ~IZqLogLayoutEx() = default;
+};
+
+/// A layout that is told which appender it now serves.
+struct ZQ_API _IZqLogLayout : Extends<IInterface> {
+  static constexpr TGUID IID = "{D47392EB-1BA9-4A9E-B586-0F8FCFF87448}"_guid;
+  virtual void Initialize(TZqLogBase* ALogBase) = 0;
+
+ protected:
+  ~_IZqLogLayout() = default;
+};
+
+/// Provided by a host: settings by the name of a logger or an appender.
+struct ZQ_API IZqLogConfigurator : Extends<IInterface> {
+  static constexpr TGUID IID = "{28A992A8-9491-4F32-B3BC-851901F67357}"_guid;
+  /// The value stored for that name and key, ADefault if there is none. AKind tells what the caller expects.
+  virtual Variant GetLoggerValue(
+      const UnicodeString& ALoggerName, const UnicodeString& AKey, TZqMainTypeKind AKind, const Variant& ADefault) = 0;
+  virtual Variant GetAppenderValue(const UnicodeString& AAppenderName, const UnicodeString& AKey, TZqMainTypeKind AKind,
+      const Variant& ADefault) = 0;
+  /// Never called by the library: the slot belongs to hosts that share a configurator among themselves.
+  virtual Variant GetValue(
+      const UnicodeString& AName, const UnicodeString& AKey, TZqMainTypeKind AKind, const Variant& ADefault) = 0;
+
+ protected:
+  ~IZqLogConfigurator() = default;
+};
+
+struct ZQ_API IZqLogConfiguratorEx : Extends<IZqLogConfigurator> {
+  static constexpr TGUID IID = "{A57D0CA9-7632-4A0E-8333-DAF4BDA6CF3E}"_guid;
+  virtual void ConfigureLogger(TZqLogger* ALogger) = 0;
+
+ protected:
+  ~IZqLogConfiguratorEx() = default;
+};
+
+// ---------------------------------------------------------------------------------------- log events
+
+struct ZQ_API IZqLogData : Extends<IInterface> {
+  static constexpr TGUID IID = "{63196C58-37A5-47C3-9217-D04A6FDEE05F}"_guid;
+  virtual TZqLogData* Data() = 0;
+
+ protected:
+  ~IZqLogData() = default;
+};
+
+/// An event that a caller fills and hands to Log. Only level, indent and message reach the appenders; the other fields
+/// are for who reads the event itself.
+class ZQ_API TZqLogData : public Implements<TInterfacedObject, IZqLogData> {
+ public:
+  TZqLogData(TZqLogLevel ALogLevel, UnicodeString ALogMessage);
+  TZqLogData* Data() override { return this; }
+
+  TZqLogLevel LogLevel;
+  TZqLogIndent Indent = liIndentNone;
+  UnicodeString LogMessage;
+  UnicodeString ComputerName;
+  UnicodeString UserName;
+  UnicodeString ActiveForm;
+  UnicodeString ActiveControl;
+  UnicodeString ExtendedInfo;
+  UnicodeString Source;
+  UnicodeString OS;
+  UnicodeString Version;
+  TDateTime Timestamp;
+  UnicodeString Resolution;
+  UnicodeString HelpText;
+
+ protected:
+  ~TZqLogData() override = default;
+};
+
+/// The value as text. Objects are dumped with their published read-write properties, one line each; an object that
+/// leads back to itself is shown once. Raises what a conversion raises.
+[[nodiscard]] ZQ_API UnicodeString ZqDataRecToString(PZqDataRec AValue);
+
+// ---------------------------------------------------------------------------------------- loggers
+
+/// A named logger of the tree. Any thread may call any operation. Logging never raises, apart from a format text that
+/// doesn't fit its arguments; operations on the tree and on the appenders raise Exception when a lock stays busy for
+/// some five seconds.
+struct ZQ_API IZqLogger : Extends<IInterface> {
+  static constexpr TGUID IID = "{C9719FC7-DE99-4B3B-A008-A480D810D29E}"_guid;
+  /// Empty at the root.
+  virtual IntfRef<IZqLogger> GetParentLogger() const = 0;
+  virtual bool GetParentLevel() const = 0;
+  /// That of the nearest ancestor that has one of its own, unless this logger has.
+  virtual TZqLogLevel GetLevel() const = 0;
+  virtual TZqLogAppenderList* GetAppenders() = 0;
+  virtual TZqLoggerList* GetChildLoggers() = 0;
+  virtual bool GetAdditive() const = 0;
+  /// The dotted path, "root.a.b".
+  virtual UnicodeString GetName() const = 0;
+  /// The last component, "b".
+  virtual UnicodeString GetFullName() const = 0;
+  virtual void SetAdditive(bool AValue) = 0;
+  virtual void SetParentLevel(bool AValue) = 0;
+  /// Also ends taking the level from the parent.
+  virtual void SetLevel(TZqLogLevel AValue) = 0;
+  virtual void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) = 0;
+  /// Finds or makes the logger at a dotted path below this one; this logger itself for an empty path.
+  virtual IntfRef<IZqLogger> GetLogger(const UnicodeString& AName) = 0;
+  /// The child named by the class of AObject.
+  virtual IntfRef<IZqLogger> GetLogger(const TObject* AObject) = 0;
+  virtual bool IsDebugEnabled() const = 0;
+  virtual bool IsErrorEnabled() const = 0;
+  virtual bool IsFatalEnabled() const = 0;
+  virtual bool IsInfoEnabled() const = 0;
+  virtual bool IsWarnEnabled() const = 0;
+  /// Whether this logger's own appenders would get a message of that level.
+  virtual bool IsEnabledFor(TZqLogLevel ALogLevel) const = 0;
+
+  virtual void Trace(const UnicodeString& ALogMessage) = 0;
+  virtual void Trace(const TObject* AObject, const UnicodeString& AMethodName) = 0;
+  virtual void Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) = 0;
+  virtual void Debug(const UnicodeString& ALogMessage) = 0;
+  virtual void Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) = 0;
+  virtual void Debug(const UnicodeString& AMessage, const Variant& AValue) = 0;
+  virtual void Debug(const UnicodeString& AMessage, const TObject* AValue) = 0;
+  virtual void Debug(const UnicodeString& AMessage, const Exception& AValue) = 0;
+  virtual void Info(const UnicodeString& ALogMessage) = 0;
+  virtual void Warn(const UnicodeString& ALogMessage) = 0;
+  virtual void Error(const UnicodeString& ALogMessage) = 0;
+  virtual void Fatal(const UnicodeString& ALogMessage) = 0;
+  virtual void Fatal(const UnicodeString& ALogMessage, TVarArgs AArgs) = 0;
+  virtual void Fatal(const Exception& AException) = 0;
+  virtual void Fatal(const UnicodeString& ALogMessage, const Exception& AException) = 0;
+  virtual void Count(const UnicodeString& ACounter, Integer AValue) = 0;
+  virtual void ClearLog() = 0;
+  virtual void EnterMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void EnterMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void EnterMethod(
+      const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void EnterMethod(
+      const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void ExitMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void ExitMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void ExitMethod(
+      const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, TZqLogIndent ALogIndent = liIndentNone) = 0;
+  virtual void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Variant& AValue,
+      TZqLogIndent ALogIndent = liIndentNone) = 0;
+  virtual void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const TObject* AValue,
+      TZqLogIndent ALogIndent = liIndentNone) = 0;
+  virtual void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Exception& AValue,
+      TZqLogIndent ALogIndent = liIndentNone) = 0;
+  virtual void Log(const IntfRef<IZqLogData>& ALogData) = 0;
+
+  /// The logger holds a count on AAppender until it is removed.
+  virtual void AddAppender(const IntfRef<IZqLogAppender>& AAppender) = 0;
+  /// Makes one of that class.
+  virtual void AddAppender(TZqLogBaseClass AAppender) = 0;
+  virtual void RemoveAppender(const IntfRef<IZqLogAppender>& AAppender) = 0;
+  virtual void ClearAppenders() = 0;
+  /// The list, locked for a walk until UnLockAppenders.
+  virtual TZqLogAppenderList* LockAppenders() = 0;
+  virtual void UnLockAppenders() = 0;
+
+ protected:
+  ~IZqLogger() = default;
+};
+
+/// Lock of the logger tree: re-entrant, gives up after some five seconds, and can tell who holds it.
+class ZQ_API TZqLogLock : public TObject {
+ public:
+  TZqLogLock() = default;
+  ~TZqLogLock() override = default;
+  /// False, or Exception if ARaise, when the lock stays busy.
+  bool Enter(const UnicodeString& ALockRequestedBy, bool ARaise);
+  /// The same for AOwner followed by AOperation, joined only when somebody reads it. Both must outlive the lock.
+  bool Enter(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise);
+  void Leave() noexcept { FLock.Leave(); }
+  /// Who took the lock last, and on which thread.
+  [[nodiscard]] UnicodeString LockedBy() const;
+
+ private:
+  bool Take(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise);
+
+  TCriticalSection FLock;
+  std::atomic<const UnicodeString*> FOwner = nullptr;  // null: the holder gave a text of its own, FText
+  std::atomic<const char16_t*> FOperation = u"";
+  std::atomic<Cardinal> FThread = 0;
+  mutable std::mutex FTextLock;
+  UnicodeString FText;
+};
+
+/// The children of a logger, not counted: a child is here only as long as it lives.
+class ZQ_API TZqLoggerList : public TObject {
+ public:
+  explicit TZqLoggerList(TZqLogger* ALogger) noexcept : FLogger(ALogger) {}
+  ~TZqLoggerList() override;
+
+  bool Lock(const UnicodeString& ALockRequestedBy, bool ARaise) { return FLock.Enter(ALockRequestedBy, ARaise); }
+  void Unlock() noexcept { FLock.Leave(); }
+  void AddLogger(TZqLogger* ALogger);
+  void RemoveLogger(TZqLogger* ALogger);
+  /// Count and GetLogger take no lock: who walks the list holds it.
+  [[nodiscard]] Integer Count() const noexcept { return static_cast<Integer>(FList.size()); }
+  [[nodiscard]] IntfRef<IZqLogger> GetLogger(Integer AIndex) const;
+  /// By the last component, exactly; nullptr if there is none. Not counted: safe to use only under the list's lock.
+  [[nodiscard]] TZqLogger* FindLogger(const UnicodeString& AName);
+
+ private:
+  friend class TZqLogger;
+
+  TZqLogger* FLogger;
+  std::vector<TZqLogger*> FList;
+  TZqLogLock FLock;
+};
+
+/// The appenders of a logger, each held by a count.
+class ZQ_API TZqLogAppenderList : public TComponent {
+ public:
+  explicit TZqLogAppenderList(TZqLogger* ALogger);
+
+  /// Adds an appender once, however often it is called.
+  void Add(const IntfRef<IZqLogAppender>& AAppender);
+  /// Makes an appender of that class, with the class name as its name.
+  IntfRef<IZqLogAppender> Add(TZqLogBaseClass AAppender);
+  /// Of a registered class, whatever the case of the name; raises EListError if there is none.
+  IntfRef<IZqLogAppender> Add(const ShortString& AAppender);
+  /// The same with a layout.
+  IntfRef<IZqLogAppender> Add(TZqLogBaseClass AAppender, TZqLogBaseClass ALayout);
+  IntfRef<IZqLogAppender> Add(const ShortString& AAppender, const ShortString& ALayout);
+  void Remove(const IntfRef<IZqLogAppender>& AAppender);
+  void Clear();
+  /// Count and GetAppender take no lock: who walks the list holds it.
+  [[nodiscard]] Integer Count() const noexcept { return FCount.load(std::memory_order_relaxed); }
+  [[nodiscard]] IntfRef<IZqLogAppender> GetAppender(Integer AIndex) const;
+  bool Lock(const UnicodeString& ALockRequestedBy, bool ARaise) { return FLock.Enter(ALockRequestedBy, ARaise); }
+  void Unlock() noexcept { FLock.Leave(); }
+
+ protected:
+  ~TZqLogAppenderList() override = default;
+  void BeforeDestruction() override;
+  void Notification(TComponent* AComponent, TOperation AOperation) override;
+
+ private:
+  friend class TZqLogger;
+  using TItems = std::vector<IntfRef<IZqLogAppender>>;
+
+  IntfRef<IZqLogAppender> ItemOrNone(std::size_t AIndex) const;
+  template <class TLeaves>
+  TItems TakeItems(TLeaves ALeaves);
+
+  TZqLogger* FLogger;
+  mutable TCriticalSection FItemsLock;  // innermost, for a few instructions: an appender may end on any thread
+  TItems FList;
+  std::atomic<Integer> FCount = 0;  // FList's size
+  TZqLogLock FLock;
+  Integer FNesting = 0;  // calls to appenders under way, guarded by FLock
+};
+
+/// A logger. The root is made by Logger() and never dies by its count; all others come from GetLogger and live as long
+/// as somebody holds them or one of their children.
+class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
+ public:
+  TZqLogger(TZqLogger* AParentLogger, UnicodeString AName);
+
+  [[nodiscard]] Integer RefCount() const noexcept { return FRefCount.load(std::memory_order_relaxed); }
+  [[nodiscard]] IntfRef<IZqLogConfigurator> Configurator() const { return FConfigurator; }
+  /// Also hands nullptr down to the children.
+  void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) override;
+
+  HRESULT QueryInterface(const TGUID& AIID, void** AObj) override;
+  Integer _AddRef() override;
+  Integer _Release() override;
+
+  IntfRef<IZqLogger> GetParentLogger() const override;
+  bool GetParentLevel() const override { return FParentLevel.load(std::memory_order_relaxed); }
+  TZqLogLevel GetLevel() const override;
+  TZqLogAppenderList* GetAppenders() override { return FAppenders.get(); }
+  TZqLoggerList* GetChildLoggers() override { return &FChildLoggers; }
+  bool GetAdditive() const override { return FAdditive.load(std::memory_order_relaxed); }
+  UnicodeString GetName() const override { return FFullName; }
+  UnicodeString GetFullName() const override { return FName; }
+  void SetAdditive(bool AValue) override { FAdditive.store(AValue, std::memory_order_relaxed); }
+  void SetParentLevel(bool AValue) override { FParentLevel.store(AValue, std::memory_order_relaxed); }
+  void SetLevel(TZqLogLevel AValue) override;
+  IntfRef<IZqLogger> GetLogger(const UnicodeString& AName) override;
+  IntfRef<IZqLogger> GetLogger(const TObject* AObject) override;
+  bool IsDebugEnabled() const override { return IsEnabledFor(llDebug); }
+  bool IsErrorEnabled() const override { return IsEnabledFor(llError); }
+  bool IsFatalEnabled() const override { return IsEnabledFor(llFatal); }
+  bool IsInfoEnabled() const override { return IsEnabledFor(llInfo); }
+  bool IsWarnEnabled() const override { return IsEnabledFor(llWarn); }
+  bool IsEnabledFor(TZqLogLevel ALogLevel) const override { return GetLevel() <= ALogLevel; }
+
+  void Trace(const UnicodeString& ALogMessage) override;
+  void Trace(const TObject* AObject, const UnicodeString& AMethodName) override;
+  void Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) override;
+  void Debug(const UnicodeString& ALogMessage) override;
+  void Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) override;
+  void Debug(const UnicodeString& AMessage, const Variant& AValue) override;
+  void Debug(const UnicodeString& AMessage, const TObject* AValue) override;
+  void Debug(const UnicodeString& AMessage, const Exception& AValue) override;
+  void Info(const UnicodeString& ALogMessage) override;
+  void Warn(const UnicodeString& ALogMessage) override;
+  void Error(const UnicodeString& ALogMessage) override;
+  /// The message of AException on a line of its own behind ALogMessage.
+  void Error(const UnicodeString& ALogMessage, const Exception& AException);
+  void Fatal(const UnicodeString& ALogMessage) override;
+  void Fatal(const UnicodeString& ALogMessage, TVarArgs AArgs) override;
+  void Fatal(const Exception& AException) override;
+  void Fatal(const UnicodeString& ALogMessage, const Exception& AException) override;
+  void Count(const UnicodeString& ACounter, Integer AValue) override;
+  void ClearLog() override {}
+  void EnterMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
+  void EnterMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) override;
+  void EnterMethod(const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
+  void EnterMethod(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs,
+      TZqLogLevel ALogLevel = llDebug) override;
+  void ExitMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
+  void ExitMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) override;
+  void ExitMethod(const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
+  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, TZqLogIndent ALogIndent = liIndentNone) override;
+  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Variant& AValue,
+      TZqLogIndent ALogIndent = liIndentNone) override;
+  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const TObject* AValue,
+      TZqLogIndent ALogIndent = liIndentNone) override;
+  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Exception& AValue,
+      TZqLogIndent ALogIndent = liIndentNone) override;
+  void Log(const IntfRef<IZqLogData>& ALogData) override;
+
+  void AddAppender(const IntfRef<IZqLogAppender>& AAppender) override { FAppenders->Add(AAppender); }
+  void AddAppender(TZqLogBaseClass AAppender) override { FAppenders->Add(AAppender); }
+  void RemoveAppender(const IntfRef<IZqLogAppender>& AAppender) override { FAppenders->Remove(AAppender); }
+  void ClearAppenders() override { FAppenders->Clear(); }
+  TZqLogAppenderList* LockAppenders() override;
+  void UnLockAppenders() override { FAppenders->Unlock(); }
+
+ protected:
+  ~TZqLogger() override = default;
+  void AfterConstruction() override;
+  void BeforeDestruction() override;
+
+ private:
+  friend class TZqLoggerList;
+  friend class TZqLogAppenderList;
+  friend ZQ_API TZqLogger* Logger();
+
+  void DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue,
+      TZqLogIndent ALogIndent);
+  void WriteToAppenders(const UnicodeString& ASender, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
+      PZqDataRec AValue, TZqLogIndent ALogIndent);
+  IntfRef<TZqLogger> FindOrMakeChild(const UnicodeString& AName, bool& AMade);
+  void ClearChildLoggers();
+  bool LeaveParent();
+
+  // In this order, so that the children's list goes first at the end and the count on the parent last.
+  UnicodeString FName;
+  UnicodeString FFullName;
+  std::atomic<Integer> FRefCount = 0;
+  std::atomic<TZqLogger*> FParent;  // the same object as FParentLogger; emptied with it when the parent goes first
+  IntfRef<IZqLogger> FParentLogger;
+  std::atomic<bool> FParentLevel = true;
+  std::atomic<TZqLogLevel> FLevel = llDebug;
+  std::atomic<bool> FAdditive = true;
+  IntfRef<IZqLogConfigurator> FConfigurator;
+  TZqLogLock FLock;
+  TOwned<TZqLogAppenderList> FAppenders;
+  TZqLoggerList FChildLoggers;
+};
+
+/// The root logger, named "root", at level llDebug; made by the first call. Lives until the library stops.
+[[nodiscard]] ZQ_API TZqLogger* Logger();
+
+// ---------------------------------------------------------------------------------------- log components
+
+/// Base of appenders and layouts: a named component, made through its class, that lives by its count.
+class ZQ_API TZqLogBase : public Implements<TZqComponent, IZqLogBase> {
+ public:
+  /// AName becomes the component's name unless it is empty or begins with a digit. ALogger must outlive the object.
+  TZqLogBase(TZqLogger* ALogger, const UnicodeString& AName);
+  [[nodiscard]] TZqLogger* Logger() const noexcept { return FLogger; }
+  UnicodeString GetName() const override { return Name(); }
+  TComponent* Component() override { return this; }
+
+ protected:
+  ~TZqLogBase() override = default;
+  void AfterConstruction() override;
+  /// Freed by hand, the object first leaves the lists that hold it.
+  void BeforeDestruction() override;
+
+ private:
+  void LeaveLists();
+
+  TZqLogger* FLogger;
+};
+
+/// Classes by name, in order of registration.
+class ZQ_API TZqLogBaseClassList : public TObject {
+ public:
+  TZqLogBaseClassList() = default;
+  ~TZqLogBaseClassList() override = default;
+  /// Adds a class once.
+  void Add(TZqLogBaseClass AClass);
+  /// Whatever the case of the name; raises EListError if there is none.
+  [[nodiscard]] TZqLogBaseClass GetClass(const ShortString& AClassName) const;
+  [[nodiscard]] Integer Count() const noexcept { return static_cast<Integer>(FList.size()); }
+
+ private:
+  std::vector<TZqLogBaseClass> FList;
+};
+
+/// Made by the first call, which belongs in start-up code: it takes no lock.
+[[nodiscard]] ZQ_API TZqLogBaseClassList* RegisteredLayouts();
+[[nodiscard]] ZQ_API TZqLogBaseClassList* RegisteredAppenders();
+/// Every appender alive, in order of creation; a copy, for a moment.
+[[nodiscard]] ZQ_API std::vector<TZqLogBase*> LiveAppenders();
+
+inline constexpr ShortString ZqFileAppender = "TZqFileAppender";
+inline constexpr ShortString ZqRollingFileAppender = "TZqRollingFileAppender";
+inline constexpr ShortString ZqDailyRollingFileAppender = "TZqDailyRollingFileAppender";
+inline constexpr ShortString ZqLogViewerAppenderServer = "TZqLogViewerAppenderServer";
+inline constexpr ShortString ZqLogViewerAppenderClient = "TZqLogViewerAppenderClient";
+inline constexpr ShortString ZqSimpleLayout = "TZqSimpleLayout";
+inline constexpr ShortString ZqXmlLayout = "TZqXmlLayout";
+
+namespace uZqLogger {
+void Start();
+void Stop();
+}  // namespace uZqLogger
+
+}  // namespace zq

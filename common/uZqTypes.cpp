@@ -1,0 +1,813 @@
+#include "common/uZqTypes.h"
+
+#include <algorithm>
+#include <cstring>
+#include <limits>
+#include <optional>
+#include <span>
+#include <string>
+
+#include "runtime/core/utf8.h"
+#include "runtime/io/streams.h"
+#include "runtime/text/datetime.h"
+#include "runtime/text/format.h"
+#include "runtime/text/format_settings.h"
+#include "runtime/text/numbers.h"
+
+namespace zq {
+
+// ---- Encodings and code pages ---------------------------------------------------------------------------------------
+
+namespace {
+
+constexpr Word cUtf16LE = 1200;
+constexpr Word cUtf16BE = 1201;
+constexpr Word cUtf32LE = 12000;
+constexpr Word cUtf32BE = 12001;
+constexpr Word cUtf8 = 65001;
+
+struct TFlags {
+  Cardinal ToUnicode;
+  Cardinal FromUnicode;
+};
+
+// Code page 0 goes by the page that it stands for: the page decides which flags it bears.
+TFlags FlagsOf(Word ACodePage) noexcept {
+  switch (const Word Page = ACodePage == 0 ? GetACP() : ACodePage) {
+    case 42:
+    case 50220:
+    case 50221:
+    case 50222:
+    case 50225:
+    case 50227:
+    case 50229:
+    case 65000:
+    case cUtf8: return {0, 0};
+    default:
+      if (Page >= 57002 && Page <= 57011) return {0, 0};
+      return {MB_ERR_INVALID_CHARS, WC_COMPOSITECHECK | WC_DEFAULTCHAR | WC_SEPCHARS | WC_DISCARDNS};
+  }
+}
+
+const Byte* BytesOf(const RawByteString& AText) noexcept { return reinterpret_cast<const Byte*>(AText.data()); }
+Byte* BytesOf(RawByteString& AText) noexcept { return reinterpret_cast<Byte*>(AText.data()); }
+
+Integer Checked(Integer ACount) {
+  if (ACount == 0) RaiseLastOSError();
+  return ACount;
+}
+
+}  // namespace
+
+UnicodeString TZqEncoding::ConvertA(const AnsiString& ASource) { return ConvertA(ASource, 0); }
+
+UnicodeString TZqEncoding::ConvertA(const RawByteString& ASource, Word ASourceCodePage) {
+  return ConvertA(BytesOf(ASource), ASource.Length(), ASourceCodePage);
+}
+
+UnicodeString TZqEncoding::ConvertA(const Byte* ASource, Integer ASourceByteCnt, Word ASourceCodePage) {
+  UnicodeString Result;
+  if (ASource == nullptr || ASourceByteCnt == 0) return Result;
+  const Integer Needed = Checked(ConvertA(ASource, ASourceByteCnt, ASourceCodePage, nullptr, 0));
+  Result.SetLength(Needed);
+  Checked(ConvertA(ASource, ASourceByteCnt, ASourceCodePage, Result.data(), Needed));
+  if (ASourceByteCnt == -1) Result.SetLength(Needed - 1);
+  return Result;
+}
+
+RawByteString TZqEncoding::ConvertA(
+    const Byte* ASource, Integer ASourceByteCnt, Word ASourceCodePage, Word ADestCodePage) {
+  return ConvertW(ConvertA(ASource, ASourceByteCnt, ASourceCodePage), ADestCodePage);
+}
+
+Integer TZqEncoding::ConvertA(
+    const Byte* ASource, Integer ASourceByteCnt, Word ASourceCodePage, WideChar* ADest, Integer ADestCharCnt) {
+  if (ASource == nullptr || ASourceByteCnt == 0) return 0;
+  const auto* const Source = reinterpret_cast<const char*>(ASource);
+  // The service's set-up would cost more than a short text, so UTF-8 that is sure to fit goes straight to the codec.
+  if (ASourceCodePage == cUtf8 && ADest != nullptr && ASourceByteCnt > 0 && ADestCharCnt >= ASourceByteCnt)
+    return static_cast<Integer>(utf8::Decode(Source, static_cast<std::size_t>(ASourceByteCnt), ADest));
+  return MultiByteToWideChar(
+      ASourceCodePage, FlagsOf(ASourceCodePage).ToUnicode, Source, ASourceByteCnt, ADest, ADestCharCnt);
+}
+
+RawByteString TZqEncoding::ConvertW(const UnicodeString& ASource, Word ADestCodePage) {
+  return ConvertW(ASource.data(), ASource.Length(), ADestCodePage);
+}
+
+RawByteString TZqEncoding::ConvertW(const WideChar* ASource, Integer ASourceCharCnt, Word ADestCodePage) {
+  RawByteString Result;
+  if (ASourceCharCnt == 0) return Result;
+  const Integer Needed = Checked(ConvertW(ASource, ASourceCharCnt, nullptr, 0, ADestCodePage));
+  Result.SetLength(Needed);
+  Checked(ConvertW(ASource, ASourceCharCnt, BytesOf(Result), Needed, ADestCodePage));
+  SetCodePage(Result, ADestCodePage, false);
+  return Result;
+}
+
+Integer TZqEncoding::ConvertW(
+    const WideChar* ASource, Integer ASourceCharCnt, Byte* ADest, Integer ADestByteCnt, Word ADestCodePage) {
+  auto* const Dest = reinterpret_cast<char*>(ADest);
+  if (ADestCodePage == cUtf8 && ASource != nullptr && ADest != nullptr && ASourceCharCnt > 0 &&
+      ADestByteCnt / 3 >= ASourceCharCnt)
+    return static_cast<Integer>(utf8::Encode(ASource, static_cast<std::size_t>(ASourceCharCnt), Dest));
+  return WideCharToMultiByte(
+      ADestCodePage, FlagsOf(ADestCodePage).FromUnicode, ASource, ASourceCharCnt, Dest, ADestByteCnt);
+}
+
+namespace {
+
+Integer BufferCount(NativeUInt ASize) {
+  Assert(ASize <= static_cast<NativeUInt>(std::numeric_limits<Integer>::max()));
+  return static_cast<Integer>(ASize);
+}
+
+RawByteString FromUtf16(const UnicodeString& AText, Word ACodePage) {
+  RawByteString Result;
+  Result.SetLength(TZqEncoding::ConvertW(AText.data(), AText.Length(), nullptr, 0, ACodePage));
+  Result.SetLength(TZqEncoding::ConvertW(AText.data(), AText.Length(), BytesOf(Result), Result.Length(), ACodePage));
+  return Result;
+}
+
+}  // namespace
+
+RawByteString TZqEncoding::ConvertB(const void* ABuffer, NativeUInt ABufSize, Word ABufCodePage, Word AResultCodePage) {
+  Assert(AResultCodePage != cUtf16LE && AResultCodePage != cUtf16BE && AResultCodePage != cUtf32LE &&
+         AResultCodePage != cUtf32BE);
+  RawByteString Result;
+  if (ABufCodePage == AResultCodePage) {
+    Result.Str().assign(static_cast<const char*>(ABuffer), ABufSize);
+  } else if (ABufCodePage == cUtf16LE) {
+    Result = FromUtf16(ConvertB(ABuffer, ABufSize, ABufCodePage), AResultCodePage);
+  } else {
+    Result = ConvertA(static_cast<const Byte*>(ABuffer), BufferCount(ABufSize), ABufCodePage, AResultCodePage);
+  }
+  SetCodePage(Result, AResultCodePage, false);
+  return Result;
+}
+
+UnicodeString TZqEncoding::ConvertB(const void* ABuffer, NativeUInt ABufSize, Word ABufCodePage) {
+  const Integer Count = BufferCount(ABufSize);
+  if (ABufCodePage != cUtf16LE) return ConvertA(static_cast<const Byte*>(ABuffer), Count, ABufCodePage);
+  UnicodeString Result;
+  Result.SetLength(Count / 2);
+  if (!Result.IsEmpty()) std::memcpy(Result.data(), ABuffer, Result.size() * 2);  // the buffer needn't be aligned
+  return Result;
+}
+
+namespace {
+
+struct TCodePageName {
+  Word CodePage;
+  const char16_t* Name;
+};
+
+// Both lookups take the first row that fits: in the first block one name per number, then the further names by which a
+// number is found. The blanks at the end of two of them belong there.
+constexpr TCodePageName cCodePageNames[] = {{37, u"IBM037"}, {437, u"IBM437"}, {500, u"IBM500"}, {708, u"ASMO-708"},
+    {709, u"ASMO-709"}, {710, u"DOS-710"}, {720, u"DOS-720"}, {737, u"ibm737"}, {775, u"ibm775"}, {850, u"ibm850"},
+    {852, u"ibm852"}, {855, u"IBM855"}, {857, u"ibm857"}, {858, u"IBM00858"}, {860, u"IBM860"}, {861, u"ibm861"},
+    {862, u"DOS-862"}, {863, u"IBM863"}, {864, u"IBM864"}, {865, u"IBM865"}, {866, u"cp866"}, {869, u"ibm869"},
+    {870, u"IBM870"}, {874, u"windows-874"}, {875, u"cp875"}, {932, u"shift_jis"}, {936, u"gb2312"},
+    {949, u"ks_c_5601-1987"}, {950, u"big5"}, {1026, u"IBM1026"}, {1047, u"IBM01047"}, {1140, u"IBM01140"},
+    {1141, u"IBM01141"}, {1142, u"IBM01142"}, {1143, u"IBM01143"}, {1144, u"IBM01144"}, {1145, u"IBM01145"},
+    {1146, u"IBM01146"}, {1147, u"IBM01147"}, {1148, u"IBM01148"}, {1149, u"IBM01149"}, {1200, u"utf-16"},
+    {1201, u"unicodeFFFE"}, {1250, u"windows-1250"}, {1251, u"windows-1251"}, {1252, u"windows-1252"},
+    {1253, u"windows-1253"}, {1254, u"windows-1254"}, {1255, u"windows-1255"}, {1256, u"windows-1256"},
+    {1257, u"windows-1257"}, {1258, u"windows-1258"}, {1361, u"Johab"}, {10000, u"macintosh"},
+    {10001, u"x-mac-japanese"}, {10002, u"x-mac-chinesetrad"}, {10003, u"x-mac-korean"}, {10004, u"x-mac-arabic"},
+    {10005, u"x-mac-hebrew"}, {10006, u"x-mac-greek"}, {10007, u"x-mac-cyrillic"}, {10008, u"x-mac-chinesesimp"},
+    {10010, u"x-mac-romanian"}, {10017, u"x-mac-ukrainian"}, {10021, u"x-mac-thai"}, {10029, u"x-mac-ce"},
+    {10079, u"x-mac-icelandic"}, {10081, u"x-mac-turkish"}, {10082, u"x-mac-croatian"}, {12000, u"utf-32"},
+    {12001, u"utf-32BE"}, {20000, u"x-Chinese_CNS"}, {20001, u"x-cp20001"}, {20002, u"x_Chinese-Eten"},
+    {20003, u"x-cp20003"}, {20004, u"x-cp20004"}, {20005, u"x-cp20005"}, {20105, u"x-IA5"}, {20106, u"x-IA5-German"},
+    {20107, u"x-IA5-Swedish"}, {20108, u"x-IA5-Norwegian"}, {20127, u"us-ascii"}, {20261, u"x-cp20261"},
+    {20269, u"x-cp20269"}, {20273, u"IBM273"}, {20277, u"IBM277"}, {20278, u"IBM278"}, {20280, u"IBM280"},
+    {20284, u"IBM284"}, {20285, u"IBM285"}, {20290, u"IBM290"}, {20297, u"IBM297"}, {20420, u"IBM420"},
+    {20423, u"IBM423"}, {20424, u"IBM424"}, {20833, u"x-EBCDIC-KoreanExtended"}, {20838, u"IBM-Thai"},
+    {20866, u"koi8-r"}, {20871, u"IBM871"}, {20880, u"IBM880"}, {20905, u"IBM905"}, {20924, u"IBM00924"},
+    {20932, u"EUC-JP"}, {20936, u"x-cp20936"}, {20949, u"x-cp20949"}, {21025, u"cp1025"}, {21866, u"koi8-u"},
+    {28591, u"iso-8859-1"}, {28592, u"iso-8859-2"}, {28593, u"iso-8859-3"}, {28594, u"iso-8859-4"},
+    {28595, u"iso-8859-5"}, {28596, u"iso-8859-6"}, {28597, u"iso-8859-7"}, {28598, u"iso-8859-8"},
+    {28599, u"iso-8859-9"}, {28603, u"iso-8859-13"}, {28605, u"iso-8859-15"}, {29001, u"x-Europa"},
+    {38598, u"iso-8859-8-i"}, {50220, u"iso-2022-jp"}, {50221, u"csISO2022JP"}, {50222, u"iso-2022-jp"},
+    {50225, u"iso-2022-kr"}, {50227, u"x-cp50227"}, {51932, u"euc-jp"}, {51936, u"EUC-CN"}, {51949, u"euc-kr"},
+    {52936, u"hz-gb-2312"}, {54936, u"GB18030"}, {57002, u"x-iscii-de"}, {57003, u"x-iscii-be"}, {57004, u"x-iscii-ta"},
+    {57005, u"x-iscii-te"}, {57006, u"x-iscii-as"}, {57007, u"x-iscii-or"}, {57008, u"x-iscii-ka"},
+    {57009, u"x-iscii-ma"}, {57010, u"x-iscii-gu"}, {57011, u"x-iscii-pa"}, {65000, u"utf-7"}, {65001, u"utf-8"},
+
+    {866, u"ibm866"}, {932, u"cseucpkdfmtjapanese"}, {932, u"csshiftjis"},
+    {932, u"extended_unix_code_packed_format_for_japanese"}, {932, u"ms_kanji "}, {932, u"shift-jis"}, {932, u"x-euc"},
+    {932, u"x-euc-jp"}, {932, u"x-sjis"}, {936, u"chinese"}, {936, u"csgb2312 "}, {936, u"csiso58gb231280"},
+    {936, u"gb_2312-80"}, {936, u"iso-ir-58"}, {949, u"cseuckr"}, {949, u"csksc56011987"}, {949, u"iso-ir-149"},
+    {949, u"korean"}, {949, u"ks-c-5601"}, {949, u"ks-c-5601-1987"}, {949, u"ks_c_5601"}, {949, u"ks_c_5601-1989"},
+    {949, u"ksc-5601"}, {949, u"ksc5601"}, {949, u"ksc_5601"}, {950, u"csbig5"}, {950, u"x-x-big5"}, {1200, u"ucs-2"},
+    {1200, u"iso-10646-ucs-2"}, {1250, u"x-cp1250"}, {1251, u"x-cp1251"}, {1252, u"ansi_x3.4-1968"},
+    {1252, u"ansi_x3.4-1986"}, {1252, u"ascii"}, {1252, u"cp367"}, {1252, u"cp819"}, {1252, u"csascii"},
+    {1252, u"ibm367"}, {1252, u"ibm819"}, {1252, u"iso-ir-100"}, {1252, u"iso-ir-6"}, {1252, u"iso646-us"},
+    {1252, u"iso8859-1"}, {1252, u"iso_646.irv:1991"}, {1252, u"iso_8859-1"}, {1252, u"iso_8859-1:1987"},
+    {1252, u"latin1"}, {1252, u"us"}, {1255, u"csisolatinhebrew"}, {1255, u"hebrew"}, {1255, u"iso-ir-138"},
+    {1255, u"iso_8859-8"}, {1255, u"iso_8859-8:1988"}, {20866, u"cskoi8r"}, {28592, u"csisolatin2"},
+    {28592, u"iso-ir-101"}, {28592, u"iso8859-2"}, {28592, u"iso_8859-2"}, {28592, u"iso_8859-2:1987"}, {28592, u"l2"},
+    {28592, u"latin2"}, {50225, u"csiso2022kr"}};
+
+}  // namespace
+
+Word ZqCodePage(const UnicodeString& AName) {
+  if (AName.IsEmpty()) return 0;
+  for (const TCodePageName& Row : cCodePageNames)
+    if (SameText(Row.Name, AName)) return Row.CodePage;
+  throw Exception(u"No CodePage ID found for %s!", {AName});
+}
+
+UnicodeString ZqCodePage(Word ACodePage) {
+  for (const TCodePageName& Row : cCodePageNames)
+    if (Row.CodePage == ACodePage) return Row.Name;
+  throw Exception(u"No CodePage Name found for %d!", {ACodePage});
+}
+
+namespace {
+
+struct TDetected {
+  Word CodePage;
+  Integer MarkSize;
+};
+
+struct TMark {
+  std::span<const Byte> Bytes;
+  Word CodePage;
+};
+
+// In order: the mark of UTF-32 little-endian begins with that of UTF-16.
+constexpr TMark cMarks[] = {
+    {cZqUTF32BE, cUtf32BE},
+    {cZqUTF32LE, cUtf32LE},
+    {cZqUTF8, cUtf8},
+    {cZqUTF16BE, cUtf16BE},
+    {cZqUTF16LE, cUtf16LE},
+};
+
+TDetected Detect(std::span<const Byte> ABytes) noexcept {
+  for (const TMark& Mark : cMarks) {
+    const std::size_t Size = Mark.Bytes.size();
+    if (ABytes.size() >= Size && std::ranges::equal(Mark.Bytes, ABytes.first(Size)))
+      return {Mark.CodePage, static_cast<Integer>(Size)};
+  }
+  if (ABytes.size() >= 3 && ABytes[0] != 0 && ABytes[1] == 0) return {cUtf16LE, 0};
+  return {0, 0};
+}
+
+}  // namespace
+
+Word ZqGetCodePage(const void* ABuffer, Integer ASize) {
+  return Detect({static_cast<const Byte*>(ABuffer), static_cast<std::size_t>(std::max(ASize, 0))}).CodePage;
+}
+
+Word ZqGetCodePage(TStream* AStream) {
+  Assert(AStream != nullptr);
+  const Int64 Start = AStream->Position();
+  Byte Head[4];
+  const auto Count = static_cast<std::size_t>(AStream->Read(Head, sizeof(Head)));
+  const TDetected Detected = Detect(std::span(Head).first(Count));
+  AStream->SetPosition(Start + Detected.MarkSize);
+  return Detected.CodePage;
+}
+
+namespace {
+
+// The byte of code page 0 that AChar has there, AChar if it has none.
+WideChar AnsiByteOf(WideChar AChar) noexcept {
+  char Ansi = 0;
+  const Integer Count = LocaleCharsFromUnicode(0, WC_NO_BEST_FIT_CHARS, &AChar, 1, &Ansi, 1, "", nullptr);
+  return Count == 1 && Ansi != 0 ? static_cast<Byte>(Ansi) : AChar;
+}
+
+}  // namespace
+
+WideString ZqNormalizeString(const WideString& AValue, TNorm_Form AForm) {
+  const auto Normalized = [&](WideChar* ADest, Integer ACount) {
+    const Integer Written = NormalizeString(static_cast<int>(AForm), AValue.data(), AValue.Length(), ADest, ACount);
+    if (Written < 1) throw Exception(uZqTypes::_SNormalizeFailure);
+    return Written;
+  };
+  WideString Result;
+  Result.SetLength(Normalized(nullptr, 0));
+  Result.SetLength(Normalized(Result.data(), Result.Length()));
+  if (AForm == nfD)
+    for (WideChar& Unit : Result)
+      if (Unit > 127) Unit = AnsiByteOf(Unit);
+  return Result;
+}
+
+WideString ZqSimplifyString(const WideString& AValue) {
+  WideString Result;
+  for (const WideChar Unit : AValue) Result += ZqNormalizeString(WideString(1, Unit), nfD)[1];
+  return Result;
+}
+
+namespace {
+
+template <class TChar>
+TChar* NewCopy(std::basic_string_view<TChar> AText) {
+  const std::size_t Size = AText.size() * sizeof(TChar);
+  auto* const Result = static_cast<TChar*>(GetMem(Size + sizeof(TChar)));
+  std::memcpy(Result, AText.data(), Size);
+  Result[AText.size()] = TChar();
+  return Result;
+}
+
+}  // namespace
+
+AnsiChar* ZqStrNew(const AnsiString& AValue) { return NewCopy(AValue.View()); }
+WideChar* ZqStrNew(const WideString& AValue) { return AValue.IsEmpty() ? nullptr : NewCopy(AValue.View()); }
+AnsiChar* ZqStrNewA(const AnsiString& AValue) { return ZqStrNew(AValue); }
+AnsiChar* ZqStrNewA(const WideString& AValue) { return ZqStrNew(AnsiString(TZqEncoding::ConvertW(AValue, 0))); }
+WideChar* ZqStrNewW(const AnsiString& AValue) { return ZqStrNew(WideString(TZqEncoding::ConvertA(AValue))); }
+WideChar* ZqStrNewW(const WideString& AValue) { return ZqStrNew(AValue); }
+void ZqStrDispose(AnsiChar* AValue) noexcept { FreeMem(AValue); }
+void ZqStrDispose(WideChar* AValue) noexcept { FreeMem(AValue); }
+
+// ---- Type kinds -----------------------------------------------------------------------------------------------------
+
+namespace {
+
+constexpr TVarType cNoVarType = 0xFFFF;
+
+struct TKindFacts {
+  TZqMainTypeKind Main;
+  TVarType VarType;
+};
+
+constexpr TEnumTable<TZqTypeKind, TKindFacts, 36> cKindFacts{{
+    {mtkUnknown, varEmpty},      // rtkUnknown
+    {mtkInteger, varByte},       // rtkByte
+    {mtkInteger, varWord},       // rtkWord
+    {mtkInteger, varLongWord},   // rtkLongWord
+    {mtkInteger, varUInt64},     // rtkUInt64
+    {mtkInteger, varShortInt},   // rtkShortInt
+    {mtkInteger, varSmallint},   // rtkSmallInt
+    {mtkInteger, varInteger},    // rtkLongInt
+    {mtkInteger, varInt64},      // rtkInt64
+    {mtkFloat, varSingle},       // rtkSingle
+    {mtkFloat, varDouble},       // rtkDouble
+    {mtkFloat, varCurrency},     // rtkExtended
+    {mtkString, varString},      // rtkChar
+    {mtkString, varString},      // rtkAChar
+    {mtkString, varUString},     // rtkWChar
+    {mtkString, varString},      // rtkString
+    {mtkString, varString},      // rtkAString
+    {mtkString, varUString},     // rtkWString
+    {mtkBoolean, varBoolean},    // rtkBoolean
+    {mtkInteger, varInteger},    // rtkEnumeration
+    {mtkInteger, varDate},       // rtkSet
+    {mtkDateTime, varDate},      // rtkDate
+    {mtkDateTime, varDate},      // rtkTime
+    {mtkDateTime, varDate},      // rtkDatetime
+    {mtkOther, varVariant},      // rtkVariant
+    {mtkArray, cNoVarType},      // rtkArray
+    {mtkArray, cNoVarType},      // rtkDynArray
+    {mtkStructure, cNoVarType},  // rtkRecord
+    {mtkStructure, varObject},   // rtkObject
+    {mtkOther, varUnknown},      // rtkInterface
+    {mtkOther, cNoVarType},      // rtkPointer
+    {mtkOther, cNoVarType},      // rtkMethod
+    {mtkOther, cNoVarType},      // rtkProcedure
+    {mtkOther, cNoVarType},      // rtkException
+    {mtkOther, cNoVarType},      // rtkClass
+    {mtkOther, cNoVarType},      // rtkClassRef
+}};
+
+struct TVarTypeKind {
+  TVarType VarType;
+  TZqTypeKind Kind;
+};
+
+constexpr TVarTypeKind cVarTypeKinds[] = {
+    {varSmallint, rtkSmallInt},
+    {varInteger, rtkLongInt},
+    {varSingle, rtkSingle},
+    {varDouble, rtkDouble},
+    {varCurrency, rtkExtended},
+    {varDate, rtkDatetime},
+    {varOleStr, rtkWString},
+    {varDispatch, rtkInterface},
+    {varBoolean, rtkBoolean},
+    {varVariant, rtkVariant},
+    {varUnknown, rtkInterface},
+    {varDecimal, rtkDouble},
+    {varShortInt, rtkShortInt},
+    {varByte, rtkByte},
+    {varWord, rtkWord},
+    {varLongWord, rtkLongWord},
+    {varInt64, rtkInt64},
+    {varUInt64, rtkUInt64},
+    {varStrArg, rtkWString},
+    {varString, rtkString},
+    {varAny, rtkVariant},
+    {varUString, rtkWString},
+};
+
+// By the number of the variant type; rtkUnknown where none is listed.
+constexpr auto cKindsByVarType = [] {
+  std::array<TZqTypeKind, varUString + 1> Result{};
+  for (const TVarTypeKind& Row : cVarTypeKinds) Result[Row.VarType] = Row.Kind;
+  return Result;
+}();
+
+constexpr std::array<TZqTypeKind, 22> cKindsByTypeKind{
+    rtkUnknown,      // tkUnknown
+    rtkLongInt,      // tkInteger
+    rtkChar,         // tkChar
+    rtkEnumeration,  // tkEnumeration
+    rtkExtended,     // tkFloat
+    rtkString,       // tkString
+    rtkSet,          // tkSet
+    rtkClass,        // tkClass
+    rtkMethod,       // tkMethod
+    rtkWChar,        // tkWChar
+    rtkAString,      // tkLString
+    rtkWString,      // tkWString
+    rtkVariant,      // tkVariant
+    rtkArray,        // tkArray
+    rtkRecord,       // tkRecord
+    rtkInterface,    // tkInterface
+    rtkInt64,        // tkInt64
+    rtkDynArray,     // tkDynArray
+    rtkWString,      // tkUString
+    rtkClassRef,     // tkClassRef
+    rtkPointer,      // tkPointer
+    rtkProcedure,    // tkProcedure
+};
+
+}  // namespace
+
+TZqMainTypeKind ZqMainTypeKind(TVarType AVarType) noexcept {
+  const TZqTypeKind Kind = ZqTypeKind(AVarType);
+  return Kind == rtkVariant ? mtkUnknown : ZqMainTypeKind(Kind);
+}
+
+TZqMainTypeKind ZqMainTypeKind(TZqTypeKind AKind) noexcept { return cKindFacts[AKind].Main; }
+
+TZqTypeKind ZqTypeKind(TVarType AVarType) noexcept {
+  if ((AVarType & varArray) != 0) return rtkDynArray;
+  return AVarType < cKindsByVarType.size() ? cKindsByVarType[AVarType] : rtkUnknown;
+}
+
+TZqTypeKind ZqTypeKind(TTypeKind AKind) {
+  const auto Ordinal = static_cast<std::size_t>(AKind);
+  if (Ordinal < cKindsByTypeKind.size()) return cKindsByTypeKind[Ordinal];
+  const UnicodeString Name = GetEnumName(TypeInfo<TTypeKind>(), static_cast<Integer>(Ordinal));
+  AssertionFailed(Format(u"The type %s cannot be converted to a TZqTypeKind!", {Name}));
+}
+
+TVarType ZqTypeKindToVarType(TZqTypeKind AKind) {
+  const TVarType Result = cKindFacts[AKind].VarType;
+  if (Result == cNoVarType) throw Exception(u"The given datatype cannot be converted to a Variant Type!");
+  return Result;
+}
+
+bool ZqIsSimpleTypeKind(TTypeKind AKind) noexcept {
+  constexpr TSet<TTypeKind> cSimple{tkInteger, tkChar, tkEnumeration, tkFloat, tkString, tkSet, tkWChar, tkLString,
+      tkWString, tkVariant, tkInt64, tkUString};
+  return cSimple.Contains(AKind);
+}
+
+bool ZqIsSimpleTypeKind(TZqTypeKind AKind) noexcept { return TZqSimpleTypeKind::Contains(AKind); }
+
+bool ZqIsSimpleTypeKind(TZqMainTypeKind AKind) noexcept { return TSubrange<mtkInteger, mtkDateTime>::Contains(AKind); }
+
+// ---- Variants, strictly ---------------------------------------------------------------------------------------------
+
+namespace {
+
+using TKinds = TSet<TZqTypeKind>;
+constexpr TKinds cByteKinds{rtkByte, rtkShortInt};
+constexpr TKinds cWordKinds = cByteKinds + TKinds{rtkWord, rtkSmallInt};
+constexpr TKinds cLongKinds = cWordKinds + TKinds{rtkLongWord, rtkLongInt};
+constexpr TKinds cSingleKinds = cLongKinds + TKinds{rtkSingle};
+constexpr TKinds cDoubleKinds = cSingleKinds + TKinds{rtkDouble};
+
+[[noreturn]] void RaiseInvalid(const char16_t* AType) {
+  throw EConvertError(UnicodeString(u"The given value is not a valid ") + AType + u" value!");
+}
+
+// What AValue's type is accepted for, by whichever kind tells: ADefValue for an unknown one.
+template <class TResult, class TKind, class TDefault, class TRead>
+TResult Strict(const Variant& AValue, TKind AKind, const TSet<TKind>& AAccepted, const TDefault& ADefValue,
+    const char16_t* AType, TRead ARead) {
+  if (AKind == TKind()) return static_cast<TResult>(ADefValue);
+  if (!AAccepted.Contains(AKind)) RaiseInvalid(AType);
+  return static_cast<TResult>(ARead(AValue));
+}
+
+template <class TResult, class TDefault, class TRead>
+TResult StrictNumber(
+    const Variant& AValue, TDefault ADefValue, const TKinds& AAccepted, const char16_t* AType, TRead ARead) {
+  return Strict<TResult>(AValue, ZqTypeKind(VarType(AValue)), AAccepted, ADefValue, AType, ARead);
+}
+
+template <class TText, class TRead>
+TText StrictText(const Variant& AValue, const TText& ADefValue, TRead ARead) {
+  const TSet<TZqMainTypeKind> cText{mtkString};
+  return Strict<TText>(AValue, ZqMainTypeKind(VarType(AValue)), cText, ADefValue, u"string", ARead);
+}
+
+AnsiString ToAnsi(const UnicodeString& AText) { return AnsiString(TZqEncoding::ConvertW(AText, 0)); }
+
+Double VarToDouble(const Variant& AValue) { return static_cast<Double>(VarToReal(AValue)); }
+
+}  // namespace
+
+ShortInt ZqVarShortint(const Variant& AValue, Integer ADefValue) {
+  return StrictNumber<ShortInt>(AValue, ADefValue, cByteKinds, u"shortint", VarToInteger);
+}
+
+SmallInt ZqVarSmallint(const Variant& AValue, Integer ADefValue) {
+  const bool Fits = ZqTypeKind(VarType(AValue)) == rtkLongInt && VarToInteger(AValue) <= 32767;
+  const TKinds Accepted = Fits ? cWordKinds + TKinds{rtkLongInt} : cWordKinds;
+  return StrictNumber<SmallInt>(AValue, ADefValue, Accepted, u"smallint", VarToInteger);
+}
+
+Integer ZqVarLongInt(const Variant& AValue, Integer ADefValue) {
+  return StrictNumber<Integer>(AValue, ADefValue, cLongKinds, u"longword", VarToInteger);
+}
+
+Integer ZqVarInt(const Variant& AValue, Integer ADefValue) { return ZqVarLongInt(AValue, ADefValue); }
+
+Int64 ZqVarInt64(const Variant& AValue, Integer ADefValue) {
+  return StrictNumber<Int64>(AValue, ADefValue, cLongKinds + TKinds{rtkInt64}, u"int64", VarToInt64);
+}
+
+Byte ZqVarByte(const Variant& AValue, Integer ADefValue) {
+  return StrictNumber<Byte>(AValue, ADefValue, cByteKinds, u"byte", VarToInteger);
+}
+
+Word ZqVarWord(const Variant& AValue, Integer ADefValue) {
+  return StrictNumber<Word>(AValue, ADefValue, cWordKinds, u"word", VarToInteger);
+}
+
+Cardinal ZqVarLongword(const Variant& AValue, Integer ADefValue) {
+  return StrictNumber<Cardinal>(AValue, ADefValue, cLongKinds, u"longword", VarToInt64);
+}
+
+Single ZqVarSingle(const Variant& AValue, Single ADefValue) {
+  return StrictNumber<Single>(AValue, ADefValue, cSingleKinds, u"single", VarToReal);
+}
+
+Double ZqVarDouble(const Variant& AValue, Double ADefValue) {
+  return StrictNumber<Double>(AValue, ADefValue, cDoubleKinds, u"double", VarToReal);
+}
+
+Extended ZqVarExtended(const Variant& AValue, Double ADefValue) {
+  return StrictNumber<Extended>(AValue, ADefValue, cDoubleKinds + TKinds{rtkExtended}, u"extended", VarToReal);
+}
+
+TDateTime ZqVarDate(const Variant& AValue, TDateTime ADefValue) {
+  constexpr TKinds cDates = cDoubleKinds + TKinds{rtkDate, rtkTime, rtkDatetime};
+  return StrictNumber<TDateTime>(AValue, ADefValue, cDates, u"datetime", VarToDouble);
+}
+
+UnicodeString ZqVarStr(const Variant& AValue, const UnicodeString& ADefValue) {
+  return StrictText(AValue, ADefValue, VarToUStr);
+}
+
+AnsiString ZqVarStrA(const Variant& AValue, const AnsiString& ADefValue) {
+  return StrictText(AValue, ADefValue, [](const Variant& AText) { return ToAnsi(VarToUStr(AText)); });
+}
+
+WideString ZqVarStrW(const Variant& AValue, const WideString& ADefValue) {
+  return StrictText(AValue, ADefValue, VarToWStr);
+}
+
+Boolean ZqVarBool(const Variant& AValue, Boolean ADefValue) {
+  switch (ZqMainTypeKind(VarType(AValue))) {
+    case mtkUnknown: return ADefValue;
+    case mtkInteger: return AValue != Variant(0);
+    case mtkString: return ZqStrToBool(VarToUStr(AValue));
+    case mtkBoolean: return VarToBool(AValue);
+    default: RaiseInvalid(u"boolean");
+  }
+}
+
+// ---- Variants, converted --------------------------------------------------------------------------------------------
+
+namespace {
+
+// AConvert gives what AValue is by its main kind, nothing where that can't be converted.
+template <class TResult, class TDefault, class TConvert>
+TResult Converted(
+    const Variant& AValue, const TDefault& ADefValue, bool ARaiseError, const char16_t* AType, TConvert AConvert) {
+  try {
+    const TZqMainTypeKind Kind = ZqMainTypeKind(VarType(AValue));
+    if (Kind != mtkUnknown) {
+      if (std::optional<TResult> Result = AConvert(Kind)) return *std::move(Result);
+      if (ARaiseError) RaiseInvalid(AType);
+    }
+  } catch (const Exception&) {
+    if (ARaiseError) throw;
+  }
+  return static_cast<TResult>(ADefValue);
+}
+
+template <class TResult, class TRead, class TParse>
+TResult ToOrdinal(
+    const Variant& AValue, Integer ADefValue, bool ARaiseError, const char16_t* AType, TRead ARead, TParse AParse) {
+  const auto Convert = [&](TZqMainTypeKind AKind) -> std::optional<TResult> {
+    switch (AKind) {
+      case mtkInteger: return static_cast<TResult>(ARead(AValue));
+      case mtkString: return static_cast<TResult>(AParse(VarToUStr(AValue)));
+      case mtkBoolean: return static_cast<TResult>(ZqVarBool(AValue, false));
+      default: return std::nullopt;
+    }
+  };
+  return Converted<TResult>(AValue, ADefValue, ARaiseError, AType, Convert);
+}
+
+enum class TDates : bool { Invalid, Number };
+
+template <class TResult, class TParse>
+TResult ToReal(const Variant& AValue, const auto& ADefValue, bool ARaiseError, const char16_t* AType, TDates ADates,
+    TParse AParse) {
+  const auto Convert = [&](TZqMainTypeKind AKind) -> std::optional<TResult> {
+    if (AKind == mtkString) return static_cast<TResult>(AParse(VarToUStr(AValue)));
+    if (AKind == mtkInteger || AKind == mtkFloat || (AKind == mtkDateTime && ADates == TDates::Number))
+      return static_cast<TResult>(VarToReal(AValue));
+    return std::nullopt;
+  };
+  return Converted<TResult>(AValue, ADefValue, ARaiseError, AType, Convert);
+}
+
+TDateTime ParseDate(const UnicodeString& AText) {
+  if (AText.Length() < 10 || AText[5] != u'-' || AText[8] != u'-') return StrToDate(AText);
+  TFormatSettings Settings = GetLocaleFormatSettings();
+  Settings.ShortDateFormat = u"yyyy-mm-dd";
+  Settings.DateSeparator = u'-';
+  return StrToDate(AText, Settings);
+}
+
+// Text of what is neither text nor an array.
+std::optional<UnicodeString> PlainText(const Variant& AValue, TZqMainTypeKind AKind) {
+  switch (AKind) {
+    case mtkInteger: return IntToStr(VarToInt64(AValue));
+    case mtkFloat: return FloatToStr(VarToReal(AValue));
+    case mtkBoolean: return BoolToStr(VarToBool(AValue), true);
+    case mtkDateTime: return DateTimeToStr(VarToDouble(AValue));
+    default: return std::nullopt;
+  }
+}
+
+UnicodeString ArrayText(const Variant& AArray, const UnicodeString& ADefValue, bool ARaiseError) {
+  if (VarArrayDimCount(AArray) != 1) {
+    if (ARaiseError) throw EConvertError(u"The given array is not a to-string convertable value!");
+    return ADefValue;
+  }
+  UnicodeString Result;
+  const Integer High = VarArrayHighBound(AArray, 1);
+  for (Integer i = VarArrayLowBound(AArray, 1); i <= High; ++i)
+    Result += ZqVarToStr(AArray[i], ADefValue, ARaiseError) + u"\r\n";
+  return Result;
+}
+
+}  // namespace
+
+ShortInt ZqVarToShortint(const Variant& AValue, Integer ADefValue, Boolean ARaiseError) {
+  return ToOrdinal<ShortInt>(AValue, ADefValue, ARaiseError, u"shortint", VarToInteger, StrToInt);
+}
+
+SmallInt ZqVarToSmallint(const Variant& AValue, Integer ADefValue, Boolean ARaiseError) {
+  return ToOrdinal<SmallInt>(AValue, ADefValue, ARaiseError, u"smalling", VarToInteger, StrToInt);
+}
+
+Integer ZqVarToLongInt(const Variant& AValue, Integer ADefValue, Boolean ARaiseError) {
+  return ToOrdinal<Integer>(AValue, ADefValue, ARaiseError, u"LongInt", VarToInteger, StrToInt);
+}
+
+Integer ZqVarToInt(const Variant& AValue, Integer ADefValue, Boolean ARaiseError) {
+  return ZqVarToLongInt(AValue, ADefValue, ARaiseError);
+}
+
+Int64 ZqVarToInt64(const Variant& AValue, Integer ADefValue, Boolean ARaiseError) {
+  return ToOrdinal<Int64>(AValue, ADefValue, ARaiseError, u"Int64", VarToInt64, StrToInt64);
+}
+
+Byte ZqVarToByte(const Variant& AValue, Integer ADefValue, Boolean ARaiseError) {
+  return ToOrdinal<Byte>(AValue, ADefValue, ARaiseError, u"Byte", VarToInteger, StrToInt);
+}
+
+Word ZqVarToWord(const Variant& AValue, Integer ADefValue, Boolean ARaiseError) {
+  return ToOrdinal<Word>(AValue, ADefValue, ARaiseError, u"Word", VarToInteger, StrToInt);
+}
+
+Cardinal ZqVarToLongword(const Variant& AValue, Integer ADefValue, Boolean ARaiseError) {
+  return ToOrdinal<Cardinal>(AValue, ADefValue, ARaiseError, u"LongWord", VarToInt64, StrToInt);
+}
+
+Single ZqVarToSingle(const Variant& AValue, Single ADefValue, Boolean ARaiseError) {
+  return ToReal<Single>(AValue, ADefValue, ARaiseError, u"Single", TDates::Invalid, ZqStrToFloat);
+}
+
+Double ZqVarToDouble(const Variant& AValue, Double ADefValue, Boolean ARaiseError) {
+  return ToReal<Double>(AValue, ADefValue, ARaiseError, u"Double", TDates::Number, ZqStrToFloat);
+}
+
+Extended ZqVarToExtended(const Variant& AValue, Double ADefValue, Boolean ARaiseError) {
+  const auto Parse = [](const UnicodeString& AText) { return StrToFloat(AText); };
+  return ToReal<Extended>(AValue, ADefValue, ARaiseError, u"Extended", TDates::Number, Parse);
+}
+
+TDateTime ZqVarToDate(const Variant& AValue, TDateTime ADefValue, Boolean ARaiseError) {
+  return ToReal<Double>(AValue, ADefValue, ARaiseError, u"Date", TDates::Number, ParseDate);
+}
+
+Boolean ZqVarToBool(const Variant& AValue, Boolean ADefValue, Boolean ARaiseError) {
+  const auto Convert = [&](TZqMainTypeKind AKind) -> std::optional<Boolean> {
+    switch (AKind) {
+      case mtkInteger: return (VarToInteger(AValue) & 0xFF) != 0;
+      case mtkString: return ZqStrToBool(VarToUStr(AValue));
+      case mtkBoolean: return VarToBool(AValue);
+      default: return std::nullopt;
+    }
+  };
+  return Converted<Boolean>(AValue, ADefValue, ARaiseError, u"Boolean", Convert);
+}
+
+UnicodeString ZqVarToStr(const Variant& AValue, const UnicodeString& ADefValue, Boolean ARaiseError) {
+  const auto Convert = [&](TZqMainTypeKind AKind) -> std::optional<UnicodeString> {
+    if (AKind == mtkString) return VarToUStr(AValue);
+    if (AKind == mtkArray) return ArrayText(AValue, ADefValue, ARaiseError);
+    return PlainText(AValue, AKind);
+  };
+  return Converted<UnicodeString>(AValue, ADefValue, ARaiseError, u"String", Convert);
+}
+
+AnsiString ZqVarToAStr(const Variant& AValue, const AnsiString& ADefValue, Boolean ARaiseError) {
+  const auto Convert = [&](TZqMainTypeKind AKind) -> std::optional<AnsiString> {
+    if (AKind == mtkString) return VarToLStr(AValue);
+    if (const auto Text = PlainText(AValue, AKind)) return ToAnsi(*Text);
+    return std::nullopt;
+  };
+  return Converted<AnsiString>(AValue, ADefValue, ARaiseError, u"AnsiString", Convert);
+}
+
+WideString ZqVarToWStr(const Variant& AValue, const WideString& ADefValue, Boolean ARaiseError) {
+  const auto Convert = [&](TZqMainTypeKind AKind) -> std::optional<WideString> {
+    if (AKind == mtkString) return VarToWStr(AValue);
+    return PlainText(AValue, AKind);
+  };
+  return Converted<WideString>(AValue, ADefValue, ARaiseError, u"WideString", Convert);
+}
+
+Boolean ZqVarIsEmpty(const Variant& AValue) {
+  switch (ZqMainTypeKind(VarType(AValue))) {
+    case mtkInteger:
+    case mtkFloat:
+    case mtkDateTime: return AValue == Variant(0);
+    case mtkString: return Trim(VarToUStr(AValue)).IsEmpty();
+    case mtkBoolean: return false;
+    case mtkArray: return VarArrayHighBound(AValue, 1) == -1;
+    default: return VarIsEmpty(AValue) || VarIsNull(AValue);
+  }
+}
+
+Integer ZqVarArrayCount(const Variant& AValue) { return VarIsArray(AValue) ? VarArrayHighBound(AValue, 1) + 1 : 0; }
+
+TZqNullableBool ZqNullableBool(const Variant& AValue) {
+  if (ZqMainTypeKind(VarType(AValue)) != mtkBoolean) return nbNull;
+  return VarToBool(AValue) ? nbYes : nbNo;
+}
+
+// ---- Text of Booleans and numbers -----------------------------------------------------------------------------------
+
+namespace {
+
+// The locale's, but with the other decimal separator.
+TFormatSettings SwappedSettings() {
+  TFormatSettings Result = GetLocaleFormatSettings();
+  const bool Point = Result.DecimalSeparator == u'.';
+  Result.DecimalSeparator = Point ? u',' : u'.';
+  Result.ThousandSeparator = Point ? u'.' : u',';
+  return Result;
+}
+
+}  // namespace
+
+Boolean ZqStrToBool(const UnicodeString& AValue) noexcept {
+  return !AValue.IsEmpty() && CharInSet(AValue[1], TZqAnsiCharSet{'1', 'T', 't', 'Y', 'y'});
+}
+
+UnicodeString ZqBoolToStr(Boolean AValue, const UnicodeString& ATrue, const UnicodeString& AFalse) {
+  return AValue ? ATrue : AFalse;
+}
+
+Extended ZqStrToFloat(const UnicodeString& AValue) {
+  Extended Result = 0;
+  return TryStrToFloat(AValue, Result) ? Result : StrToFloat(AValue, SwappedSettings());
+}
+
+Extended ZqStrToFloatDef(const UnicodeString& AValue, Extended ADefValue) {
+  Extended Result = 0;
+  if (TryStrToFloat(AValue, Result) || TryStrToFloat(AValue, Result, SwappedSettings())) return Result;
+  return ADefValue;
+}
+
+}  // namespace zq

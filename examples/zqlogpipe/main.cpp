@@ -1,0 +1,292 @@
+// zqlogpipe: logs each line of its input through rZqCommon into a file that rolls by size.
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cctype>
+#include <cerrno>
+#include <charconv>
+#include <chrono>
+#include <cstdio>
+#include <cstring>
+#include <iterator>
+#include <limits>
+#include <optional>
+#include <stdexcept>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "common/uZqLogAppenders.h"
+#include "common/uZqLogLayouts.h"
+#include "common/uZqLogger.h"
+#include "runtime/core/utf8.h"
+
+namespace {
+
+using namespace zq;
+
+constexpr char cHelp[] =
+    "usage: zqlogpipe --file FILE [option...] [INPUT...]\n"
+    "\n"
+    "Logs each line of the INPUT files, or of standard input, into FILE. INPUT may be - for standard input.\n"
+    "\n"
+    "  --file FILE       log file; missing folders are made. May be given again for a further log file\n"
+    "  --max-size BYTES  a file that has reached this size is rolled, 0 for never (10485760)\n"
+    "  --backups COUNT   files of the series, FILE among them, 1 to 65535 (5)\n"
+    "  --no-append       begin a new FILE; one that exists becomes a backup\n"
+    "  --logger NAME     dotted path of the logger below the root (zqlogpipe)\n"
+    "  --level LEVEL     level of the lines: trace, debug, info, warn, error, fatal (info)\n"
+    "  --detect-level    the first such word in a line decides its level, whatever its case; --level where there is "
+    "none\n"
+    "  --help            this text\n"
+    "\n"
+    "A line ends at LF, or at the end of its input; it may have any length, and all other bytes are its text. The log "
+    "is\n"
+    "UTF-8: a byte that is no part of valid UTF-8 is taken as the character of that code (U+0080 to U+00FF), as in\n"
+    "ISO 8859-1. The last line on standard error tells what was done. Exit status: 0, 1 for a failure, 2 for a wrong "
+    "use.\n";
+
+class TUsageError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+struct TOptions {
+  std::vector<std::string> Files;
+  std::vector<std::string> Inputs;
+  Cardinal MaxSize = 10485760;
+  Word Backups = 5;
+  bool Append = true;
+  std::string Logger = "zqlogpipe";
+  TZqLogLevel Level = llInfo;
+  bool DetectLevel = false;
+  bool Help = false;
+};
+
+struct TLevelWord {
+  std::string_view Word;
+  TZqLogLevel Level;
+};
+constexpr TLevelWord cLevels[] = {{"trace", llTrace}, {"debug", llDebug}, {"info", llInfo}, {"warn", llWarn},
+    {"warning", llWarn}, {"error", llError}, {"fatal", llFatal}};
+
+bool SameWord(std::string_view A, std::string_view B) {
+  return std::equal(
+      A.begin(), A.end(), B.begin(), B.end(), [](unsigned char a, unsigned char b) { return std::tolower(a) == b; });
+}
+
+std::optional<TZqLogLevel> LevelOf(std::string_view AWord) {
+  for (const TLevelWord& Row : cLevels)
+    if (SameWord(AWord, Row.Word)) return Row.Level;
+  return std::nullopt;
+}
+
+std::optional<TZqLogLevel> DetectLevel(std::string_view ALine) {
+  const auto IsLetter = [](unsigned char c) { return std::isalpha(c) != 0 || c >= 0x80; };
+  for (auto From = ALine.begin(); From != ALine.end();) {
+    From = std::find_if(From, ALine.end(), IsLetter);
+    const auto To = std::find_if_not(From, ALine.end(), IsLetter);
+    if (const auto Level = LevelOf({From, To})) return Level;
+    From = To;
+  }
+  return std::nullopt;
+}
+
+template <class T>
+T Number(std::string_view AOption, std::string_view AText, T ALeast) {
+  T Result = 0;
+  const auto [End, Error] = std::from_chars(AText.data(), AText.data() + AText.size(), Result);
+  if (Error != std::errc() || End != AText.data() + AText.size() || Result < ALeast)
+    throw TUsageError(std::string(AOption) + " takes a whole number from " + std::to_string(ALeast) + " to " +
+                      std::to_string(std::numeric_limits<T>::max()) + ", not '" + std::string(AText) + "'");
+  return Result;
+}
+
+TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
+  TOptions Result;
+  for (std::size_t i = 0; i < AWords.size(); ++i) {
+    const std::string_view Word = AWords[i];
+    const auto Value = [&] {
+      if (++i == AWords.size()) throw TUsageError(std::string(Word) + " needs a value");
+      return std::string(AWords[i]);
+    };
+    if (Word == "--file") Result.Files.push_back(Value());
+    else if (Word == "--max-size") Result.MaxSize = Number<Cardinal>(Word, Value(), 0);
+    else if (Word == "--backups") Result.Backups = Number<zq::Word>(Word, Value(), 1);
+    else if (Word == "--no-append") Result.Append = false;
+    else if (Word == "--logger") Result.Logger = Value();
+    else if (Word == "--detect-level") Result.DetectLevel = true;
+    else if (Word == "--help") Result.Help = true;
+    else if (Word == "--level") {
+      const std::string Text = Value();
+      const auto Level = LevelOf(Text);
+      if (!Level) throw TUsageError("--level takes trace, debug, info, warn, error or fatal, not '" + Text + "'");
+      Result.Level = *Level;
+    } else if (Word == "--")
+      Result.Inputs.insert(Result.Inputs.end(), AWords.begin() + static_cast<std::ptrdiff_t>(i) + 1, AWords.end()),
+          i = AWords.size();
+    else if (Word.size() > 1 && Word.front() == '-') throw TUsageError("unknown option '" + std::string(Word) + "'");
+    else Result.Inputs.emplace_back(Word);
+  }
+  if (Result.Files.empty() && !Result.Help) throw TUsageError("--file is needed");
+  return Result;
+}
+
+/// Counts rolls, and keeps the failures that a logger never shows.
+class TPipeAppender : public TZqRollingFileAppender {
+ public:
+  using TZqRollingFileAppender::TZqRollingFileAppender;
+  void RollOver() override {
+    TZqRollingFileAppender::RollOver();
+    ++Rolls;
+  }
+  void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override {
+    try {
+      TZqRollingFileAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+      ++Written;
+    } catch (const Exception& e) {
+      if (Failed++ == 0) Failure = e.Message();
+      throw;
+    }
+  }
+  std::size_t Rolls = 0;
+  std::size_t Written = 0;
+  std::size_t Failed = 0;
+  UnicodeString Failure;
+
+ protected:
+  ~TPipeAppender() override = default;
+};
+
+/// The text of a line: UTF-8, with each byte that is none taken as the character of its code.
+UnicodeString TextOf(std::string_view ALine) {
+  std::u16string Result = utf8::Decode(ALine, utf8::TMalformed::Escape);
+  for (Char& c : Result)
+    if (c >= 0xDC80 && c <= 0xDCFF) c &= 0xFF;
+  return Result;
+}
+
+class TPipe {
+ public:
+  explicit TPipe(const TOptions& AOptions)
+      : FOptions(AOptions), FLogger(Logger()->GetLogger(FromUTF8(AOptions.Logger))) {
+    FLogger->SetLevel(llAll);
+    FLogger->SetAdditive(false);
+    for (const std::string& File : AOptions.Files) AddAppender(File);
+  }
+
+  void Run(const std::string& AInput) {
+    const bool Standard = AInput == "-";
+    const int Handle = Standard ? STDIN_FILENO : ::open(AInput.c_str(), O_RDONLY | O_CLOEXEC);
+    if (Handle < 0) throw std::runtime_error(Reason(AInput));
+    std::string Rest;
+    ssize_t Got = 0;
+    std::vector<char> Block(1 << 16);
+    while ((Got = ::read(Handle, Block.data(), Block.size())) > 0 || (Got < 0 && errno == EINTR))
+      if (Got > 0) Split(Rest, {Block.data(), static_cast<std::size_t>(Got)});
+    const std::string Fault = Got < 0 ? Reason(Standard ? "standard input" : AInput) : "";
+    if (!Standard) ::close(Handle);
+    if (!Rest.empty()) LogLine(Rest);
+    if (!Fault.empty()) throw std::runtime_error(Fault);
+  }
+
+  /// Ends the files, so that what fails there is told too.
+  void Finish() {
+    for (const auto& Appender : FAppenders) Appender->Close();
+  }
+
+  [[nodiscard]] std::size_t Read() const { return FRead; }
+  [[nodiscard]] std::size_t Sum(std::size_t TPipeAppender::*AField) const {
+    std::size_t Result = 0;
+    for (const TPipeAppender* const Appender : FPipes) Result += Appender->*AField;
+    return Result;
+  }
+  [[nodiscard]] std::string Failure() const {
+    for (const TPipeAppender* const Appender : FPipes)
+      if (Appender->Failed != 0) return Appender->Failure.ToUTF8();
+    return {};
+  }
+
+ private:
+  static std::string Reason(const std::string& AName) { return AName + ": " + std::strerror(errno); }
+
+  void AddAppender(const std::string& AFile) {
+    auto* const Appender = New<TPipeAppender>(Logger(), u"");
+    FAppenders.emplace_back(Appender);
+    FPipes.push_back(Appender);
+    Appender->SetFileName(utf8::Decode(AFile, utf8::TMalformed::Escape));
+    Appender->SetMaxFileSize(FOptions.MaxSize);
+    Appender->SetMaxBackupCount(FOptions.Backups);
+    Appender->SetAppendExisting(FOptions.Append);
+    Appender->SetLayout(TZqLogBaseClass::Of<TZqSimpleLayout>());
+    Appender->Initialize();  // a file that can't be opened shows here, before the first line
+    FLogger->AddAppender(FAppenders.back());
+  }
+
+  void Split(std::string& ARest, std::string_view ABlock) {
+    for (std::size_t End = 0; (End = ABlock.find('\n')) != std::string_view::npos; ABlock.remove_prefix(End + 1)) {
+      if (ARest.empty()) LogLine(ABlock.substr(0, End));
+      else LogLine(ARest.append(ABlock.substr(0, End)));
+      ARest.clear();
+    }
+    ARest += ABlock;
+  }
+
+  void LogLine(std::string_view ALine) {
+    ++FRead;
+    const auto Level = FOptions.DetectLevel ? DetectLevel(ALine) : std::nullopt;
+    FLogger->Log(Level.value_or(FOptions.Level), TextOf(ALine));
+  }
+
+  const TOptions& FOptions;
+  IntfRef<IZqLogger> FLogger;
+  std::vector<IntfRef<IZqLogAppender>> FAppenders;
+  std::vector<TPipeAppender*> FPipes;
+  std::size_t FRead = 0;
+};
+
+int Pipe(const TOptions& AOptions) {
+  const auto Begin = std::chrono::steady_clock::now();
+  int Status = 0;
+  const auto Complain = [&](std::string_view AText) {
+    std::fprintf(stderr, "zqlogpipe: %.*s\n", static_cast<int>(AText.size()), AText.data());
+    Status = 1;
+  };
+  TPipe Pipe(AOptions);
+  for (const std::string& Input : AOptions.Inputs.empty() ? std::vector<std::string>{"-"} : AOptions.Inputs) try {
+      Pipe.Run(Input);
+    } catch (const std::runtime_error& e) {
+      Complain(e.what());
+    }
+  try {
+    Pipe.Finish();
+  } catch (const Exception& e) {
+    Complain(e.what());
+  }
+  if (const std::size_t Failed = Pipe.Sum(&TPipeAppender::Failed))
+    Complain(std::to_string(Failed) + " lines were not written: " + Pipe.Failure());
+  const std::chrono::duration<double> Seconds = std::chrono::steady_clock::now() - Begin;
+  std::fprintf(stderr, "zqlogpipe: %zu lines read, %zu lines written, %zu files rolled, %.3f s\n", Pipe.Read(),
+      Pipe.Sum(&TPipeAppender::Written), Pipe.Sum(&TPipeAppender::Rolls), Seconds.count());
+  return Status;
+}
+
+}  // namespace
+
+int main(int ACount, char** AWords) {
+  try {
+    const TOptions Options = ParseOptions({AWords + 1, AWords + ACount});
+    if (!Options.Help) return Pipe(Options);
+    std::fputs(cHelp, stdout);
+    return 0;
+  } catch (const TUsageError& e) {
+    std::fprintf(stderr, "zqlogpipe: %s\nTry zqlogpipe --help.\n", e.what());
+    return 2;
+  } catch (const std::exception& e) {
+    std::fprintf(stderr, "zqlogpipe: %s\n", e.what());
+    return 1;
+  }
+}

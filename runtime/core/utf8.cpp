@@ -1,0 +1,292 @@
+#include "runtime/core/utf8.h"
+
+#include <cstdint>
+#include <cstring>
+
+#if defined(__SSE2__)
+#include <emmintrin.h>
+#endif
+
+namespace zq::utf8 {
+
+namespace {
+
+constexpr char16_t cReplacement = 0xFFFD;
+
+// One sequence of two to four bytes. Follows table 3-7 of the Unicode standard: the range of the second byte depends on
+// the first. Length is that of the sequence, or of the longest broken piece when Valid is false.
+struct TSequence {
+  std::uint32_t CodePoint;
+  std::uint32_t Length;
+  bool Valid;
+};
+
+TSequence ReadSequence(const unsigned char* p, std::size_t ALeft) noexcept {
+  const std::uint32_t First = p[0];
+  std::uint32_t Trail = 0;
+  std::uint32_t Low = 0x80;
+  std::uint32_t High = 0xBF;
+  std::uint32_t CodePoint = 0;
+  if (First >= 0xC2 && First <= 0xDF) {
+    Trail = 1;
+    CodePoint = First & 0x1FU;
+  } else if (First >= 0xE0 && First <= 0xEF) {
+    Trail = 2;
+    CodePoint = First & 0x0FU;
+    if (First == 0xE0) Low = 0xA0;
+    if (First == 0xED) High = 0x9F;
+  } else if (First >= 0xF0 && First <= 0xF4) {
+    Trail = 3;
+    CodePoint = First & 0x07U;
+    if (First == 0xF0) Low = 0x90;
+    if (First == 0xF4) High = 0x8F;
+  } else {
+    return {0, 1, false};
+  }
+  for (std::uint32_t i = 1; i <= Trail; ++i) {
+    if (i >= ALeft || p[i] < Low || p[i] > High) return {0, i, false};
+    CodePoint = CodePoint << 6U | (p[i] & 0x3FU);
+    Low = 0x80;
+    High = 0xBF;
+  }
+  return {CodePoint, Trail + 1, true};
+}
+
+std::uint64_t LoadBlock(const void* ASource) noexcept {
+  std::uint64_t Block = 0;
+  std::memcpy(&Block, ASource, 8);
+  return Block;
+}
+
+// Whether the first eight bytes or units are ASCII: below that a run is over before vectors are worth their set-up.
+bool StartsAscii(const char* ASource) noexcept { return (LoadBlock(ASource) & 0x8080808080808080U) == 0; }
+bool StartsAscii(const char16_t* ASource) noexcept {
+  return ((LoadBlock(ASource) | LoadBlock(ASource + 4)) & 0xFF80FF80FF80FF80U) == 0;
+}
+
+// Copies the ASCII run at the front and returns its length.
+std::size_t WidenAscii(const char* ASource, std::size_t ALength, char16_t* ADest) noexcept {
+  std::size_t i = 0;
+#if defined(__SSE2__)
+  const __m128i Zero = _mm_setzero_si128();
+  for (; i + 16 <= ALength; i += 16) {
+    const __m128i Block = _mm_loadu_si128(reinterpret_cast<const __m128i*>(ASource + i));
+    if (_mm_movemask_epi8(Block) != 0) break;
+    _mm_storeu_si128(reinterpret_cast<__m128i*>(ADest + i), _mm_unpacklo_epi8(Block, Zero));
+    _mm_storeu_si128(reinterpret_cast<__m128i*>(ADest + i + 8), _mm_unpackhi_epi8(Block, Zero));
+  }
+#endif
+  for (; i < ALength && static_cast<unsigned char>(ASource[i]) < 0x80; ++i)
+    ADest[i] = static_cast<unsigned char>(ASource[i]);
+  return i;
+}
+
+std::size_t NarrowAscii(const char16_t* ASource, std::size_t ALength, char* ADest) noexcept {
+  std::size_t i = 0;
+#if defined(__SSE2__)
+  const __m128i High = _mm_set1_epi16(static_cast<short>(0xFF80));
+  for (; i + 16 <= ALength; i += 16) {
+    const __m128i Low8 = _mm_loadu_si128(reinterpret_cast<const __m128i*>(ASource + i));
+    const __m128i High8 = _mm_loadu_si128(reinterpret_cast<const __m128i*>(ASource + i + 8));
+    const __m128i Beyond = _mm_and_si128(_mm_or_si128(Low8, High8), High);
+    if (_mm_movemask_epi8(_mm_cmpeq_epi8(Beyond, _mm_setzero_si128())) != 0xFFFF) break;
+    _mm_storeu_si128(reinterpret_cast<__m128i*>(ADest + i), _mm_packus_epi16(Low8, High8));
+  }
+#endif
+  for (; i < ALength && ASource[i] < 0x80; ++i) ADest[i] = static_cast<char>(ASource[i]);
+  return i;
+}
+
+bool IsSurrogate(std::uint32_t c) noexcept { return (c & 0xF800U) == 0xD800U; }
+bool IsHighSurrogate(std::uint32_t c) noexcept { return (c & 0xFC00U) == 0xD800U; }
+bool IsLowSurrogate(std::uint32_t c) noexcept { return (c & 0xFC00U) == 0xDC00U; }
+
+// What the Put functions return is the place behind what they wrote.
+
+char* PutDouble(char* ADest, std::uint32_t c) noexcept {
+  const std::uint32_t Pair = 0x80C0U | c >> 6U | (c & 0x3FU) << 8U;  // one store, as the compilers see it
+  ADest[0] = static_cast<char>(Pair);
+  ADest[1] = static_cast<char>(Pair >> 8U);
+  return ADest + 2;
+}
+
+char* PutTriple(char* ADest, std::uint32_t c) noexcept {
+  ADest[0] = static_cast<char>(0xE0U | c >> 12U);
+  ADest[1] = static_cast<char>(0x80U | (c >> 6U & 0x3FU));
+  ADest[2] = static_cast<char>(0x80U | (c & 0x3FU));
+  return ADest + 3;
+}
+
+char* PutQuad(char* ADest, std::uint32_t AHigh, std::uint32_t ALow) noexcept {
+  const std::uint32_t c = 0x10000U + ((AHigh & 0x3FFU) << 10U | (ALow & 0x3FFU));
+  ADest[0] = static_cast<char>(0xF0U | c >> 18U);
+  ADest[1] = static_cast<char>(0x80U | (c >> 12U & 0x3FU));
+  ADest[2] = static_cast<char>(0x80U | (c >> 6U & 0x3FU));
+  ADest[3] = static_cast<char>(0x80U | (c & 0x3FU));
+  return ADest + 4;
+}
+
+// DecodePairs and DecodeTriples take the run of well-formed sequences of their length at the front, which is most of
+// all text beyond ASCII, and return the place behind it; ADest moves along.
+
+const unsigned char* DecodePairs(const unsigned char* ASource, const unsigned char* AEnd, char16_t*& ADest) noexcept {
+  char16_t* Dest = ADest;
+  while (AEnd - ASource >= 2) {
+    const std::uint32_t Pair = ASource[0] | static_cast<std::uint32_t>(ASource[1]) << 8U;
+    if ((Pair & 0xC0E0U) != 0x80C0 || (Pair & 0x1EU) == 0) break;
+    *Dest++ = static_cast<char16_t>((Pair & 0x1FU) << 6U | (Pair >> 8U & 0x3FU));
+    ASource += 2;
+  }
+  ADest = Dest;
+  return ASource;
+}
+
+// Looks at four bytes at a time, so one at the very end is left over.
+const unsigned char* DecodeTriples(const unsigned char* ASource, const unsigned char* AEnd, char16_t*& ADest) noexcept {
+  char16_t* Dest = ADest;
+  while (AEnd - ASource >= 4) {
+    const std::uint32_t Quad = ASource[0] | static_cast<std::uint32_t>(ASource[1]) << 8U |
+                               static_cast<std::uint32_t>(ASource[2]) << 16U |
+                               static_cast<std::uint32_t>(ASource[3]) << 24U;
+    if ((Quad & 0xC0C0F0U) != 0x8080E0) break;
+    const std::uint32_t Unit = (Quad & 0x0FU) << 12U | (Quad >> 2U & 0xFC0U) | (Quad >> 16U & 0x3FU);
+    if (Unit < 0x800 || IsSurrogate(Unit)) break;
+    *Dest++ = static_cast<char16_t>(Unit);
+    ASource += 3;
+  }
+  ADest = Dest;
+  return ASource;
+}
+
+// Any sequence, broken ones too.
+const unsigned char* DecodeOne(
+    const unsigned char* ASource, const unsigned char* AEnd, char16_t*& ADest, TMalformed AMalformed) noexcept {
+  const TSequence Sequence = ReadSequence(ASource, static_cast<std::size_t>(AEnd - ASource));
+  if (Sequence.Valid && Sequence.CodePoint < 0x10000) {
+    *ADest++ = static_cast<char16_t>(Sequence.CodePoint);
+  } else if (Sequence.Valid) {
+    *ADest++ = static_cast<char16_t>(0xD7C0U + (Sequence.CodePoint >> 10U));
+    *ADest++ = static_cast<char16_t>(0xDC00U | (Sequence.CodePoint & 0x3FFU));
+  } else if (AMalformed == TMalformed::Replace) {
+    *ADest++ = cReplacement;
+  } else {
+    for (std::uint32_t k = 0; k < Sequence.Length; ++k) *ADest++ = static_cast<char16_t>(0xDC00U | ASource[k]);
+  }
+  return ASource + Sequence.Length;
+}
+
+// One character beyond ASCII; ASource moves along. Returns the place behind its bytes.
+char* EncodeOne(const char16_t*& ASource, const char16_t* AEnd, char* ADest, TMalformed AMalformed) noexcept {
+  const std::uint32_t c = *ASource++;
+  if (c < 0x800) return PutDouble(ADest, c);
+  if (!IsSurrogate(c)) return PutTriple(ADest, c);
+  if (IsHighSurrogate(c) && ASource < AEnd && IsLowSurrogate(*ASource)) return PutQuad(ADest, c, *ASource++);
+  if (AMalformed == TMalformed::Replace || c < 0xDC80 || c > 0xDCFF) return PutTriple(ADest, cReplacement);
+  *ADest = static_cast<char>(c);
+  return ADest + 1;
+}
+
+}  // namespace
+
+std::size_t AsciiRun(const char* ASource, std::size_t ALength) noexcept {
+  std::size_t i = 0;
+  while (i + 8 <= ALength && StartsAscii(ASource + i)) i += 8;
+  while (i < ALength && static_cast<unsigned char>(ASource[i]) < 0x80) ++i;
+  return i;
+}
+
+std::size_t AsciiRun(const char16_t* ASource, std::size_t ALength) noexcept {
+  std::size_t i = 0;
+  while (i + 8 <= ALength && StartsAscii(ASource + i)) i += 8;
+  while (i < ALength && ASource[i] < 0x80) ++i;
+  return i;
+}
+
+// Where the short loops of Decode and Encode fall on the cache lines is a quarter of their speed, hence the alignment.
+
+[[gnu::aligned(64)]] std::size_t Decode(
+    const char* ASource, std::size_t ALength, char16_t* ADest, TMalformed AMalformed) noexcept {
+  const auto* Source = reinterpret_cast<const unsigned char*>(ASource);
+  const auto* const End = Source + ALength;
+  char16_t* Dest = ADest;
+  while (Source < End) {
+    const auto* const Text = reinterpret_cast<const char*>(Source);
+    if (End - Source >= 16 && StartsAscii(Text)) {
+      const std::size_t Run = WidenAscii(Text, static_cast<std::size_t>(End - Source), Dest);
+      Source += Run;
+      Dest += Run;
+    } else {
+      while (Source < End && *Source < 0x80) *Dest++ = *Source++;
+    }
+    Source = DecodePairs(Source, End, Dest);
+    Source = DecodeTriples(Source, End, Dest);
+    if (Source < End && *Source >= 0x80) Source = DecodeOne(Source, End, Dest, AMalformed);
+  }
+  return static_cast<std::size_t>(Dest - ADest);
+}
+
+std::size_t DecodedLength(const char* ASource, std::size_t ALength) noexcept {
+  std::size_t Result = 0;
+  for (std::size_t i = 0; i < ALength;) {
+    const std::size_t Run = AsciiRun(ASource + i, ALength - i);
+    Result += Run;
+    i += Run;
+    while (i < ALength && static_cast<unsigned char>(ASource[i]) >= 0x80) {
+      const TSequence Sequence = ReadSequence(reinterpret_cast<const unsigned char*>(ASource) + i, ALength - i);
+      Result += Sequence.Valid && Sequence.CodePoint > 0xFFFF ? 2 : 1;
+      i += Sequence.Length;
+    }
+  }
+  return Result;
+}
+
+[[gnu::aligned(64)]] std::size_t Encode(
+    const char16_t* ASource, std::size_t ALength, char* ADest, TMalformed AMalformed) noexcept {
+  const char16_t* Source = ASource;
+  const char16_t* const End = ASource + ALength;
+  char* Dest = ADest;
+  while (Source < End) {
+    if (*Source < 0x80) {
+      if (End - Source >= 16 && StartsAscii(Source)) {
+        const std::size_t Run = NarrowAscii(Source, static_cast<std::size_t>(End - Source), Dest);
+        Source += Run;
+        Dest += Run;
+      } else {
+        do *Dest++ = static_cast<char>(*Source++);
+        while (Source < End && *Source < 0x80);
+      }
+      if (Source == End) break;
+    }
+    do Dest = EncodeOne(Source, End, Dest, AMalformed);
+    while (Source < End && *Source >= 0x80);
+  }
+  return static_cast<std::size_t>(Dest - ADest);
+}
+
+std::size_t EncodedLength(const char16_t* ASource, std::size_t ALength) noexcept {
+  std::size_t Result = 0;
+  for (std::size_t i = 0; i < ALength; ++i) {
+    const char16_t c = ASource[i];
+    if (IsHighSurrogate(c) && i + 1 < ALength && IsLowSurrogate(ASource[i + 1])) {
+      Result += 4;
+      ++i;
+    } else {
+      Result += c < 0x80 ? 1 : c < 0x800 ? 2 : 3;
+    }
+  }
+  return Result;
+}
+
+std::u16string Decode(std::string_view ASource, TMalformed AMalformed) {
+  std::u16string Result(ASource.size(), u'\0');
+  Result.resize(Decode(ASource.data(), ASource.size(), Result.data(), AMalformed));
+  return Result;
+}
+
+std::string Encode(std::u16string_view ASource, TMalformed AMalformed) {
+  std::string Result(ASource.size() * 3, '\0');
+  Result.resize(Encode(ASource.data(), ASource.size(), Result.data(), AMalformed));
+  return Result;
+}
+
+}  // namespace zq::utf8

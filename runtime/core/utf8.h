@@ -1,0 +1,37 @@
+#pragma once
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+
+#include "runtime/core/api.h"
+
+namespace zq::utf8 {
+
+/// What becomes of bytes that are no UTF-8.
+enum class TMalformed {
+  Replace,  ///< each longest piece of a broken sequence becomes one U+FFFD
+  Escape,   ///< each byte becomes U+DC80..U+DCFF: how file names keep bytes that are no text
+};
+
+/// Decodes ALength bytes to ADest, which has room for DecodedLength units (with Escape, and in any case, ALength are
+/// enough); returns the units written.
+ZQ_API std::size_t Decode(
+    const char* ASource, std::size_t ALength, char16_t* ADest, TMalformed AMalformed = TMalformed::Replace) noexcept;
+/// Encodes ALength units to ADest, which has room for EncodedLength bytes (3 * ALength are always enough); returns the
+/// bytes written. A surrogate without its partner becomes U+FFFD; with Escape U+DC80..U+DCFF become the byte that they
+/// stand for.
+ZQ_API std::size_t Encode(
+    const char16_t* ASource, std::size_t ALength, char* ADest, TMalformed AMalformed = TMalformed::Replace) noexcept;
+/// Units that Decode writes with Replace.
+ZQ_API std::size_t DecodedLength(const char* ASource, std::size_t ALength) noexcept;
+/// Bytes that Encode writes with Replace.
+ZQ_API std::size_t EncodedLength(const char16_t* ASource, std::size_t ALength) noexcept;
+/// Length of the ASCII run that ASource begins with.
+ZQ_API std::size_t AsciiRun(const char* ASource, std::size_t ALength) noexcept;
+ZQ_API std::size_t AsciiRun(const char16_t* ASource, std::size_t ALength) noexcept;
+
+ZQ_API std::u16string Decode(std::string_view ASource, TMalformed AMalformed = TMalformed::Replace);
+ZQ_API std::string Encode(std::u16string_view ASource, TMalformed AMalformed = TMalformed::Replace);
+
+}  // namespace zq::utf8

@@ -1,0 +1,88 @@
+#pragma once
+
+#include <concepts>
+#include <initializer_list>
+#include <string>
+#include <string_view>
+#include <type_traits>
+
+#include "runtime/core/objects.h"
+#include "runtime/core/strings.h"
+#include "runtime/core/types.h"
+
+namespace zq {
+
+class Variant;
+
+/// One tagged value of a variable argument list. Text and variants are looked at, not copied: a record lives no longer
+/// than the call that it is made for.
+struct TVarRec {
+  enum TKind : std::uint8_t {
+    vtInteger,
+    vtUInt64,
+    vtBoolean,
+    vtExtended,
+    vtWideChar,
+    vtAnsiChar,
+    vtPointer,
+    vtWideText,
+    vtAnsiText,
+    vtObject,
+    vtClass,
+    vtVariant
+  };
+
+  template <std::signed_integral T>
+    requires(!std::same_as<T, char>)
+  TVarRec(T AValue)
+  noexcept : Kind(vtInteger), Width(sizeof(T)), VInteger(AValue) {}
+  template <std::unsigned_integral T>
+    requires(!std::same_as<T, bool> && !std::same_as<T, char16_t>)
+  TVarRec(T AValue)
+  noexcept : Kind(vtUInt64), VUInt64(AValue) {}
+  template <class T>
+    requires std::is_enum_v<T> TVarRec(T AValue)
+  noexcept : Kind(vtInteger), Width(sizeof(T)), VInteger(static_cast<Int64>(AValue)) {}
+  template <std::same_as<bool> T>
+  TVarRec(T AValue) noexcept : Kind(vtBoolean), VBoolean(AValue) {}
+  template <std::floating_point T>
+  TVarRec(T AValue) noexcept : Kind(vtExtended), VExtended(AValue) {}
+  TVarRec(TDateTime AValue) noexcept : Kind(vtExtended), VExtended(AValue.Value) {}
+  TVarRec(char16_t AValue) noexcept : Kind(vtWideChar), VWideChar(AValue) {}
+  TVarRec(char AValue) noexcept : Kind(vtAnsiChar), VAnsiChar(AValue) {}
+  TVarRec(const UnicodeString& AValue) noexcept : Kind(vtWideText), VWideText(AValue.View()) {}
+  TVarRec(std::u16string_view AValue) noexcept : Kind(vtWideText), VWideText(AValue) {}
+  TVarRec(const char16_t* AValue) noexcept : Kind(vtWideText), VWideText(AValue == nullptr ? u"" : AValue) {}
+  TVarRec(const RawByteString& AValue) noexcept
+      : Kind(vtAnsiText), CodePage(AValue.CodePage()), VAnsiText(AValue.View()) {}
+  TVarRec(std::string_view AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue) {}
+  TVarRec(const char* AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue == nullptr ? "" : AValue) {}
+  TVarRec(const ShortString& AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue.View()) {}
+  TVarRec(const Variant& AValue) noexcept : Kind(vtVariant), VVariant(&AValue) {}
+  TVarRec(const TObject* AValue) noexcept : Kind(vtObject), VObject(AValue) {}
+  TVarRec(TClass AValue) noexcept : Kind(vtClass), VClass(AValue) {}
+  TVarRec(const void* AValue) noexcept : Kind(vtPointer), VPointer(AValue) {}
+
+  TKind Kind;
+  Byte Width = 8;     ///< of VInteger's own type, in bytes
+  Word CodePage = 0;  ///< of VAnsiText
+  union {
+    Int64 VInteger;
+    UInt64 VUInt64;
+    bool VBoolean;
+    Extended VExtended;
+    char16_t VWideChar;
+    char VAnsiChar;
+    const void* VPointer;
+    std::u16string_view VWideText;
+    std::string_view VAnsiText;
+    const TObject* VObject;
+    TClass VClass;
+    const Variant* VVariant;
+  };
+};
+
+/// Arguments of a format text: {1, u"two", 3.0}.
+using TVarArgs = std::initializer_list<TVarRec>;
+
+}  // namespace zq

@@ -1,0 +1,121 @@
+#include "runtime/io/text_file.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <utility>
+
+#include "runtime/core/exceptions.h"
+#include "runtime/core/utf8.h"
+#include "runtime/io/files.h"
+#include "runtime/io/paths.h"
+#include "runtime/text/encoding.h"
+
+namespace zq {
+
+namespace {
+
+constexpr Word cUTF8 = 65001;
+constexpr std::string_view cLineEnd = "\r\n";
+constexpr std::size_t cOnStack = 8192;
+constexpr std::size_t cKeptRoom = 1 << 20;
+
+// At most this many bytes for one unit; the stateful code pages put an escape sequence around it.
+constexpr std::size_t MaxBytesPerUnit(Word ACodePage) noexcept { return ACodePage == cUTF8 ? 3 : 8; }
+
+// Bytes written to ADest, which has ARoom; 0 for a text that the code page's converter refuses.
+std::size_t EncodeTo(char* ADest, std::size_t ARoom, std::u16string_view AText, Word ACodePage) {
+  if (ACodePage == cUTF8) return utf8::Encode(AText.data(), AText.size(), ADest);
+  return static_cast<std::size_t>(
+      WideCharToMultiByte(ACodePage, 0, AText.data(), static_cast<int>(AText.size()), ADest, static_cast<int>(ARoom)));
+}
+
+char* Copy(char* ADest, std::string_view ABytes) noexcept { return std::copy(ABytes.begin(), ABytes.end(), ADest); }
+
+}  // namespace
+
+TTextFile::~TTextFile() {
+  if (IsOpen()) ::close(FHandle);
+}
+
+void TTextFile::Assign(const UnicodeString& AFileName, Word ACodePage) {
+  Close();
+  FFileName = AFileName;
+  FCodePage = ACodePage;
+}
+
+void TTextFile::Rewrite() { Open(O_CREAT | O_TRUNC, u"create"); }
+
+void TTextFile::Append() { Open(0, u"open"); }
+
+void TTextFile::AppendOrCreate() { Open(O_CREAT, u"open"); }
+
+void TTextFile::Open(int AFlags, const char16_t* AStep) {
+  Close();
+  const std::string Path = ToSystemPath(FFileName);
+  do FHandle = ::open(Path.c_str(), AFlags | O_WRONLY | O_APPEND | O_CLOEXEC, 0666);
+  while (!IsOpen() && errno == EINTR);
+  if (!IsOpen()) Fail(AStep, errno);
+  FWritten = 0;
+  FTorn = false;
+}
+
+void TTextFile::Write(const UnicodeString& AText) { WriteText(AText, {}); }
+
+void TTextFile::WriteLn(const UnicodeString& AText) { WriteText(AText, cLineEnd); }
+
+void TTextFile::WriteText(std::u16string_view AText, std::string_view ALineEnd) {
+  RequireOpen();
+  char OnStack[cOnStack];
+  const std::size_t Room = MaxBytesPerUnit(FCodePage) * AText.size();
+  if (Room + 2 * cLineEnd.size() > cOnStack && FLong.size() < Room + 2 * cLineEnd.size())
+    FLong.resize(Room + 2 * cLineEnd.size());
+  char* const Start = Room + 2 * cLineEnd.size() <= cOnStack ? OnStack : FLong.data();
+  char* End = FTorn ? Copy(Start, cLineEnd) : Start;
+  if (!AText.empty()) {
+    const std::size_t Encoded = EncodeTo(End, Room, AText, FCodePage);
+    if (Encoded == 0) Fail(u"write", EILSEQ);
+    End += Encoded;
+  }
+  End = Copy(End, ALineEnd);
+  Put({Start, static_cast<std::size_t>(End - Start)});
+  if (FLong.size() > cKeptRoom) std::string().swap(FLong);
+}
+
+void TTextFile::WriteBytes(std::string_view ABytes) {
+  RequireOpen();
+  if (ABytes.empty()) return;
+  if (FTorn) Put(cLineEnd);
+  Put(ABytes);
+}
+
+void TTextFile::Put(std::string_view ABytes) {
+  while (!ABytes.empty()) {
+    const ssize_t Count = ::write(FHandle, ABytes.data(), ABytes.size());
+    if (Count < 0 && errno == EINTR) continue;
+    if (Count <= 0) Fail(u"write", Count < 0 ? errno : ENOSPC);
+    FWritten += Count;
+    ABytes.remove_prefix(static_cast<std::size_t>(Count));
+    FTorn = !ABytes.empty();
+  }
+}
+
+void TTextFile::Flush() { RequireOpen(); }
+
+void TTextFile::Close() {
+  // The descriptor is gone whatever close says, and EINTR tells of no loss.
+  if (IsOpen() && ::close(std::exchange(FHandle, -1)) != 0 && errno != EINTR) Fail(u"close", errno);
+}
+
+void TTextFile::RequireOpen() const {
+  if (!IsOpen()) Fail(u"write", EBADF);
+}
+
+void TTextFile::Fail(const char16_t* AStep, int AError) const {
+  throw EInOutError(
+      u"Cannot " + UnicodeString(AStep) + u" file \"" + FFileName + u"\". " + SysErrorMessage(AError), AError);
+}
+
+}  // namespace zq

@@ -1,0 +1,19 @@
+#pragma once
+
+#include <optional>
+
+#include "runtime/core/types.h"
+#include "runtime/platform/platform.h"
+
+namespace zq {
+
+/// Facts about this process. Each is absent where the system can't tell.
+class ZQ_API TProcessFacts {
+ public:
+  virtual ~TProcessFacts() = default;
+  /// A 32-bit program on a 64-bit system.
+  [[nodiscard]] virtual std::optional<bool> IsWow64Process() = 0;
+  [[nodiscard]] virtual std::optional<bool> IsDebuggerPresent() = 0;
+};
+
+}  // namespace zq

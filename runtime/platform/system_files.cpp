@@ -1,0 +1,74 @@
+#include "runtime/platform/system_files.h"
+
+#include <pwd.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <fstream>
+#include <iterator>
+#include <vector>
+
+namespace zq {
+
+namespace {
+
+// A word of the shell, as far as such files use it: quotes go, a backslash keeps the next character.
+std::string Unquoted(std::string_view AText) {
+  std::string Result;
+  for (std::size_t i = 0; i < AText.size(); ++i) {
+    if (AText[i] == '"' || AText[i] == '\'') continue;
+    if (AText[i] == '\\' && i + 1 < AText.size()) ++i;
+    Result += AText[i];
+  }
+  return Result;
+}
+
+}  // namespace
+
+std::string ReadSystemFile(const std::string& APath) {
+  std::ifstream File(APath, std::ios::binary);
+  return {std::istreambuf_iterator<char>(File), {}};
+}
+
+std::string_view TakeLine(std::string_view& AText) noexcept {
+  const std::string_view Line = AText.substr(0, AText.find('\n'));
+  AText.remove_prefix(std::min(Line.size() + 1, AText.size()));
+  return Line;
+}
+
+std::optional<std::string> ShellAssignment(const std::string& APath, std::string_view AName) {
+  const std::string Content = ReadSystemFile(APath);
+  std::optional<std::string> Result;
+  for (std::string_view Rest = Content; !Rest.empty();) {
+    const std::string_view Line = TakeLine(Rest);
+    if (Line.starts_with(AName) && Line.substr(AName.size()).starts_with('='))
+      Result = Unquoted(Line.substr(AName.size() + 1));
+  }
+  return Result;
+}
+
+std::string EnvironmentText(const char* AName) {
+  const char* const Value = std::getenv(AName);
+  return Value == nullptr ? "" : Value;
+}
+
+std::string HomeFolder() {
+  std::string Result = EnvironmentText("HOME");
+  if (Result.empty()) {
+    std::vector<char> Buffer(16384);
+    passwd Entry{};
+    passwd* Found = nullptr;
+    if (::getpwuid_r(::geteuid(), &Entry, Buffer.data(), Buffer.size(), &Found) == 0 && Found != nullptr)
+      Result = Found->pw_dir;
+  }
+  while (Result.ends_with('/')) Result.pop_back();
+  return Result;
+}
+
+std::string XdgFolder(const char* AVariable, std::string_view AUsual) {
+  std::string Result = EnvironmentText(AVariable);
+  return Result.starts_with('/') ? Result : HomeFolder() + '/' + std::string(AUsual);
+}
+
+}  // namespace zq

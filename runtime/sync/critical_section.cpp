@@ -1,0 +1,104 @@
+#include "runtime/sync/critical_section.h"
+
+#include <linux/futex.h>
+#include <pthread.h>
+#include <sys/single_threaded.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <ctime>
+#include <mutex>
+
+namespace zq {
+
+namespace {
+
+constexpr Cardinal cForEver = 0xFFFFFFFF;
+constexpr std::int64_t cSlice = 1'000'000;  // ns; see Wait
+constexpr int cSpins = 100;
+
+// Initial-exec: one load relative to the thread pointer, where a shared library would otherwise make a call.
+__attribute__((tls_model("initial-exec"))) constinit thread_local std::uint32_t ThreadId = 0;
+
+std::uint32_t LearnThreadId() noexcept {
+  static std::once_flag Once;
+  std::call_once(Once, [] { pthread_atfork(nullptr, nullptr, [] { ThreadId = 0; }); });
+  ThreadId = static_cast<std::uint32_t>(::syscall(SYS_gettid));
+  return ThreadId;
+}
+
+std::uint32_t MyThreadId() noexcept {
+  const std::uint32_t Known = ThreadId;
+  return Known != 0 ? Known : LearnThreadId();
+}
+
+std::int64_t Nanoseconds() noexcept {
+  timespec Time{};
+  ::clock_gettime(CLOCK_MONOTONIC, &Time);
+  return std::int64_t{Time.tv_sec} * 1'000'000'000 + Time.tv_nsec;
+}
+
+void Futex(std::atomic<std::uint32_t>& AWord, int AOperation, std::uint32_t AValue, const timespec* ATimeout) noexcept {
+  ::syscall(SYS_futex, &AWord, AOperation | FUTEX_PRIVATE_FLAG, AValue, ATimeout, nullptr, 0);
+}
+
+}  // namespace
+
+Cardinal GetCurrentThreadId() noexcept { return MyThreadId(); }
+
+Cardinal GetCurrentProcessId() noexcept { return static_cast<Cardinal>(::getpid()); }
+
+// As long as the process has one thread, which the system's library knows, a plain store does what else takes an atomic
+// exchange.
+bool TCriticalSection::Take(std::uint32_t AThread) noexcept {
+  std::uint32_t Free = 0;
+  if (FOwner.load(std::memory_order_relaxed) != 0) return false;
+  if (!__libc_single_threaded)
+    return FOwner.compare_exchange_strong(Free, AThread, std::memory_order_acquire, std::memory_order_relaxed);
+  FOwner.store(AThread, std::memory_order_relaxed);
+  return true;
+}
+
+bool TCriticalSection::TryEnter() noexcept {
+  const std::uint32_t Me = MyThreadId();
+  if (FOwner.load(std::memory_order_relaxed) != Me && !Take(Me)) return false;
+  ++FDepth;
+  return true;
+}
+
+void TCriticalSection::Enter() noexcept {
+  if (!TryEnter()) [[unlikely]]
+    Wait(cForEver);
+}
+
+bool TCriticalSection::TryEnterFor(Cardinal AMilliseconds) noexcept { return TryEnter() || Wait(AMilliseconds); }
+
+// Leave stores and then reads FSleepers without a full barrier between them, which keeps leaving cheap: a wake-up can
+// be missed when a thread lies down at that very moment. Sleeping in slices bounds what that costs.
+[[gnu::noinline]] bool TCriticalSection::Wait(Cardinal AMilliseconds) noexcept {
+  for (int i = 0; i < cSpins; ++i) {
+    __builtin_ia32_pause();
+    if (TryEnter()) return true;
+  }
+  const std::int64_t Deadline = AMilliseconds == cForEver ? 0 : Nanoseconds() + std::int64_t{AMilliseconds} * 1'000'000;
+  FSleepers.fetch_add(1);
+  bool Taken = false;
+  for (std::int64_t Left = cSlice; !(Taken = TryEnter()) && Left > 0;) {
+    if (Deadline != 0) Left = std::min(cSlice, Deadline - Nanoseconds());
+    const std::uint32_t Owner = FOwner.load(std::memory_order_relaxed);
+    if (Owner == 0 || Left <= 0) continue;
+    const timespec Timeout{0, static_cast<long>(Left)};
+    Futex(FOwner, FUTEX_WAIT, Owner, &Timeout);
+  }
+  FSleepers.fetch_sub(1);
+  return Taken;
+}
+
+void TCriticalSection::Leave() noexcept {
+  if (--FDepth != 0) return;
+  FOwner.store(0, std::memory_order_release);
+  if (FSleepers.load(std::memory_order_relaxed) != 0) Futex(FOwner, FUTEX_WAKE, 1, nullptr);
+}
+
+}  // namespace zq

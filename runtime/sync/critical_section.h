@@ -1,0 +1,60 @@
+#pragma once
+
+#include <atomic>
+#include <cstdint>
+
+#include "runtime/core/api.h"
+#include "runtime/core/types.h"
+
+namespace zq {
+
+/// The system's number of the calling thread; never 0.
+[[nodiscard]] ZQ_API Cardinal GetCurrentThreadId() noexcept;
+[[nodiscard]] ZQ_API Cardinal GetCurrentProcessId() noexcept;
+
+/// Lock that its owner may take again, and must then leave as often.
+///
+/// Taking a free lock is one atomic exchange, leaving it one store: there is no system call unless threads meet.
+/// Then a thread spins for some microseconds and goes to sleep. Not fair: a thread that comes by may take the lock
+/// before one that sleeps for it.
+class ZQ_API TCriticalSection {
+ public:
+  TCriticalSection() noexcept = default;
+  TCriticalSection(const TCriticalSection&) = delete;
+  TCriticalSection& operator=(const TCriticalSection&) = delete;
+  ~TCriticalSection() = default;
+
+  void Enter() noexcept;
+  /// Never waits.
+  [[nodiscard]] bool TryEnter() noexcept;
+  /// Waits for at most that many milliseconds; 0xFFFFFFFF is for ever.
+  [[nodiscard]] bool TryEnterFor(Cardinal AMilliseconds) noexcept;
+  /// By the owner only.
+  void Leave() noexcept;
+  void Acquire() noexcept { Enter(); }
+  void Release() noexcept { Leave(); }
+  [[nodiscard]] bool IsOwned() const noexcept { return FOwner.load(std::memory_order_relaxed) == GetCurrentThreadId(); }
+
+ private:
+  bool Take(std::uint32_t AThread) noexcept;
+  bool Wait(Cardinal AMilliseconds) noexcept;
+
+  std::atomic<std::uint32_t> FOwner = 0;  // thread id, and the word that sleepers wait on; 0 when free
+  std::atomic<std::uint32_t> FSleepers = 0;
+  std::uint32_t FDepth = 0;  // the owner's alone
+};
+
+/// Holds ALock, anything with Enter and Leave, for a scope.
+template <class TLock>
+class TLockScope {
+ public:
+  explicit TLockScope(TLock& ALock) : FLock(ALock) { FLock.Enter(); }
+  TLockScope(const TLockScope&) = delete;
+  TLockScope& operator=(const TLockScope&) = delete;
+  ~TLockScope() { FLock.Leave(); }
+
+ private:
+  TLock& FLock;
+};
+
+}  // namespace zq

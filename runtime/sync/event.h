@@ -1,0 +1,62 @@
+#pragma once
+
+#include <atomic>
+#include <condition_variable>
+#include <mutex>
+#include <span>
+#include <vector>
+
+#include "runtime/core/objects.h"
+
+namespace zq {
+
+inline constexpr Cardinal INFINITE = 0xFFFFFFFF;
+
+enum class TWaitResult : std::uint8_t { wrSignaled, wrTimeout, wrAbandoned, wrError };
+using enum TWaitResult;
+
+/// What a thread can wait for.
+class ZQ_API TSynchroObject : public TObject {
+ public:
+  ~TSynchroObject() override = default;
+  /// For at most ATimeout milliseconds, on a clock that nobody sets.
+  virtual TWaitResult WaitFor(Cardinal ATimeout = INFINITE) = 0;
+};
+
+/// A flag to wait for. Any thread may call; a wait ends at the signal.
+///
+/// A manual-reset event lets every waiter pass until ResetEvent; an automatic one lets one pass and is reset by that.
+/// Once a waiter has passed, the event may be destroyed: SetEvent doesn't touch it any more.
+class ZQ_API TEvent : public TSynchroObject {
+ public:
+  explicit TEvent(bool AManualReset = true, bool AInitialState = false) noexcept
+      : FManualReset(AManualReset), FSignaled(AInitialState) {}
+  ~TEvent() override = default;
+
+  void SetEvent();
+  void ResetEvent();
+  TWaitResult WaitFor(Cardinal ATimeout = INFINITE) override;
+
+  /// Waits for the first of several and returns its index; -1 when the time is over. Of those that are set the
+  /// foremost passes. All must outlive the call.
+  static Integer WaitForAny(std::span<TEvent* const> AEvents, Cardinal ATimeout = INFINITE);
+
+ private:
+  struct TWaiter;
+  void Enlist(TWaiter* AWaiter);
+  void Delist(TWaiter* AWaiter);
+
+  std::mutex FLock;
+  std::condition_variable FChanged;
+  std::vector<TWaiter*> FWaiters;  // of WaitForAny
+  const bool FManualReset;
+  std::atomic<bool> FSignaled;  // written under FLock
+};
+
+/// Manual-reset, not set at first.
+class ZQ_API TSimpleEvent : public TEvent {
+ public:
+  TSimpleEvent() noexcept : TEvent(true, false) {}
+};
+
+}  // namespace zq

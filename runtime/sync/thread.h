@@ -1,0 +1,166 @@
+#pragma once
+
+#include <atomic>
+#include <functional>
+#include <memory>
+
+#include "runtime/core/exceptions.h"
+#include "runtime/sync/critical_section.h"
+#include "runtime/sync/event.h"
+
+namespace zq {
+
+struct ZQ_API EThread : Exception {
+  using Exception::Exception;
+};
+
+/// Milliseconds; 0 gives way to other threads.
+ZQ_API void Sleep(Cardinal AMilliseconds);
+
+/// True on the thread that the process began with.
+[[nodiscard]] ZQ_API bool IsMainThread() noexcept;
+
+/// A thread of the system, shared by the thread itself and by whoever holds its handle. Any thread may call.
+class ZQ_API TNativeThread {
+ public:
+  TNativeThread(std::function<Integer()> AFunc, bool ASuspended);
+  TNativeThread(const TNativeThread&) = delete;
+  TNativeThread& operator=(const TNativeThread&) = delete;
+
+  /// The system's number, known from the start on.
+  [[nodiscard]] Cardinal ThreadID() const noexcept { return FThreadID.load(std::memory_order_acquire); }
+  /// The thread library's handle (pthread_t).
+  [[nodiscard]] unsigned long NativeHandle() const noexcept { return FNative; }
+  /// Lets a thread go that was begun suspended.
+  void Resume() { FResumed.SetEvent(); }
+  /// Set when the thread's function has returned or was left, and its captures are gone.
+  [[nodiscard]] TEvent& Ended() noexcept { return FEnded; }
+  /// 0 until the thread has ended.
+  [[nodiscard]] Integer ExitCode() const noexcept { return FExitCode.load(std::memory_order_acquire); }
+
+ private:
+  friend ZQ_API std::shared_ptr<TNativeThread> BeginThread(std::function<Integer()> AFunc, bool ASuspended);
+  void Run();
+
+  std::function<Integer()> FFunc;
+  TEvent FResumed;
+  TSimpleEvent FStarted;
+  TSimpleEvent FEnded;
+  std::atomic<Cardinal> FThreadID = 0;
+  std::atomic<Integer> FExitCode = 0;
+  unsigned long FNative = 0;
+};
+using TThreadHandle = std::shared_ptr<TNativeThread>;
+
+/// Begins a thread that runs AFunc; its result is the exit code. An exception that leaves AFunc ends the thread, and
+/// nothing else, with the code -1. Raises EThread where the system has no thread to give. ASuspended holds AFunc back
+/// until Resume; the thread's number is known all the same.
+[[nodiscard]] ZQ_API TThreadHandle BeginThread(std::function<Integer()> AFunc, bool ASuspended = false);
+/// Ends the calling thread, one that BeginThread began, with that exit code; scopes are left on the way.
+[[noreturn]] ZQ_API void EndThread(Integer AExitCode);
+
+/// Runs what waits for the main thread and returns whether there was anything; with an empty queue waits for at most
+/// ATimeout milliseconds. On the main thread only: raises EThread elsewhere. A queued call that raises lets its
+/// exception out here; what stands behind it stays queued.
+ZQ_API bool CheckSynchronize(Cardinal ATimeout = 0);
+/// Set while calls wait for the main thread; CheckSynchronize resets it.
+[[nodiscard]] ZQ_API TEvent& SyncEvent();
+
+using TThreadProcedure = std::function<void()>;
+
+/// A thread as an object. Made by New; begins to run in AfterConstruction unless made suspended, else in Start.
+///
+/// Free terminates and waits for a thread that runs; with FreeOnTerminate it frees itself, and nobody else may touch it
+/// once it can have ended. Once it is started any thread may call.
+class ZQ_API TThread : public TObject {
+ public:
+  explicit TThread(bool ACreateSuspended = false) noexcept : FCreateSuspended(ACreateSuspended) {}
+
+  /// Raises EThread on a thread that was started.
+  void Start();
+  /// Asks Execute to return; nothing is forced. Before Execute was entered it keeps it from being so.
+  void Terminate();
+  /// Waits for the end and returns ReturnValue. On the main thread it runs meanwhile what is queued for that, and lets
+  /// out what that raises. Raises EThread on the thread itself and on one that was not started.
+  Integer WaitFor();
+
+  [[nodiscard]] bool Terminated() const noexcept { return FTerminated.load(std::memory_order_acquire); }
+  /// Execute has returned.
+  [[nodiscard]] bool Finished() const noexcept { return FFinished.load(std::memory_order_acquire); }
+  [[nodiscard]] bool FreeOnTerminate() const noexcept { return FFreeOnTerminate.load(std::memory_order_acquire); }
+  void SetFreeOnTerminate(bool AValue) noexcept { FFreeOnTerminate.store(AValue, std::memory_order_release); }
+  [[nodiscard]] Integer ReturnValue() const noexcept { return FReturnValue.load(std::memory_order_acquire); }
+  void SetReturnValue(Integer AValue) noexcept { FReturnValue.store(AValue, std::memory_order_release); }
+  /// 0 before the start.
+  [[nodiscard]] Cardinal ThreadID() const noexcept;
+  /// What ended Execute; to be read when the thread has finished.
+  [[nodiscard]] const ExceptionRef& FatalException() const noexcept { return FFatalException; }
+
+  /// Runs AProcedure on the main thread and waits for that; at once where the caller is the main thread. What it
+  /// raises is raised here, as the same object.
+  static void Synchronize(const TThread* AThread, const TThreadProcedure& AProcedure);
+  /// The same without waiting; on the main thread at once.
+  static void Queue(const TThread* AThread, TThreadProcedure AProcedure);
+  /// As Queue, but never at once.
+  static void ForceQueue(const TThread* AThread, TThreadProcedure AProcedure);
+  /// Drops what was queued for AThread; its own end does that too.
+  static void RemoveQueuedEvents(const TThread* AThread);
+
+ protected:
+  ~TThread() override;
+  void AfterConstruction() override;
+  void BeforeDestruction() override;
+  virtual void Execute() = 0;
+  /// Called by Terminate, on its thread.
+  virtual void TerminatedSet() {}
+  void Synchronize(const TThreadProcedure& AProcedure) { Synchronize(this, AProcedure); }
+  void Queue(TThreadProcedure AProcedure) { Queue(this, std::move(AProcedure)); }
+
+ private:
+  Integer Run();
+
+  const bool FCreateSuspended;
+  TThreadHandle FHandle;
+  ExceptionRef FFatalException;
+  std::atomic<bool> FTerminated = false;
+  std::atomic<bool> FFinished = false;
+  std::atomic<bool> FFreeOnTerminate = false;
+  std::atomic<Integer> FReturnValue = 0;
+};
+
+/// Atomic steps on plain numbers; each returns the new value, Exchange and CompareExchange the old one.
+struct TInterlocked {
+  template <class T>
+  static T Add(T& ATarget, T ABy) noexcept {
+    return std::atomic_ref<T>(ATarget).fetch_add(ABy) + ABy;
+  }
+  template <class T>
+  static T Increment(T& ATarget) noexcept {
+    return Add(ATarget, T{1});
+  }
+  template <class T>
+  static T Decrement(T& ATarget) noexcept {
+    return Add(ATarget, static_cast<T>(-1));
+  }
+  template <class T>
+  static T Exchange(T& ATarget, T AValue) noexcept {
+    return std::atomic_ref<T>(ATarget).exchange(AValue);
+  }
+  template <class T>
+  static T CompareExchange(T& ATarget, T AValue, T AComparand) noexcept {
+    std::atomic_ref<T>(ATarget).compare_exchange_strong(AComparand, AValue);
+    return AComparand;
+  }
+};
+
+/// A re-entrant lock for each object, which exists only while somebody holds or wants it.
+struct ZQ_API TMonitor {
+  static void Enter(const TObject* AObject);
+  /// Waits for at most ATimeout milliseconds.
+  [[nodiscard]] static bool Enter(const TObject* AObject, Cardinal ATimeout);
+  [[nodiscard]] static bool TryEnter(const TObject* AObject) { return Enter(AObject, 0); }
+  /// Raises EThread where the caller doesn't hold the lock.
+  static void Exit(const TObject* AObject);
+};
+
+}  // namespace zq

@@ -1,0 +1,290 @@
+#include <gtest/gtest.h>
+
+#include <functional>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "runtime/containers/collection.h"
+#include "runtime/containers/lists.h"
+#include "runtime/containers/string_list.h"
+#include "runtime/text/encoding.h"
+#include "tests/support/support.h"
+
+namespace zq {
+namespace {
+
+template <class E>
+UnicodeString MessageOf(const std::function<void()>& ACall) {
+  try {
+    ACall();
+  } catch (const E& e) {
+    return e.Message();
+  }
+  return u"nothing was raised";
+}
+
+// ---- Lists
+// -----------------------------------------------------------------------------------------------------------
+
+TEST(Lists, AnIndexOutOfRangeRaisesAndItemsMoveBothWays) {
+  TListOf<int> List;
+  for (const int Item : {10, 21, 30, 41}) List.Add(Item);
+  const std::function<void(Integer)> Uses[] = {[&](Integer i) { static_cast<void>(List.Items(i)); },
+      [&](Integer i) { List.Delete(i); }, [&](Integer i) { List.SetItems(i, 9); }, [&](Integer i) { List.Move(i, 0); }};
+  for (const auto& Use : Uses)
+    for (const Integer Index : {-1, 4})
+      EXPECT_EQ(MessageOf<EListError>([&] { Use(Index); }),
+          Index < 0 ? u"List index out of bounds (-1)" : u"List index out of bounds (4)");
+  EXPECT_THROW(List.Insert(5, 9), EListError);
+  List.Move(0, 2);
+  List.Move(3, 1);
+  EXPECT_EQ(std::vector(List.begin(), List.end()), (std::vector{21, 41, 30, 10}));
+}
+
+struct TCounted : TObject {
+  explicit TCounted(int& AEnds, bool ARefuses = false) : Ends(AEnds), Refuses(ARefuses) {}
+  ~TCounted() override { ++Ends; }
+  void BeforeDestruction() override {
+    if (Refuses) throw EInvalidOperation(u"no");
+  }
+  int& Ends;
+  bool Refuses;
+};
+
+TEST(Lists, AnObjectListEndsWhatItOwnsButForWhoRefuses) {
+  int Ends = 0;
+  TCounted Foreign(Ends);
+  auto* const Stubborn = New<TCounted>(Ends, true);
+  auto* const Taken = New<TCounted>(Ends);
+  {
+    TObjectList Borrowing(false), Owning;
+    Borrowing.Add(&Foreign);
+    Owning.Add(Taken);
+    for (int i = 0; i < 2; ++i) Owning.Add(New<TCounted>(Ends));
+    EXPECT_EQ(Owning.Extract(0), Taken);
+    Owning.Delete(0);
+    EXPECT_EQ(Ends, 1);
+    Owning.Add(Stubborn);
+    EXPECT_THROW(Owning.Clear(), EInvalidOperation);
+    Owning.Add(Stubborn);
+  }
+  EXPECT_EQ(Ends, 2);
+  Stubborn->Refuses = false;
+  Stubborn->Free();
+  Taken->Free();
+}
+
+struct IFirst : Extends<IInterface> {
+  static constexpr TGUID IID = "{0D3C1F10-0001-4000-8000-000000000001}"_guid;
+};
+struct ISecond : Extends<IInterface> {
+  static constexpr TGUID IID = "{0D3C1F10-0001-4000-8000-000000000002}"_guid;
+};
+struct TBoth : Implements<TInterfacedObject, IFirst, ISecond> {
+  explicit TBoth(TInterfaceList& AList, int& ASeen) : List(AList), Seen(ASeen) {}
+  ~TBoth() override { Seen = List.Count(); }
+  TInterfaceList& List;
+  int& Seen;
+};
+
+TEST(Lists, AnInterfaceListGoesByTheObjectAndHoldsACount) {
+  TInterfaceList List;
+  int SeenAtTheEnd = -1;
+  auto* const Object = New<TBoth>(List, SeenAtTheEnd);
+  {
+    const IntfRef<IFirst> First(Object);
+    List.Add(First);
+    EXPECT_EQ(List.IndexOf(First.As<ISecond>()), 0);
+    EXPECT_EQ(List.IndexOf(nullptr), -1);
+  }
+  EXPECT_EQ(Object->RefCount(), 1);
+  List.Delete(0);
+  EXPECT_EQ(SeenAtTheEnd, 0) << "the item's end has to see a list without it";
+}
+
+TEST(ThreadList, ThreadsAddEachItemOnceAndTheOwnerMayNest) {
+  TThreadListOf<int> List;
+  std::vector<std::thread> Threads;
+  for (int t = 0; t < 4; ++t)
+    Threads.emplace_back([&List] {
+      for (int i = 0; i < 200; ++i) List.Add(i);
+    });
+  for (auto& Thread : Threads) Thread.join();
+  const auto Locked = List.Locked();
+  List.Remove(0);
+  EXPECT_EQ(Locked->Count(), 199);
+}
+
+// ---- String lists
+// ----------------------------------------------------------------------------------------------------
+
+std::vector<UnicodeString> Lines(const TStrings& AStrings) { return {AStrings.begin(), AStrings.end()}; }
+
+TEST(StringList, TextSplitsAtEveryKindOfLineEnd) {
+  struct TCase {
+    const char16_t* Text;
+    std::vector<UnicodeString> Lines;
+  };
+  for (const auto& Case :
+      {TCase{u"", {}}, TCase{u"a\r\nb", {u"a", u"b"}}, TCase{u"a\nb\n", {u"a", u"b"}}, TCase{u"a\rb\r", {u"a", u"b"}},
+          TCase{u"\r\n", {u""}}, TCase{u"a\n\r\n\rb", {u"a", u"", u"", u"b"}}, TCase{u"a\r\r\nb", {u"a", u"", u"b"}}}) {
+    TStringList List;
+    List.Add(u"old");
+    List.SetText(Case.Text);
+    EXPECT_EQ(Lines(List), Case.Lines) << UnicodeString(Case.Text).ToUTF8();
+  }
+  TStringList List;
+  List.SetText(u"a\n\nb");
+  EXPECT_EQ(List.Text(), u"a\r\n\r\nb\r\n");
+}
+
+TEST(StringList, NamesAndValuesGoByTheFirstEqualSign) {
+  TStringList List;
+  List.SetText(u"plain\nKey=a=b\nkey=second");
+  EXPECT_EQ(List.IndexOfName(u"KEY"), 1);
+  EXPECT_EQ(List.IndexOfName(u""), -1) << "a line without a name has no empty name";
+  EXPECT_EQ(List.Names(0), u"");
+  EXPECT_EQ(List.Values(u"key"), u"a=b");
+  List.SetValues(u"key", u"");
+  List.SetValues(u"new", u"1");
+  List.SetValues(u"absent", u"");
+  EXPECT_EQ(Lines(List), (std::vector<UnicodeString>{u"plain", u"key=second", u"new=1"}));
+}
+
+TEST(StringList, OrderGoesByLowerCaseUnlessCaseCounts) {
+  TStringList List;
+  List.SetText(u"b\nÄ\n_\nB\nä\na\nAb");
+  List.Sort();
+  EXPECT_EQ(Lines(List), (std::vector<UnicodeString>{u"_", u"a", u"Ab", u"b", u"B", u"Ä", u"ä"}));
+  List.SetCaseSensitive(true);
+  List.SetSorted(true);
+  EXPECT_EQ(Lines(List), (std::vector<UnicodeString>{u"Ab", u"B", u"_", u"a", u"b", u"Ä", u"ä"}));
+  EXPECT_EQ(List.IndexOf(u"A"), -1);
+  EXPECT_EQ(List.Add(u"C"), 2);
+  EXPECT_EQ(List.Add(u"C"), 2);
+  EXPECT_EQ(List.Count(), 8);
+  List.SetDuplicates(dupError);
+  EXPECT_THROW(List.Add(u"C"), EStringListError);
+  EXPECT_THROW(List.Insert(0, u"x"), EStringListError);
+}
+
+TEST(StringList, CustomSortComparesByIndexAndMovesTheObjectsAlong) {
+  TStringList Objects[3], List;
+  for (Integer i = 0; i < 3; ++i) Objects[i].SetDelimiter(static_cast<Char>(u'3' - i));
+  for (Integer i = 0; i < 3; ++i) List.AddObject(UnicodeString(static_cast<Char>(u'a' + i)), &Objects[i]);
+  List.CustomSort([](const TStringList& AList, Integer A, Integer B) {
+    const auto Key = [&](Integer i) { return dynamic_cast<TStringList*>(AList.Objects(i))->Delimiter(); };
+    return Key(A) - Key(B);
+  });
+  EXPECT_EQ(Lines(List), (std::vector<UnicodeString>{u"c", u"b", u"a"}));
+  EXPECT_EQ(List.Objects(0), &Objects[2]);
+}
+
+TEST(StringList, FilesBearAndHonourTheByteOrderMark) {
+  const TTempFolder Folder;
+  const TAnsiCodePageScope Western(1252);
+  const auto File = Folder.File("list.txt");
+  TStringList List;
+  List.Add(u"é");
+  List.SaveToFile(File);
+  EXPECT_EQ(Folder.Read("list.txt"), "\xE9\r\n");
+  List.SaveToFile(File, TEncoding::UTF8());
+  EXPECT_EQ(Folder.Read("list.txt"), "\xEF\xBB\xBF\xC3\xA9\r\n");
+  struct TCase {
+    std::string_view Bytes;
+    const TEncoding* Encoding;
+    const char16_t* Text;
+  };
+  using namespace std::string_view_literals;
+  for (const auto& Case : {TCase{"\xE9"sv, nullptr, u"é"}, TCase{"\xEF\xBB\xBF\xC3\xA9"sv, nullptr, u"é"},
+           TCase{"\xFF\xFE\xE9\0"sv, nullptr, u"é"}, TCase{"\xFE\xFF\0\xE9"sv, nullptr, u"é"},
+           TCase{"\xC3\xA9"sv, &TEncoding::UTF8(), u"é"}, TCase{"\xEF\xBB\xBF\xC3\xA9"sv, &TEncoding::UTF8(), u"é"},
+           TCase{"\xFF\xFE"sv, &TEncoding::ANSI(), u"ÿþ"}}) {
+    Folder.Write("list.txt", Case.Bytes);
+    if (Case.Encoding == nullptr) List.LoadFromFile(File);
+    else List.LoadFromFile(File, *Case.Encoding);
+    EXPECT_EQ(List.Text(), Case.Text + UnicodeString(u"\r\n"));
+  }
+  EXPECT_THROW(List.LoadFromFile(Folder.File("absent")), EFOpenError);
+}
+
+// ---- Collections
+// -----------------------------------------------------------------------------------------------------
+
+class TCard : public TCollectionItem {
+ public:
+  using TCollectionItem::TCollectionItem;
+  void SetText(const UnicodeString& AText) {
+    Text = AText;
+    Changed(false);
+  }
+  void AssignTo(TPersistent* ADest) const override {
+    if (auto* const Card = dynamic_cast<TCard*>(ADest)) Card->SetText(Text);
+    else TCollectionItem::AssignTo(ADest);
+  }
+  void AfterConstruction() override {
+    TCollectionItem::AfterConstruction();
+    if (FailNext) throw EInvalidOperation(u"no");
+  }
+  void BeforeDestruction() override {
+    if (Refuses) throw EInvalidOperation(u"no");
+    TCollectionItem::BeforeDestruction();
+  }
+  UnicodeString Text;
+  bool Refuses = false;
+  static inline bool FailNext = false;
+};
+
+class TCards : public TCollection {
+ public:
+  TCards() : TCollection(TCollectionItemClass::Of<TCard>()) {}
+  ~TCards() override { Clear(); }
+  void Added(TCollectionItem* AItem) override { Log += "+" + dynamic_cast<TCard&>(*AItem).ClassName().ToUTF8(); }
+  void Deleting(TCollectionItem* AItem) override { Log += "-" + dynamic_cast<TCard&>(*AItem).Text.ToUTF8(); }
+  void Update(TCollectionItem* AItem) override { Log += AItem == nullptr ? "*" : "u"; }
+  TCard& Card(Integer AIndex) { return dynamic_cast<TCard&>(*Items(AIndex)); }
+  std::string Log;
+};
+
+TEST(Collection, HooksSeeWholeItemsAndUpdatesWaitForTheOutermostEnd) {
+  TCards Cards;
+  Cards.Add();
+  Cards.Card(0).SetText(u"a");
+  EXPECT_EQ(std::exchange(Cards.Log, ""), "+TCard*u");
+  Cards.BeginUpdate();
+  Cards.BeginUpdate();
+  dynamic_cast<TCard&>(*Cards.Insert(0)).SetText(u"b");
+  Cards.EndUpdate();
+  EXPECT_EQ(std::exchange(Cards.Log, ""), "+TCard");
+  Cards.EndUpdate();
+  Cards.Delete(1);
+  EXPECT_EQ(std::exchange(Cards.Log, ""), "*-a*");
+  Cards.BeginUpdate();
+  Cards.EndUpdate();
+  EXPECT_EQ(Cards.Log, "") << "nothing changed";
+}
+
+TEST(Collection, CopiesByAssignAndLosesNothingToFailures) {
+  TCards Cards, Copy;
+  for (const char16_t* Text : {u"a", u"b", u"c"}) dynamic_cast<TCard&>(*Cards.Add()).Text = Text;
+  Cards.Items(0)->SetIndex(2);
+  Copy.Add();
+  Copy.Assign(&Cards);
+  EXPECT_EQ(Copy.Card(0).Text + Copy.Card(1).Text + Copy.Card(2).Text, u"bca");
+  EXPECT_EQ(Cards.FindItemID(0)->Index(), 2);
+  TStringList List;
+  EXPECT_EQ(MessageOf<EConvertError>([&] { Copy.Assign(&List); }), u"Cannot assign a TStringList to a TCards");
+  EXPECT_EQ(MessageOf<EConvertError>([&] { List.Assign(nullptr); }), u"Cannot assign a nil to a TStringList");
+  TCard::FailNext = true;
+  EXPECT_THROW(Cards.Add(), EInvalidOperation);
+  TCard::FailNext = false;
+  EXPECT_EQ(Cards.Count(), 3);
+  Cards.Card(1).Refuses = true;
+  EXPECT_THROW(Cards.Clear(), EInvalidOperation);
+  EXPECT_EQ(Cards.Count(), 2);
+  Cards.Card(1).Refuses = false;
+}
+
+}  // namespace
+}  // namespace zq

@@ -1,0 +1,266 @@
+#include <dlfcn.h>
+#include <gtest/gtest.h>
+
+#include <functional>
+#include <thread>
+#include <vector>
+
+#include "runtime/core/delegates.h"
+#include "runtime/core/exceptions.h"
+#include "runtime/core/objects.h"
+#include "tests/plugin/plugin.h"
+#include "tests/support/support.h"
+
+namespace zq {
+
+struct TOuter : TObject {
+  struct TInner : TObject {};
+};
+template <class T>
+struct TBox : TObject {};
+
+namespace {
+
+struct THidden : TObject {};
+
+TEST(ClassName, DropsWhatEnclosesTheClassAndKeepsItsArguments) {
+  struct TLocal : TObject {};
+  EXPECT_EQ(TOuter::TInner().ClassName(), u"TInner");
+  EXPECT_EQ(THidden().ToString(), u"THidden");
+  EXPECT_EQ(TLocal().ClassName(), u"TLocal");
+  EXPECT_EQ(TBox<TOuter::TInner>().ClassName(), u"TBox<zq::TOuter::TInner>");
+  EXPECT_EQ(TBox<THidden>().ClassName(), u"TBox<zq::(anonymous namespace)::THidden>");
+  EXPECT_EQ(TClass().ClassName(), u"");
+}
+
+struct TForeign {
+  virtual ~TForeign() = default;
+};
+struct TLeft : TForeign, TObject {};
+struct TDeep : TLeft {};
+
+TEST(Class, IsKnownThroughASecondBase) {
+  const TDeep Deep;
+  EXPECT_EQ(static_cast<const TObject&>(Deep).ClassType(), ClassOf<TDeep>());
+  EXPECT_TRUE(Deep.InheritsFrom(ClassOf<TDeep>()) && Deep.InheritsFrom(ClassOf<TForeign>()));
+  EXPECT_FALSE(Deep.InheritsFrom(ClassOf<THidden>()) || Deep.InheritsFrom(TClass()));
+  EXPECT_FALSE(ClassOf<TLeft>().InheritsFrom(ClassOf<TDeep>()));
+  EXPECT_EQ(ClassOf<TLeft>().ClassParent(), ClassOf<TObject>()) << "the first base is none of the family";
+  EXPECT_FALSE(ClassOf<TObject>().ClassParent());
+}
+
+// ---- Life ----------------------------------------------------------------------------------------------------------
+
+class TLifeBase : public TObject {
+ public:
+  TLifeBase(std::string& ASteps, char ARaiseAt) : RaiseAt(ARaiseAt), FSteps(ASteps) { Step('c'); }
+  char RaiseAt;
+
+ protected:
+  ~TLifeBase() override { FSteps += 'd'; }
+  void AfterConstruction() override { Step('a'); }
+  void BeforeDestruction() override { Step('b'); }
+  void Step(char AStep) {
+    FSteps += AStep;
+    if (AStep == RaiseAt) throw Exception(u"at the step");
+  }
+  std::string& FSteps;
+};
+
+class TLife : public TLifeBase {
+ public:
+  using TLifeBase::TLifeBase;
+
+ protected:
+  ~TLife() override { FSteps += 'D'; }
+  void AfterConstruction() override {
+    TLifeBase::AfterConstruction();
+    Step('A');
+  }
+};
+
+TEST(Life, RaiseOnTheWayInLeavesNothingBehind) {
+  std::string Steps;
+  EXPECT_THROW(std::ignore = New<TLife>(Steps, 'c'), Exception);
+  EXPECT_THROW(std::ignore = New<TLife>(Steps, 'A'), Exception);
+  EXPECT_EQ(Steps, "ccaADd");
+}
+
+TEST(Life, RaiseBeforeTheEndLeavesTheObjectAlive) {
+  std::string Steps;
+  TLife* const Object = New<TLife>(Steps, 'b');
+  TLife* Field = Object;
+  EXPECT_THROW(FreeAndNil(Field), Exception);
+  EXPECT_EQ(Field, nullptr) << "the field is emptied first";
+  EXPECT_EQ(Steps, "caAb");
+  Object->RaiseAt = ' ';
+  Free(Object);
+  EXPECT_EQ(Steps, "caAbbDd");
+  Free(Field);
+}
+
+TEST(ClassRef, MakesTheClassThatItNames) {
+  using TLifeClass = TClassRef<TLifeBase(std::string&, char)>;
+  std::string Steps;
+  const TLifeClass Class = TLifeClass::Of<TLife>();
+  const TOwned<TLifeBase> Object(Class.Create(Steps, ' '));
+  EXPECT_EQ(Steps, "caA") << "the whole of the protocol has run";
+  EXPECT_EQ(Class.ClassName(), u"TLife");
+  EXPECT_NE(Class, TLifeClass::Of<TLifeBase>());
+  EXPECT_NE(Class, TLifeClass());
+}
+
+// ---- Callbacks -----------------------------------------------------------------------------------------------------
+
+using TAdd = TMethod<int(int)>;
+
+struct TCounter : TObject {
+  int Add(int ABy) { return Sum += ABy; }
+  int Twice(int ABy) { return Sum += 2 * ABy; }
+  int Sum = 0;
+};
+
+TEST(Method, BoundToAnObjectComparesByObjectAndFunction) {
+  TCounter A, B;
+  const TAdd OfA = Bind<&TCounter::Add>(&A);
+  EXPECT_EQ(OfA(3) + OfA(4), 10);
+  EXPECT_EQ(OfA.Object(), &A);
+  EXPECT_EQ(OfA, TAdd::Of<&TCounter::Add>(&A));
+  EXPECT_NE(OfA, TAdd::Of<&TCounter::Add>(&B));
+  EXPECT_NE(OfA, TAdd::Of<&TCounter::Twice>(&A));
+  EXPECT_NE(OfA, TAdd());
+  EXPECT_THROW(TAdd()(1), std::bad_function_call);
+}
+
+TEST(Method, CopiesOfALambdaShareItAndTheLastOneEndsIt) {
+  const auto Token = std::make_shared<int>(0);
+  TAdd First = [Token, Sum = 0](int ABy) mutable { return Sum += ABy; };
+  const TAdd Second = First;
+  EXPECT_EQ(First, Second);
+  EXPECT_EQ(First.Object(), nullptr);
+  EXPECT_EQ(First(2) + Second(3), 2 + 5);
+  TAdd Moved = std::move(First);
+  Moved = Second;
+  EXPECT_EQ(Token.use_count(), 2);
+  Moved = nullptr;
+  EXPECT_EQ(Second(1), 6);
+}
+
+TEST(Method, CallMayOverwriteTheFieldItWasMadeThrough) {
+  TAdd Field;
+  const auto Token = std::make_shared<int>(7);
+  Field = [&Field, Token](int ABy) {
+    Field = nullptr;
+    return *Token + ABy;  // reads the callable, which the field no longer keeps
+  };
+  EXPECT_EQ(Field(1), 8);
+  EXPECT_EQ(Token.use_count(), 1);
+}
+
+// ---- Exceptions ----------------------------------------------------------------------------------------------------
+
+TEST(ThreadException, StaysTheSameObjectAcrossThreads) {
+  ExceptionRef Held;
+  const Exception* Raised = nullptr;
+  std::thread([&] {
+    try {
+      throw EInOutError(u"d\u00FCnn", 28);
+    } catch (const Exception& e) {
+      Raised = &e;
+      Held = AcquireExceptionObject();
+    }
+  }).join();
+  EXPECT_EQ(Held.Get(), Raised);
+  try {
+    Held.Raise();
+  } catch (const EInOutError& e) {
+    EXPECT_EQ(&e, Raised);
+    EXPECT_STREQ(e.what(), "d\xC3\xBCnn");
+  }
+  Held->SetMessage(u"other");
+  EXPECT_STREQ(Held->what(), "other") << "the text of an earlier what() is gone";
+}
+
+TEST(ExceptionRef, HoldsWhatIsNotOfTheFamily) {
+  const auto Foreign = ExceptionRef::Of<std::runtime_error>("f\xC3\xBCr");
+  EXPECT_EQ(Foreign.Get(), nullptr);
+  EXPECT_EQ(Foreign.Message(), u"f\u00FCr");
+  EXPECT_THROW(Foreign.Raise(), std::runtime_error);
+  EXPECT_EQ(ExceptionRef(std::make_exception_ptr(5)).Message(), u"unknown exception");
+  EXPECT_FALSE(ExceptionRef::Current());
+}
+
+TEST(ExceptionClass, MakesOnlyWhatTheClassCanBeMadeFrom) {
+  const ExceptionClass Plain = ExceptionClass::Of<EListError>(), Coded = ExceptionClass::Of<EOSError>();
+  EXPECT_THROW(Plain.Create(u"m").Raise(), EListError);
+  EXPECT_THROW(std::ignore = Plain.Create(u"m", 3), EInvalidOperation);
+  EXPECT_EQ(dynamic_cast<EOSError&>(*Coded.Create(u"m", 3).Get()).ErrorCode(), 3);
+  EXPECT_THROW(std::ignore = Coded.Create(u"m"), EInvalidOperation);
+}
+
+TEST(Assertion, NamesTheUnitByItsPlaceInTheLibrary) {
+  const std::pair<const char*, UnicodeString> cCases[] = {{"/src/common/uZqLogger.cpp", u"common/uZqLogger"},
+      {"common/uZqLogger.h", u"common/uZqLogger"}, {"/home/common/lib/runtime/io/files.cpp", u"runtime/io/files"},
+      {"/runtime/lib/common/uZqTypes.cpp", u"common/uZqTypes"}, {"/uncommon/host.cpp", u"/uncommon/host"},
+      {"/v1.2/host", u"/v1.2/host"}};
+  for (const auto& [File, Unit] : cCases) try {
+      Assert(false, u"t", File, 7);
+      ADD_FAILURE();
+    } catch (const EAssertionFailed& e) {
+      EXPECT_EQ(e.Message(), u"t (" + Unit + u", line 7)");
+    }
+  EXPECT_NO_THROW(Assert(true));
+  const int Line = __LINE__ + 2;
+  try {
+    Assert(1 + 1 == 3);
+  } catch (const EAssertionFailed& e) {
+    EXPECT_EQ(e.Line(), Line) << "the caller's";
+    EXPECT_EQ(e.Message().Pos(u"Assertion failure ("), 1);
+  }
+}
+
+// ---- A second library ----------------------------------------------------------------------------------------------
+
+class Plugin : public testing::Test {
+ protected:
+  void SetUp() override {
+    void* const Library = dlopen(ZQ_TEST_PLUGIN, RTLD_NOW | RTLD_LOCAL);
+    ASSERT_NE(Library, nullptr) << dlerror();
+    FEntries = static_cast<const plugin::TEntries*>(dlsym(Library, "ZqPluginEntries"));
+    ASSERT_NE(FEntries, nullptr);
+  }
+  const plugin::TEntries* FEntries = nullptr;
+};
+
+TEST_F(Plugin, ClassesAndInterfacesAreTheSameOnBothSides) {
+  TInterfacedObject* const Object = FEntries->Make();
+  const IntfRef<IInterface> Held(Object);
+  EXPECT_EQ(Object->ClassName(), u"TPluginEcho");
+  EXPECT_TRUE(Object->InheritsFrom(ClassOf<TInterfacedObject>()) && Object->InheritsFrom(ClassOf<plugin::IEchoEx>()));
+  EXPECT_FALSE(Object->InheritsFrom(ClassOf<Exception>()));
+  EXPECT_EQ(Supports<plugin::IEcho>(Object)->Echo(u"ab"), u"ab");
+  EXPECT_EQ(Held.As<plugin::IEchoEx>()->EchoTwice(u"ab"), u"abab");
+}
+
+TEST_F(Plugin, ExceptionIsCaughtByItsTypeAndOutlivesItsHandler) {
+  ExceptionRef Held;
+  try {
+    FEntries->Raise(u"from afar");
+  } catch (const EListError&) {
+    ADD_FAILURE() << "caught as a stranger";
+  } catch (const EConvertError&) {
+    Held = ExceptionRef::Current();
+  }
+  ASSERT_TRUE(Held);
+  EXPECT_EQ(Held.Message(), u"from afar");
+  EXPECT_EQ(Held->ClassName(), u"EPluginError");
+  EXPECT_EQ(Held->ClassType(), FEntries->ClassOfRaised().ClassType());
+}
+
+TEST_F(Plugin, CallbackRaisesThroughTheOtherLibrary) {
+  const auto Refuse = [](const UnicodeString& AText) -> UnicodeString { throw EListError(AText); };
+  EXPECT_THROW(FEntries->Call(Refuse, u"x"), EListError);
+}
+
+}  // namespace
+}  // namespace zq

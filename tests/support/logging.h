@@ -1,0 +1,62 @@
+#pragma once
+
+#include <functional>
+#include <mutex>
+#include <string>
+#include <vector>
+
+#include "common/uZqLogAppenders.h"
+#include "common/uZqLogLayouts.h"
+#include "common/uZqLogger.h"
+#include "runtime/platform/clock.h"
+#include "tests/support/support.h"
+
+namespace zq {
+
+/// An appender of a host: no component, notes "<logger> <level> <message>" and then does what the test wants.
+class TNotingAppender : public Implements<TInterfacedObject, IZqLogAppender> {
+ public:
+  UnicodeString GetName() const override { return u"noting"; }
+  TComponent* Component() override { return nullptr; }
+  void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
+  void Close() override {}
+  [[nodiscard]] std::vector<std::string> Notes() const;
+
+  std::function<void(PZqDataRec)> OnWrite;
+  UnicodeString Sender;
+  TZqLogIndent Indent = liIndentNone;
+
+ protected:
+  ~TNotingAppender() override = default;
+
+ private:
+  mutable std::mutex FLock;
+  std::vector<std::string> FNotes;
+};
+
+/// A logger of its own below the root, at llAll, whose messages go no further up; the root is left as it was found.
+struct TLoggerFixture {
+  explicit TLoggerFixture(const char16_t* AName = u"test");
+  IntfRef<IZqLogger> Log;
+};
+
+/// Stands at 2021-12-23 10:53:18.123 UTC, which is local time too, until the test moves it.
+class TScriptedClock : public TClockService {
+ public:
+  Int64 UtcMicroseconds() override { return Microseconds; }
+  Integer UtcOffsetSeconds(Int64) override { return 0; }
+  Int64 Microseconds = 1640256798123000;
+};
+
+/// A file appender on ALog with the simple layout.
+template <class TAppender = TZqFileAppender>
+IntfRef<IZqFileAppender> AddFile(const IntfRef<IZqLogger>& ALog, const UnicodeString& AFileName) {
+  const auto Appender =
+      ALog->GetAppenders()->Add(TZqLogBaseClass::Of<TAppender>(), TZqLogBaseClass::Of<TZqSimpleLayout>());
+  const auto File = Appender.template As<IZqFileAppender>();
+  File->SetFileName(AFileName);
+  return File;
+}
+
+}  // namespace zq

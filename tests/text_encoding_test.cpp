@@ -1,0 +1,263 @@
+#include <gtest/gtest.h>
+
+#include <functional>
+#include <map>
+#include <thread>
+
+#include "runtime/text/encoding.h"
+#include "tests/support/support.h"
+
+namespace zq {
+namespace {
+
+// Conversions through blocks of exactly the size told, so that a sanitizer sees each byte beyond.
+std::u16string Decoded(Word ACodePage, std::string_view ABytes, Cardinal AFlags = 0) {
+  const std::vector<char> Source(ABytes.begin(), ABytes.end());
+  const auto Count = static_cast<int>(Source.size());
+  const int Size = MultiByteToWideChar(ACodePage, AFlags, Source.data(), Count, nullptr, 0);
+  std::vector<char16_t> Result(static_cast<std::size_t>(Size));
+  if (Size == 0) return {};
+  EXPECT_EQ(MultiByteToWideChar(ACodePage, AFlags, Source.data(), Count, Result.data(), Size), Size) << ACodePage;
+  return {Result.begin(), Result.end()};
+}
+
+std::string Encoded(Word ACodePage, std::u16string_view AText, Cardinal AFlags = 0) {
+  const std::vector<char16_t> Source(AText.begin(), AText.end());
+  const auto Count = static_cast<int>(Source.size());
+  const int Size = WideCharToMultiByte(ACodePage, AFlags, Source.data(), Count, nullptr, 0);
+  std::vector<char> Result(static_cast<std::size_t>(Size));
+  if (Size == 0) return {};
+  EXPECT_EQ(WideCharToMultiByte(ACodePage, AFlags, Source.data(), Count, Result.data(), Size), Size) << ACodePage;
+  return {Result.begin(), Result.end()};
+}
+
+constexpr Word cAllNumbers[] = {37, 437, 500, 708, 709, 710, 720, 737, 775, 850, 852, 855, 857, 858, 860, 861, 862, 863,
+    864, 865, 866, 869, 870, 874, 875, 932, 936, 949, 950, 1026, 1047, 1140, 1141, 1142, 1143, 1144, 1145, 1146, 1147,
+    1148, 1149, 1200, 1201, 1250, 1251, 1252, 1253, 1254, 1255, 1256, 1257, 1258, 1361, 10000, 10001, 10002, 10003,
+    10004, 10005, 10006, 10007, 10008, 10010, 10017, 10021, 10029, 10079, 10081, 10082, 12000, 12001, 20000, 20001,
+    20002, 20003, 20004, 20005, 20105, 20106, 20107, 20108, 20127, 20261, 20269, 20273, 20277, 20278, 20280, 20284,
+    20285, 20290, 20297, 20420, 20423, 20424, 20833, 20838, 20866, 20871, 20880, 20905, 20924, 20932, 20936, 20949,
+    21025, 21866, 28591, 28592, 28593, 28594, 28595, 28596, 28597, 28598, 28599, 28603, 28605, 29001, 38598, 50220,
+    50221, 50222, 50225, 50227, 51932, 51936, 51949, 52936, 54936, 57002, 57003, 57004, 57005, 57006, 57007, 57008,
+    57009, 57010, 57011, 65000, 65001};
+
+TEST(TextEncoding, ExactlyThesePagesHaveNoCharacterData) {
+  const std::vector<Word> cWithout = {709, 710, 1361, 10001, 10002, 10003, 10004, 10005, 10008, 10010, 10021, 10079,
+      10082, 20000, 20001, 20002, 20003, 20004, 20005, 20105, 20106, 20107, 20108, 20261, 20269, 20423, 20833, 20880,
+      20905, 20924, 29001};
+  std::vector<Word> Refused;
+  for (const Word Number : cAllNumbers) {
+    SetLastError(0);
+    if (MultiByteToWideChar(Number, 0, "A\0\0\0", 4, nullptr, 0) != 0) continue;
+    EXPECT_EQ(GetLastError(), ERROR_INVALID_PARAMETER) << Number;
+    EXPECT_THROW((void)TEncoding::GetEncoding(Number), EEncodingError) << Number;
+    Refused.push_back(Number);
+  }
+  EXPECT_EQ(std::size(cAllNumbers), 142U);
+  EXPECT_EQ(Refused, cWithout);
+}
+
+TEST(TextEncoding, EveryPageWritesAndReadsItsScript) {
+  const std::map<std::u16string, std::vector<Word>> cTexts = {
+      {u"Straße Ñandú", {437, 850, 858, 1252, 1254, 10000, 28591, 28605, 37, 500, 1047, 1140, 1148, 20273, 20284}},
+      {u"Příliš žluťoučký", {852, 1250, 10029, 28592, 870}},
+      {u"Привет", {855, 866, 1251, 10007, 10017, 20866, 21866, 28595, 21025}},
+      {u"Καλημέρα", {737, 869, 1253, 10006, 28597, 875}}, {u"שלום", {862, 1255, 28598, 38598, 20424}},
+      {u"سلام", {708, 720, 1256, 28596}}, {u"Ğışç", {857, 1254, 1026, 28599, 10081}}, {u"Žąsų", {775, 1257, 28603}},
+      {u"สวัสดี", {874, 20838}}, {u"日本語テスト", {932, 20932, 51932, 50220, 50221, 50222}},
+      {u"ｱｲｳ", {932, 20932, 50221, 50222}}, {u"中文测试", {936, 20936, 51936, 50227, 52936, 54936}},
+      {u"中文測試", {950, 936}}, {u"한국어", {949, 20949, 51949, 50225}}, {u"कखग", {57002}}, {u"কখগ", {57003, 57006}},
+      {u"தமிழ்", {57004}}, {u"తెలుగు", {57005}}, {u"ಕನ್ನಡ", {57008}}, {u"മലയ", {57009}}, {u"ગુજર", {57010}},
+      {u"ਪਜਬ", {57011}}, {u"ଓଡିଆ", {57007}}, {u"ế\u0301", {54936}},
+      {u"a€ü漢😀\u0301", {1200, 1201, 12000, 12001, 65000, 65001, 54936}}};
+  for (const auto& [Text, Pages] : cTexts)
+    for (const Word Page : Pages) {
+      std::u16string Framed;  // longer than any buffer on the way
+      while (Framed.size() < 2000) Framed += u"A~+b1\r\n" + Text + u" x\\\x7F\x1A\x1C" + Text;
+      EXPECT_EQ(UnicodeString(Decoded(Page, Encoded(Page, Framed))), UnicodeString(Framed)) << Page;
+    }
+}
+
+TEST(TextEncoding, MapsAsThePagesOfThePlatformDo) {
+  const struct {
+    Word Page;
+    std::string_view Bytes;
+    std::u16string_view Text;
+  } cCases[] = {{1252, "\x80\x81\x8D\x8F\x90\x9D", u"\u20AC\x81\x8D\x8F\x90\x9D"}, {932, "\x81\x60", u"\uFF5E"},
+      {932, "\xF0\x40\\~", u"\uE000\\~"}, {936, "\x80", u"\u20AC"}, {950, "\x81\x40", u"\uEEB8"},
+      {949, "\xB0\xA1", u"가"}, {28591, "\x80\xFF", u"\x80\xFF"},
+      {437, "\x1A\x7F\x1C\x80\x1A\x7F\x1C", u"\x1A\x7F\x1C\u00C7\x1A\x7F\x1C"}, {37, "\xC1\x4A", u"A\u00A2"},
+      {1201, {"\0A\x20\xAC", 4}, u"A€"}, {12000, {"A\0\0\0\0\xF6\x01\0", 8}, u"A😀"},
+      {65001, "\xE2\x82\xAC\xF0\x9F\x98\x80", u"€😀"}, {65000, "a+IKw-", u"a€"}, {52936, "ab~{VP~}", u"ab中"},
+      {50220, "\x1B$B$\"\x1B(B", u"あ"}, {54936, "\x81\x30\x81\x30", u"\x80"}};
+  for (const auto& Case : cCases) {
+    EXPECT_EQ(UnicodeString(Decoded(Case.Page, Case.Bytes)), Case.Text) << Case.Page;
+    EXPECT_EQ(Encoded(Case.Page, Case.Text), Case.Bytes) << Case.Page;
+  }
+}
+
+TEST(TextEncoding, WhatAPageDoesNotHaveIsReplaced) {
+  EXPECT_EQ(Encoded(1252, u"a漢😀b\xD800"), "a??b?");
+  EXPECT_EQ(Encoded(37, u"漢"), "\x6F");
+  EXPECT_EQ(Encoded(65001, u"\xD800x"), "\xEF\xBF\xBDx");
+  EXPECT_EQ(Encoded(54936, u"\xDC00"), Encoded(54936, u"\xFFFD"));
+  EXPECT_EQ(Encoded(1252, u"Ａ", WC_NO_BEST_FIT_CHARS), "?");
+  EXPECT_EQ(Encoded(1252, u"Ａ"), "A");
+  // 0x270 is what callers pass: a letter and its mark meet, where the page has them as one.
+  EXPECT_EQ(Encoded(1252, u"cafe\u0301 o\u0304", 0x270), "caf\xE9 o?");
+  EXPECT_EQ(Encoded(1252, u"e\u0301"), "e?");
+  EXPECT_EQ(Encoded(949, u"\uF900", 0x270), "\xCB\xD0");
+}
+
+TEST(TextEncoding, RefusesByItsContract) {
+  char Bytes[8];
+  char16_t Chars[8];
+  const std::function<int()> cRefused[] = {
+      [] { return MultiByteToWideChar(1252, 0, nullptr, 1, nullptr, 0); },
+      [] { return MultiByteToWideChar(1252, 0, "", 0, nullptr, 0); },
+      [] { return WideCharToMultiByte(1252, 0, u"a", -2, nullptr, 0); },
+      [] { return WideCharToMultiByte(1252, 0, u"a", 1, nullptr, 5); },
+      [&] { return MultiByteToWideChar(1252, 0, "a", 1, Chars, -1); },
+      [] { return WideCharToMultiByte(4711, 0, u"a", 1, nullptr, 0); },
+  };
+  for (std::size_t i = 0; i < std::size(cRefused); ++i) {
+    SetLastError(0);
+    EXPECT_EQ(cRefused[i](), 0) << i;
+    EXPECT_EQ(GetLastError(), ERROR_INVALID_PARAMETER) << i;
+  }
+  EXPECT_EQ(WideCharToMultiByte(65001, 0x270, u"a", 1, Bytes, 8), 0);
+  EXPECT_EQ(GetLastError(), ERROR_INVALID_FLAGS);
+  EXPECT_EQ(MultiByteToWideChar(57002, MB_ERR_INVALID_CHARS, "a", 1, Chars, 8), 0);
+  EXPECT_EQ(GetLastError(), ERROR_INVALID_FLAGS);
+  EXPECT_EQ(MultiByteToWideChar(65001, 0, "abc", -1, nullptr, 0), 4);
+  EXPECT_EQ(MultiByteToWideChar(1200, 0, "a\0b\0\0", -1, nullptr, 0), 3);
+  EXPECT_EQ(WideCharToMultiByte(932, 0, u"日", -1, Bytes, 8), 3);
+}
+
+TEST(TextEncoding, MalformedInputFailsOnlyWhenAsked) {
+  const struct {
+    Word Page;
+    std::string_view Bytes;
+    std::u16string_view Lenient;
+  } cCases[] = {{65001, "a\xC3", u"a\uFFFD"}, {65001, "\xED\xA0\x80", u"\uFFFD\uFFFD\uFFFD"},
+      {65001, "\xF0\x9F\x98", u"\uFFFD"}, {932, "a\x81", u"a\uFFFD"}, {936, "\x81", u"\uFFFD"},
+      {54936, "\x81\x30\x81", u"\uFFFD"}, {1200, {"a\0b", 3}, u"a\uFFFD"}, {1253, "\xD2", u"\uFFFD"},
+      {20127, "a\x80", u"a\uFFFD"}};
+  for (const auto& Case : cCases) {
+    EXPECT_EQ(UnicodeString(Decoded(Case.Page, Case.Bytes)), Case.Lenient) << Case.Page;
+    EXPECT_EQ(Decoded(Case.Page, Case.Bytes, MB_ERR_INVALID_CHARS), u"") << Case.Page;
+    EXPECT_EQ(GetLastError(), ERROR_NO_UNICODE_TRANSLATION) << Case.Page;
+  }
+  EXPECT_EQ(Decoded(65001, "€😀", MB_ERR_INVALID_CHARS), u"€😀");
+  EXPECT_EQ(Encoded(65001, u"a\xD83D", WC_ERR_INVALID_CHARS), "");
+}
+
+// Every text, cut at every length and into every room: the size told first is what is written, and nothing beyond.
+TEST(TextEncoding, NoCutReadsOrWritesBeyondABuffer) {
+  std::string Noise;
+  for (unsigned i = 0, x = 1; i < 48; ++i, x = x * 1103515245 + 12345) Noise += static_cast<char>(x >> 16U);
+  for (const Word Page : cAllNumbers)
+    for (const std::string& Source : {Encoded(Page, u"Aé日ш😀\u0301ä한中~+"), Noise, "\x1B$B" + Noise, "~{\x0E" + Noise})
+      for (std::size_t Cut = 1; Cut <= Source.size(); Cut += Cut < 12 ? 1 : 5) {
+        const std::vector<char> Bytes(Source.begin(), Source.begin() + static_cast<std::ptrdiff_t>(Cut));
+        const auto Count = static_cast<int>(Cut);
+        const std::u16string Whole = Decoded(Page, {Bytes.data(), Cut});
+        for (int Room = 1; Room < static_cast<int>(Whole.size()); Room += 3) {
+          std::vector<char16_t> Chars(static_cast<std::size_t>(Room));
+          ASSERT_EQ(MultiByteToWideChar(Page, 0, Bytes.data(), Count, Chars.data(), Room), 0) << Page;
+          ASSERT_EQ(GetLastError(), ERROR_INSUFFICIENT_BUFFER) << Page;
+        }
+        (void)Encoded(Page, Whole);
+      }
+}
+
+TEST(TextEncoding, TheAnsiPageFollowsItsScopeAndTheEnvironment) {
+  const Word Before = GetACP();
+  {
+    const TAnsiCodePageScope Outer(1252);
+    EXPECT_EQ(Encoded(0, u"é"), "\xE9");
+    const TAnsiCodePageScope Inner(932);
+    EXPECT_EQ(Decoded(0, "\x81\x60"), u"\uFF5E");
+    Word Elsewhere = 0;
+    std::thread([&] { Elsewhere = GetACP(); }).join();
+    EXPECT_EQ(Elsewhere, 932);
+    EXPECT_EQ(TEncoding::Default().GetCodePage(), 932);
+  }
+  EXPECT_EQ(GetACP(), Before);
+  const std::pair<const char*, Word> cCharsets[] = {{"UTF-8", 65001}, {"ANSI_X3.4-1968", 65001}, {"ISO-8859-1", 28591},
+      {"ISO-8859-15", 28605}, {"CP1251", 1251}, {"CP1252", 1252}, {"KOI8-R", 20866}, {"EUC-JP", 20932},
+      {"SHIFT_JIS", 932}, {"BIG5", 950}, {"GBK", 936}, {"GB18030", 54936}, {"TIS-620", 874}, {"nonsense", 65001}};
+  for (const auto& [Charset, Page] : cCharsets) EXPECT_EQ(CodePageOfCharset(Charset), Page) << Charset;
+}
+
+TEST(TextEncoding, SetCodePageConvertsOrNames) {
+  RawByteString Text("\xE9", 1252);
+  SetCodePage(Text, 65001);
+  EXPECT_EQ(Text, "\xC3\xA9");
+  SetCodePage(Text, 28591, false);
+  EXPECT_EQ(Text, "\xC3\xA9");
+  EXPECT_EQ(Text.CodePage(), 28591);
+  EXPECT_THROW(SetCodePage(Text, 709), EOSError);
+  EXPECT_EQ(Text.CodePage(), 28591);
+}
+
+TEST(TextEncoding, EncodingObjectsKnowNameMarkAndText) {
+  const struct {
+    Word Page;
+    const char16_t* Name;
+    const char16_t* Mime;
+    TBytes Preamble;
+  } cCases[] = {{65001, u"65001 (UTF-8)", u"UTF-8", {0xEF, 0xBB, 0xBF}},
+      {1200, u"1200 (UTF-16LE)", u"UTF-16LE", {0xFF, 0xFE}}, {1201, u"1201 (UTF-16BE)", u"UTF-16BE", {0xFE, 0xFF}},
+      {932, u"932 (Shift_JIS)", u"Shift_JIS", {}}, {1252, u"1252 (windows-1252)", u"windows-1252", {}},
+      {12001, u"12001 (UTF-32BE)", u"UTF-32BE", {0, 0, 0xFE, 0xFF}}};
+  for (const auto& Case : cCases) {
+    const auto Encoding = TEncoding::GetEncoding(Case.Page)->Clone();
+    EXPECT_EQ(Encoding->GetEncodingName(), Case.Name);
+    EXPECT_EQ(Encoding->GetMIMEName(), Case.Mime);
+    EXPECT_EQ(Encoding->GetPreamble(), Case.Preamble);
+    EXPECT_EQ(Encoding->GetString(Encoding->GetBytes(u"añ")), Case.Page == 932 ? u"a?" : u"añ");
+    EXPECT_TRUE(Encoding->GetBytes(u"").empty());
+  }
+  EXPECT_EQ(TEncoding::Unicode().GetBytes(u"\u20AC"), (TBytes{0xAC, 0x20}));
+}
+
+TEST(TextEncoding, NormalizesInFourForms) {
+  const auto Form = [](int AForm, std::u16string_view AText) {
+    const auto Count = static_cast<int>(AText.size());
+    std::u16string Result(static_cast<std::size_t>(NormalizeString(AForm, AText.data(), Count, nullptr, 0)), u'\0');
+    EXPECT_EQ(NormalizeString(AForm, AText.data(), Count, Result.data(), static_cast<int>(Result.size())),
+        static_cast<int>(Result.size()));
+    return Result;
+  };
+  EXPECT_EQ(Form(1, u"e\u0301ﬁ"), u"éﬁ");
+  EXPECT_EQ(Form(2, u"é\u1EBF"), u"e\u0301e\u0302\u0301");
+  EXPECT_EQ(Form(5, u"ﬁe\u0301"), u"fié");
+  EXPECT_EQ(Form(6, u"ﬁé"), u"fie\u0301");
+  EXPECT_EQ(Form(2, u"\xD83D"), u"\xD83D");
+  char16_t Small[1];
+  EXPECT_EQ(NormalizeString(2, u"é", 1, Small, 1), 0);
+  EXPECT_EQ(GetLastError(), ERROR_INSUFFICIENT_BUFFER);
+  EXPECT_EQ(NormalizeString(3, u"é", 1, nullptr, 0), 0);
+  EXPECT_EQ(NormalizeString(2, u"", 0, nullptr, 0), 0);
+}
+
+TEST(TextEncoding, OneCharacterIntoOneByte) {
+  const auto ByteOf = [](Word ACodePage, char16_t AChar) {
+    char Byte = '\xAA';
+    const int Count = LocaleCharsFromUnicode(ACodePage, 0, &AChar, 1, &Byte, 1, "", nullptr);
+    return std::pair(Count, static_cast<int>(static_cast<unsigned char>(Byte)));
+  };
+  EXPECT_EQ(ByteOf(1252, u'€'), std::pair(1, 0x80));
+  EXPECT_EQ(ByteOf(1252, u'\u0301'), std::pair(1, 0));
+  EXPECT_EQ(ByteOf(932, u'日').first, 0);
+  EXPECT_EQ(ByteOf(65001, u'é').first, 0);
+  bool Used = false;
+  char Bytes[4];
+  EXPECT_EQ(LocaleCharsFromUnicode(1252, 0, u"a日", 2, Bytes, 4, "##", &Used), 3);
+  EXPECT_EQ(std::string_view(Bytes, 3), "a##");
+  EXPECT_TRUE(Used);
+}
+
+}  // namespace
+}  // namespace zq

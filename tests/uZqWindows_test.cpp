@@ -1,0 +1,349 @@
+#include "common/uZqWindows.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include <filesystem>
+#include <map>
+#include <optional>
+#include <set>
+
+#include "runtime/com/registry.h"
+#include "runtime/core/exceptions.h"
+#include "runtime/io/files.h"
+#include "runtime/io/paths.h"
+#include "runtime/io/streams.h"
+#include "runtime/platform/clock.h"
+#include "runtime/platform/shell_service.h"
+#include "runtime/platform/version_service.h"
+#include "runtime/text/datetime.h"
+#include "tests/support/environment_scope.h"
+#include "tests/support/raised.h"
+#include "tests/support/scripted_registry.h"
+#include "tests/support/support.h"
+
+namespace zq {
+namespace {
+
+namespace fs = std::filesystem;
+
+// -------------------------------------------------------------------------------------------------- Environment
+
+TEST(EnvironmentVars, BothFormsExpandInTheirOrder) {
+  const TEnvironmentScope Values[] = {{"ZQ_T", "/tmp"}, {"ZQ_IN", "$(ZQ_T)/in"}, {"ZQ_PC", "%ZQ_T%"}, {"ZQ_EMPTY", ""},
+      {"ZQ_A", "$(ZQ_B)"}, {"ZQ_B", "$(ZQ_A)"}, {"ZQ_BIG", "$(ZQ_BIG)$(ZQ_BIG)"}, {"ZQ_LONG", std::string(5000, 'x')}};
+  const std::map<UnicodeString, UnicodeString> Cases = {{u"plain", u"plain"}, {u"$(ZQ_T)\\x", u"/tmp\\x"},
+      {u"$(ZQ_T)-$(zq_t)", u"/tmp-/tmp"}, {u"$(ZQ_IN)", u"/tmp/in"}, {u"$(ZQ_PC)+%ZQ_IN%", u"/tmp+$(ZQ_T)/in"},
+      {u"%ZQ_NO%|%ZQ_T%", u"%ZQ_NO%|/tmp"}, {u"a)$(ZQ_T)b)", u"a)/tmpb)"}, {u"%ZQ_EMPTY%", u""}};
+  for (const auto& [Text, Result] : Cases) EXPECT_EQ(ZqExpandEnvVarsAndStrings(Text), Result);
+  EXPECT_EQ(ZqGetEnvironmentVar(u"ZQ_LONG").Length(), 5000);
+  const UnicodeString Missing = u"Exception: There is no Environment Variable with the name ";
+  EXPECT_EQ(RaisedBy([] { (void)ZqExpandEnvVarsAndStrings(u"$(ZQ_NO)"); }), Missing + u"ZQ_NO");
+  EXPECT_EQ(RaisedBy([] { (void)ZqExpandEnvVarsAndStrings(u"x$(ZQ_T"); }), Missing);
+  EXPECT_EQ(RaisedBy([] { (void)ZqGetEnvironmentVar(u"ZQ_EMPTY"); }), Missing + u"ZQ_EMPTY");
+  for (const char16_t* const Circle : {u"$(ZQ_A)", u"$(ZQ_BIG)"})
+    EXPECT_THROW((void)ZqExpandEnvVarsAndStrings(Circle), Exception);
+}
+
+TEST(EnvironmentVars, RelativeNamesStartAtTheProgram) {
+  const TEnvironmentScope Name("ZQ_NAME", "x.log");
+  const UnicodeString Here = GetCurrentDir();
+  ASSERT_TRUE(SetCurrentDir(u"/"));
+  EXPECT_EQ(ZqExpandFileName(u"sub/../$(ZQ_NAME)"), ExtractFilePath(ParamStr(0)) + u"x.log");
+  EXPECT_EQ(ZqExpandFileName(u"/a/../%ZQ_NAME%"), u"/x.log");
+  EXPECT_EQ(GetCurrentDir(), u"/");
+  SetCurrentDir(Here);
+}
+
+// ---------------------------------------------------------------------------------------------------- Path text
+
+TEST(PathRules, SeparatorsAreAddedAndTaken) {
+  const std::map<UnicodeString, UnicodeString> Included = {{u"C", u"C:\\"}, {u"C:", u"C:\\"}, {u"C:\\x", u"C:\\x\\"},
+      {u" \\x ", u"\\x\\"}, {u"  ", u":\\"}, {u"/x", u"/x/"}, {u"x/y", u"x/y/"}, {u"/x/", u"/x/"},
+      {u"x\\y", u"x\\y:\\"}, {u"c:\\x\\", u"c:\\x\\"}};
+  for (const auto& [Dir, Result] : Included) EXPECT_EQ(ZqIncludeTrailingBackslash(Dir), Result);
+  EXPECT_EQ(ZqCheckDirSlash(u"c:\\x\\\\", false), u"c:\\x\\");
+  EXPECT_EQ(ZqCheckDirSlash(u" /x/ ", false), u"/x");
+  EXPECT_EQ(ZqCheckDirSlash(u"/x", true), u"/x/");
+  EXPECT_EQ(ZqCheckDirSlash(u"x", true), u"x\\");
+  EXPECT_EQ(ZqCheckDirSlash(u"  ", true), u"");
+}
+
+TEST(PathRules, CleanupLeavesWhatAFileNameMayHold) {
+  EXPECT_EQ(ZqCleanupFileName(u"a:b?c.txt"), u"abc.txt");
+  EXPECT_EQ(ZqCleanupFileName(u"\"*/:<>?\\|\x1F\tä "), u"ä ");
+  EXPECT_EQ(ZqCleanupFileName(u"a b\u0161c", {'a', ' '}), u"b\u0161c");  // U+0161 isn't the "a" of its low byte
+}
+
+TEST(PathRules, AliasedNamesAreThoseThatHangOnAFolder) {
+  const std::map<UnicodeString, bool> Cases = {{u".", true}, {u".\\x", true}, {u"..\\x", true}, {u"x\\y", true},
+      {u"\\\\server\\share", true}, {u"c:\\x", false}, {u"x", false}, {u"  ", false}, {u"x/y", true}, {u"../x", true},
+      {u"/x/y", false}};
+  for (const auto& [Name, Result] : Cases) EXPECT_EQ(ZqIsAliasedFilename(Name), Result) << ToUTF8(Name);
+}
+
+// --------------------------------------------------------------------------------------------------- File facts
+
+TEST(FileFacts, TellSizeStateAndUse) {
+  const TTempFolder Folder({"file"});
+  Folder.Write("empty", "");
+  EXPECT_EQ(ZqGetFileSize(Folder.File("file")), 4);
+  EXPECT_EQ(ZqGetFileSize(Folder.File("empty")), 0);
+  EXPECT_EQ(ZqGetFileSize(Folder.File("none")), -1);
+  fs::resize_file(Folder.Path() / "empty", 0x100000005);
+  EXPECT_EQ(ZqGetFileSize(Folder.File("empty")), 5);
+  EXPECT_FALSE(ZqFileIsReadOnly(Folder.File("file")));
+  fs::permissions(Folder.Path() / "file", fs::perms::owner_read);
+  EXPECT_TRUE(ZqFileIsReadOnly(Folder.File("file")));
+  EXPECT_FALSE(ZqFileIsReadOnly(Folder.File("none")));
+  EXPECT_EQ(ZqGetShortFileName(Folder.File("x/../empty")), Folder.File("empty"));
+  EXPECT_EQ(RaisedBy([&] { (void)ZqGetShortFileName(Folder.File("none")); }),
+      u"Exception: Failed to determine the short filename!");
+}
+
+TEST(FileFacts, AFileIsInUseWhileItsLockIsHeld) {
+  const TTempFolder Folder({"file"});
+  EXPECT_FALSE(ZqFileIsInUse(Folder.File("file")));
+  {
+    const TFileStream Holder(Folder.File("file"), fmOpenReadWrite | fmShareExclusive);
+    EXPECT_TRUE(ZqFileIsInUse(Folder.File("file")));
+  }
+  EXPECT_FALSE(ZqFileIsInUse(Folder.File("file")));
+  EXPECT_FALSE(ZqFileIsInUse(Folder.File("none")));
+}
+
+TEST(FileFacts, TimesAreLocalAndOfTwoSeconds) {
+  const TTempFolder Folder({"file"});
+  const TEnvironmentScope Zone("TZ", "XXX-2");
+  TTimeZone::Refresh();
+  const timespec Times[2] = {{1709251199, 0}, {1709251199, 0}};  // 2024-02-29 23:59:59 UTC
+  ::utimensat(AT_FDCWD, (Folder.Path() / "file").c_str(), Times, 0);
+  EXPECT_EQ(FormatDateTime(u"yyyy-mm-dd hh:mm:ss", ZqGetFileLastModified(Folder.File("file"))), u"2024-03-01 01:59:58");
+  EXPECT_NEAR(ZqGetFileCreated(Folder.File("file")), Now(), 5 / 86400.0);
+  EXPECT_EQ(ZqGetFileCreated(ExcludeTrailingBackslash(Folder.File(""))).Value, 0);
+  EXPECT_EQ(ZqGetFileLastModified(Folder.File("none")).Value, 0);
+  TTimeZone::Refresh();
+}
+
+TEST(FileFacts, FileTimesCountFrom1601) {
+  const FILETIME Moment{0x256D4000, 0x01BF53EB};  // 2000-01-01
+  EXPECT_EQ(ZqFileTimeToDateTime(Moment).Value, 36526.0);
+  const FILETIME Back = ZqDateTimeToFileTime(36526.0 + 1 / 86400.0);
+  EXPECT_EQ(Back.dwLowDateTime, Moment.dwLowDateTime + 10000000U);
+  EXPECT_EQ(Back.dwHighDateTime, Moment.dwHighDateTime);
+}
+
+// ------------------------------------------------------------------------------------------------------ Folders
+
+// A folder "tree" with files, folders and a link that leads out to "kept/file".
+void GrowTree(const TTempFolder& AFolder) {
+  fs::create_directories(AFolder.Path() / "tree/a/b");
+  fs::create_directories(AFolder.Path() / "kept");
+  AFolder.Write("tree/a/b/.file", "x");
+  AFolder.Write("tree/file", "x");
+  AFolder.Write("kept/file", "x");
+  fs::create_directory_symlink(AFolder.Path() / "kept", AFolder.Path() / "tree/out");
+}
+
+TEST(Folders, ATreeGoesWithoutWhatItsLinksLeadTo) {
+  const TTempFolder Folder;
+  GrowTree(Folder);
+  EXPECT_FALSE(ZqRenameFolder(Folder.File("tree"), Folder.File("kept")));
+  EXPECT_TRUE(ZqRenameFolder(Folder.File("tree"), u" " + Folder.File("new") + u" "));
+  EXPECT_TRUE(ZqRemoveDir(Folder.File("new/"), false));
+  EXPECT_EQ(Folder.Names(), std::vector<std::string>{"kept"});
+  EXPECT_EQ(Folder.Read("kept/file"), "x");
+  EXPECT_FALSE(ZqRemoveDir(Folder.File("tree"), false));
+  EXPECT_FALSE(ZqRemoveDir(u" ", false));
+}
+
+TEST(Folders, TheTrashTakesFoldersWithTheirPath) {
+  const TTempFolder Folder;
+  const TEnvironmentScope Data("XDG_DATA_HOME", Folder.Path().string());
+  for (int i = 0; i < 2; ++i) {
+    fs::create_directories(Folder.Path() / "a b");
+    Folder.Write("a b/file", std::to_string(i));
+    EXPECT_TRUE(ZqRemoveDir(Folder.File("a b"), true));
+  }
+  EXPECT_FALSE(fs::exists(Folder.Path() / "a b"));
+  EXPECT_EQ(Folder.Read("Trash/files/a b/file"), "0");
+  EXPECT_EQ(Folder.Read("Trash/files/a b.2/file"), "1");
+  const std::string Info = Folder.Read("Trash/info/a b.2.trashinfo");
+  EXPECT_EQ(Info.rfind("[Trash Info]\nPath=" + Folder.Path().string() + "/a%20b\nDeletionDate=20", 0), 0U) << Info;
+}
+
+TEST(Folders, TemporaryFoldersAreNewEachTime) {
+  const TTempFolder Folder({"Ast0001.tmp"});
+  const TEnvironmentScope Temp("TMPDIR", Folder.Path().string());
+  EXPECT_EQ(ZqGetTempDirectory(), Folder.File(""));
+  EXPECT_EQ(ZqCreateTempDirectory(), Folder.File("Ast0002.tmp"));
+  EXPECT_EQ(ZqCreateTempDirectory(), Folder.File("Ast0003.tmp"));
+  EXPECT_TRUE(fs::is_directory(Folder.Path() / "Ast0003.tmp"));
+}
+
+// ---------------------------------------------------------------------------------------------------- Shortcuts
+
+TEST(Shortcuts, LeadBackToTheirTargets) {
+  const TTempFolder Folder({"doc 100%.txt", "a \"b\" $c `d` e%f\\g", "ä"});
+  for (const std::string& Name : Folder.Names())
+    for (const bool Program : {false, true}) {
+      fs::permissions(
+          Folder.Path() / Name, fs::perms::owner_exec, Program ? fs::perm_options::add : fs::perm_options::remove);
+      const UnicodeString Target = Folder.File("") + FromSystemPath(Name);
+      ZqCreateShortcut(Target, Folder.File("link.desktop"), u"Line\nbreak", Program ? u"-x 50%" : u"");
+      EXPECT_EQ(ZqGetTargetFromShortcut(Folder.File("link.desktop")), Target) << Name;
+    }
+  ZqCreateShortcut(u"/bin/s%h", Folder.File("link.desktop"), u"The shell", u"-c 'echo \\n 5%'");
+  EXPECT_EQ(Folder.Read("link.desktop"),
+      "[Desktop Entry]\nType=Application\nName=link\nComment=The shell\nExec=\"/bin/s%%h\" -c 'echo \\\\n 5%%'\n");
+  EXPECT_EQ(ZqGetTargetFromShortcut(Folder.File("none.desktop")), u"");
+  ZqCreateShortcut(u"/bin/sh", Folder.File("no/link.desktop"), u"", u"");  // stays silent
+}
+
+// ------------------------------------------------------------------------------- System version, shell folders
+
+class TScriptedVersion : public TVersionService {
+ public:
+  bool HasKernel() override { return Kernel; }
+  bool KernelExports(const char16_t* AName) override { return Exports.count(AName) != 0; }
+  bool GetVersionEx(TOSVersionInfo& AInfo) override {
+    AInfo = Info.value_or(TOSVersionInfo{});
+    return Info.has_value();
+  }
+  Integer GetSystemMetrics(Integer AIndex) override { return AIndex == 89 ? Metrics : -1; }
+  TSystemRelease Release() override { return {}; }
+
+  bool Kernel = true;
+  std::set<UnicodeString> Exports;
+  std::optional<TOSVersionInfo> Info;
+  Integer Metrics = 0;
+};
+
+TEST(SystemVersion, NumbersDecideByTheTable) {
+  const struct {
+    TOSVersionInfo Info;  // major, minor, service pack, product type
+    const char16_t* Export;
+    Integer Metrics;
+    const char16_t* Registry;
+    Word Version;
+  } Cases[] = {{{5, 0, 1, 1}, u"", 0, u"", 500}, {{5, 1, 0, 1}, u"", 0, u"", 511}, {{5, 1, 1, 1}, u"", 0, u"", 513},
+      {{5, 1, 2, 1}, u"", 0, u"", 515}, {{5, 1, 3, 1}, u"", 0, u"", 517}, {{5, 2, 0, 3}, u"", 1, u"", 521},
+      {{5, 2, 0, 3}, u"GetLargePageMinimum", 1, u"", 523}, {{5, 3, 0, 3}, u"GetLargePageMinimum", 0, u"", 520},
+      {{6, 0, 0, 1}, u"", 0, u"", 601}, {{6, 0, 0, 3}, u"", 0, u"", 602}, {{6, 1, 0, 1}, u"", 0, u"", 611},
+      {{6, 1, 0, 2}, u"", 0, u"", 610}, {{6, 2, 0, 1}, u"", 0, u"6.2", 621}, {{6, 3, 0, 1}, u"", 0, u"6.3", 630},
+      {{6, 3, 0, 1}, u"", 0, u"6.30", 621}, {{6, 3, 0, 1}, u"", 0, u"", 621}, {{6, 3, 0, 3}, u"", 0, u"6.3", 620},
+      {{10, 0, 0, 1}, u"", 0, u"6.3", 621}, {{10, 0, 0, 3}, u"", 0, u"6.3", 620}, {{4, 0, 0, 1}, u"", 0, u"6.3", 621}};
+  for (const auto& Case : Cases) {
+    TScriptedVersion Version;
+    Version.Exports = {u"GetVersionExA", Case.Export, u"Beep"};
+    Version.Info = Case.Info;
+    Version.Metrics = Case.Metrics;
+    TScriptedRegistry Registry;
+    const TPlatformOverride<TVersionService> FakeVersion(Version);
+    const TPlatformOverride<TRegistryService> FakeRegistry(Registry);
+    TRegistry Values;
+    Values.SetRootKey(HKEY_LOCAL_MACHINE);
+    if (*Case.Registry != 0 && Values.OpenKey(u"SOFTWARE\\Microsoft\\Windows NT\\CurrentVersion", true))
+      Values.WriteString(u"CurrentVersion", Case.Registry);
+    EXPECT_EQ(ZqGetWindowsVersion(), Case.Version) << Case.Info.MajorVersion << '.' << Case.Info.MinorVersion;
+  }
+  EXPECT_EQ(ZqGetWindowsVersion(), 621);
+}
+
+TEST(SystemVersion, WithoutNumbersTheFirstExportDecides) {
+  TScriptedVersion Version;
+  const TPlatformOverride<TVersionService> Fake(Version);
+  EXPECT_EQ(RaisedBy([] { (void)ZqGetWindowsVersion(); }), u"Exception: Failed to determine the version of the OS!");
+  Version.Info = {10, 0, 0, 1};  // not asked without GetVersionExA
+  const std::pair<const char16_t*, Word> Probes[] = {{u"Beep", 3}, {u"ConnectNamedPipe", 14},
+      {u"GetDiskFreeSpaceEx", 5}, {u"IsDebuggerPresent", 7}, {u"GetThreadPriorityBoost", 16}, {u"OpenThread", 11}};
+  for (const auto& [Name, Code] : Probes) {  // each goes before those already there
+    Version.Exports.insert(Name);
+    EXPECT_EQ(ZqGetWindowsVersion(), Code);
+  }
+  Version.Info.reset();
+  Version.Exports.insert(u"GetVersionExA");
+  EXPECT_EQ(ZqGetWindowsVersion(), 11);
+  Version.Kernel = false;
+  EXPECT_EQ(RaisedBy([] { (void)ZqGetWindowsVersion(); }), u"Exception: Failed to load Kernel32.dll!");
+}
+
+// A shell that fails where it's told to.
+class TScriptedShell : public TShellService {
+ public:
+  bool SHGetSpecialFolderPath(Integer, bool ACreate, UnicodeString& APath) override {
+    EXPECT_TRUE(ACreate);
+    APath = u"/direct";
+    return PathWorks;
+  }
+  bool SHGetMalloc() override { return HasMalloc; }
+  TItemList SHGetSpecialFolderLocation(Integer) override { return &FItems; }
+  bool SHGetPathFromIDList(TItemList AList, UnicodeString& APath) override {
+    EXPECT_EQ(AList, &FItems);
+    APath = u"/listed";
+    return ListWorks;
+  }
+  void FreeIDList(TItemList AList) override { Freed += AList == &FItems ? 1 : 100; }
+  Integer SHFileOperation(Cardinal AFunc, const UnicodeString& AFrom, const UnicodeString& ATo, Word AFlags) override {
+    Calls.push_back({AFunc, AFlags});
+    EXPECT_TRUE(AFrom.View().ends_with(std::u16string_view(u"\0\0", 2)));
+    EXPECT_EQ(AFunc == FO_RENAME, !ATo.IsEmpty());
+    return 5;
+  }
+  std::unique_ptr<TShellLink> CreateShellLink() override { return nullptr; }
+
+  bool PathWorks = false;
+  bool HasMalloc = true;
+  bool ListWorks = true;
+  int Freed = 0;
+  std::vector<std::pair<Cardinal, Word>> Calls;
+
+ private:
+  int FItems = 0;
+};
+
+TEST(ShellFolders, FallBackOnTheItemListAndFreeIt) {
+  TScriptedShell Shell;
+  const TPlatformOverride<TShellService> Fake(Shell);
+  EXPECT_EQ(ZqGetShellFolder(5), u"/listed");
+  Shell.ListWorks = false;
+  EXPECT_EQ(RaisedBy([] { (void)ZqGetShellFolder(5); }), u"Exception: Invalid pidl");
+  EXPECT_EQ(Shell.Freed, 2);
+  Shell.HasMalloc = false;
+  EXPECT_EQ(ZqGetShellFolder(5), u"");
+  Shell.PathWorks = true;
+  EXPECT_EQ(ZqGetShellFolder(5), u"/direct");
+  EXPECT_EQ(Shell.Freed, 2);
+}
+
+TEST(ShellFolders, AFailingShellLeavesTheRemovalToUs) {
+  const TTempFolder Folder;
+  GrowTree(Folder);
+  TScriptedShell Shell;
+  const TPlatformOverride<TShellService> Fake(Shell);
+  EXPECT_FALSE(ZqRenameFolder(Folder.File("tree"), Folder.File("new")));
+  EXPECT_TRUE(ZqRemoveDir(Folder.File("tree"), true));
+  EXPECT_FALSE(ZqRemoveDir(Folder.File("tree"), false));
+  EXPECT_EQ(Folder.Names(), std::vector<std::string>{"kept"});
+  EXPECT_EQ(Folder.Read("kept/file"), "x");
+  EXPECT_EQ(Shell.Calls, (std::vector<std::pair<Cardinal, Word>>{{4, 0x0610}, {3, 0x0454}, {3, 0x0414}}));
+}
+
+TEST(ShellFolders, FollowTheUsersChoiceAndAreMade) {
+  const TTempFolder Home;
+  const TEnvironmentScope HomeScope("HOME", Home.Path().string() + "/");
+  const TEnvironmentScope Data("XDG_DATA_HOME", Home.Path().string() + "/data");
+  const TEnvironmentScope Config("XDG_CONFIG_HOME", "relative is no choice");
+  EXPECT_EQ(ZqGetShellFolder(46), Home.File("data"));
+  EXPECT_TRUE(fs::is_directory(Home.Path() / "data"));
+  EXPECT_EQ(ZqGetMyDocumentsFolder(), Home.File("Documents"));
+  fs::create_directory(Home.Path() / ".config");
+  Home.Write(".config/user-dirs.dirs", "# XDG_DOCUMENTS_DIR=\"/no\"\nXDG_DOCUMENTS_DIR=\"$HOME/My\\ Docs/\"\n");
+  EXPECT_EQ(ZqGetMyDocumentsFolder(), Home.File("My Docs"));
+  EXPECT_TRUE(fs::is_directory(Home.Path() / "My Docs"));
+  EXPECT_EQ(RaisedBy([] { (void)ZqGetShellFolder(12345); }), u"Exception: Invalid pidl");
+}
+
+}  // namespace
+}  // namespace zq
