@@ -15,6 +15,7 @@ namespace {
 
 constexpr Word cVista = 601;
 constexpr Integer cCommonDocuments = 46;
+constexpr std::size_t cKeptLine = 1 << 16;  // bytes
 
 }  // namespace
 
@@ -37,7 +38,7 @@ void TZqBaseAppender::Initialize() { FInitialized = true; }
 
 void TZqBaseAppender::Close() { FInitialized = false; }
 
-void TZqBaseAppender::Write(
+ZQ_HOT void TZqBaseAppender::Write(
     const UnicodeString&, const UnicodeString&, TZqLogLevel, const UnicodeString&, PZqDataRec, TZqLogIndent) {
   if (!FInitialized) Initialize();
 }
@@ -62,7 +63,7 @@ TZqTextFile::TZqTextFile(const TFileName& AFileName) {
   const bool Existed = FileExists(AFileName);
   ForceDirectories(ExtractFileDir(AFileName));  // a folder that can't be made shows at the open
   FFile.Assign(AFileName, 65001);
-  if (Existed) FSizeAtOpen = std::max<Int64>(FileSizeOf(AFileName), 0);
+  if (Existed) FSize = std::max<Int64>(FileSizeOf(AFileName), 0);
   FFile.AppendOrCreate();
 }
 
@@ -73,20 +74,33 @@ TZqTextFile::~TZqTextFile() {
   }
 }
 
-Cardinal TZqTextFile::Size() const {
+ZQ_HOT Cardinal TZqTextFile::Size() const {
+  return static_cast<Cardinal>(std::clamp<Int64>(FSize.load(), 0, std::numeric_limits<Cardinal>::max()));
+}
+
+// Counts also what a failed step has brought into the file.
+template <class TStep>
+ZQ_HOT void TZqTextFile::Counting(TStep AStep) {
   const TLockScope Scope(FCritSect);
-  return static_cast<Cardinal>(
-      std::clamp<Int64>(FSizeAtOpen + FFile.Written(), 0, std::numeric_limits<Cardinal>::max()));
+  struct TCount {
+    ~TCount() { Size.store(Before + File.Written(), std::memory_order_relaxed); }
+    std::atomic<Int64>& Size;
+    const TTextFile& File;
+    Int64 Before;
+  } const Count{FSize, FFile, FSize.load(std::memory_order_relaxed) - FFile.Written()};
+  AStep();
 }
 
 void TZqTextFile::Write(const UnicodeString& AValue) {
-  const TLockScope Scope(FCritSect);
-  FFile.Write(AValue);
+  Counting([&] { FFile.Write(AValue); });
 }
 
-void TZqTextFile::WriteLn(const UnicodeString& AValue) {
-  const TLockScope Scope(FCritSect);
-  FFile.WriteLn(AValue);
+ZQ_HOT void TZqTextFile::WriteLn(const UnicodeString& AValue) {
+  Counting([&] { FFile.WriteLn(AValue); });
+}
+
+ZQ_HOT void TZqTextFile::WriteBytes(std::string_view ABytes) {
+  Counting([&] { FFile.WriteBytes(ABytes); });
 }
 
 void TZqTextFile::Close() {
@@ -161,6 +175,7 @@ void TZqFileAppender::Initialize() {
   if (Trim(FFileName).IsEmpty()) return;
   if (!FAppendExisting && FileExists(FFileName)) DeleteFile(FFileName);
   FFileStream = std::make_unique<TZqTextFile>(FFileName);
+  FLineLayout = FLayout.Supports<IZqLineLayout>();
   if (FLayout) {
     const UnicodeString Header = FLayout->GetHeader();
     if (!Header.IsEmpty()) FFileStream->WriteLn(Header);
@@ -168,13 +183,24 @@ void TZqFileAppender::Initialize() {
   TZqBaseAppender::Initialize();
 }
 
-void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
-    const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeString& ALoggerName,
+    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   const TScope Scope(FLock);
   TZqBaseAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
   if (!FLayout || !FFileStream) return;
-  const UnicodeString Line = FLayout->FormatLine(ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
-  if (!Line.IsEmpty() && FFileStream) FFileStream->WriteLn(Line);
+  if (!FLineLayout) {
+    const UnicodeString Line = FLayout->FormatLine(ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+    if (!Line.IsEmpty() && FFileStream) FFileStream->WriteLn(Line);
+    return;
+  }
+  utf8::TBuffer Line = std::move(FSpareLine);  // a message from within the layout comes back here and finds none
+  Line.Clear();
+  FLineLayout->AppendLine(Line, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+  if (!Line.IsEmpty() && FFileStream) {
+    Line.Append(u"\r\n");
+    FFileStream->WriteBytes(Line.View());
+  }
+  if (Line.Room() <= cKeptLine) FSpareLine = std::move(Line);
 }
 
 void TZqFileAppender::EndFile() {
@@ -278,12 +304,12 @@ void TZqRollingFileAppender::CheckBackupCount() {
   for (std::size_t i = Series.size(); i-- > FMaxBackupCount;) DeleteFile(Folder() + Series[i].Name);
 }
 
-void TZqRollingFileAppender::CheckRollover() {
+ZQ_HOT void TZqRollingFileAppender::CheckRollover() {
   const TScope Scope(FLock);
   if (FFileStream && FMaxFileSize != 0 && FFileStream->Size() >= FMaxFileSize) RollOver();
 }
 
-void TZqRollingFileAppender::Write(const UnicodeString& ASender, const UnicodeString& ALoggerName,
+ZQ_HOT void TZqRollingFileAppender::Write(const UnicodeString& ASender, const UnicodeString& ALoggerName,
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   const TScope Scope(FLock);
   if (FMaxBackupCount == 0) return;

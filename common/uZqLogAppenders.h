@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <memory>
 
 #include "common/uZqLogger.h"
@@ -71,11 +72,16 @@ class ZQ_API TZqTextFile : public TObject {
   void Write(const UnicodeString& AValue);
   /// With CR LF behind it.
   void WriteLn(const UnicodeString& AValue);
+  /// UTF-8 as it is, line ends and all.
+  void WriteBytes(std::string_view ABytes);
   void Close();
 
  private:
+  template <class TStep>
+  void Counting(TStep AStep);
+
   TTextFile FFile;
-  Int64 FSizeAtOpen = 0;
+  std::atomic<Int64> FSize = 0;
   mutable TCriticalSection FCritSect;
 };
 
@@ -129,6 +135,10 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
   std::unique_ptr<TZqTextFile> FFileStream;
   bool FAppendExisting = true;
   UnicodeString FFileExt = u".log";
+
+ private:
+  IntfRef<IZqLineLayout> FLineLayout;  // the layout of the open file, if it can do so
+  utf8::TBuffer FSpareLine;            // room of the last line, for the next one
 };
 
 struct ZQ_API IZqRollingFileAppender : Extends<IZqFileAppender> {

@@ -13,34 +13,56 @@ UnicodeString TZqSimpleLayout::GetHeader() { return u"Log started on : " + DateT
 
 UnicodeString TZqSimpleLayout::GetFooter() { return u"Log stopped on : " + DateTimeToStr(Now()); }
 
-void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
+ZQ_HOT void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
   if (ALogIndent == liIndentIncrease) FIndent += cIndentStep;
   if (ALogIndent == liIndentDecrease) FIndent.SetLength(FIndent.Length() - static_cast<Integer>(cIndentStep.size()));
 }
 
-void TZqSimpleLayout::AppendTime(std::u16string& ALine) {
-  const TDateTime Time = Now();
-  const Int64 Milliseconds = DateTimeToUnixMilliseconds(Time);
+// Most lines come in the second of the one before: then the milliseconds alone are written anew.
+ZQ_HOT const UnicodeString& TZqSimpleLayout::TimeNow() {
+  const Int64 Milliseconds = NowMilliseconds();
   const auto Rest = static_cast<Integer>((Milliseconds % 1000 + 1000) % 1000);
   const Int64 Second = (Milliseconds - Rest) / 1000;
-  if (Second != FSecond) FSecondText = FormatDateTime(u"yyyy-mm-dd hh:mm:ss:", Time);
+  if (Second != FSecond)
+    FTime = FormatDateTime(u"yyyy-mm-dd hh:mm:ss:", UnixMillisecondsToDateTime(Milliseconds - Rest)) + u"zzz - ";
   FSecond = Second;
-  ALine.append(FSecondText);
-  for (const Integer Digit : {Rest / 100, Rest / 10 % 10, Rest % 10}) ALine.push_back(static_cast<Char>(u'0' + Digit));
+  Char* const Digits = FTime.data() + FTime.size() - 6;
+  Digits[0] = static_cast<Char>(u'0' + Rest / 100);
+  Digits[1] = static_cast<Char>(u'0' + Rest / 10 % 10);
+  Digits[2] = static_cast<Char>(u'0' + Rest % 10);
+  return FTime;
+}
+
+template <class TLine>
+void TZqSimpleLayout::Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+    const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  ChangeIndent(ALogIndent);
+  if (!FIndent.IsEmpty()) ALine.Append(FIndent);
+  ALine.Append(TimeNow());
+  ALine.Append(ZqLogLevels[ALogLevel]);
+  ALine.Append(u" ");
+  ALine.Append(ALoggerName);
+  ALine.Append(u" - ");
+  ALine.Append(ALogMessage);
+  if (AValue != nullptr) ALine.Append(u" - " + ZqDataRecToString(AValue));
+}
+
+ZQ_HOT void TZqSimpleLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+    const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  Compose(ALine, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
 }
 
 UnicodeString TZqSimpleLayout::FormatLine(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
-  constexpr std::size_t cTimeAndMarks = 23 + 16;
-  ChangeIndent(ALogIndent);
-  const UnicodeString Value = AValue == nullptr ? UnicodeString() : u" - " + ZqDataRecToString(AValue);
-  std::u16string Line;
-  Line.reserve(FIndent.size() + cTimeAndMarks + ALoggerName.size() + ALogMessage.size() + Value.size());
-  Line.append(FIndent);
-  AppendTime(Line);
-  Line.append(u" - ").append(ZqLogLevels[ALogLevel]).append(u" ").append(ALoggerName);
-  Line.append(u" - ").append(ALogMessage).append(Value);
-  return Line;
+  UnicodeString Result;
+  Compose(Result, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+  return Result;
+}
+
+bool TZqSimpleLayout::GetInterface(const TGUID& AIID, void** AObj) {
+  *AObj = nullptr;
+  if (AIID == IZqLineLayout::IID && ClassType() != ClassOf<TZqSimpleLayout>()) return false;
+  return Implements::GetInterface(AIID, AObj);
 }
 
 void uZqLogLayouts::Start() { RegisteredLayouts()->Add(TZqLogBaseClass::Of<TZqSimpleLayout>()); }

@@ -73,7 +73,7 @@ UnicodeString MethodOf(const TObject* AObject, const UnicodeString& AMethodName)
 
 // ---------------------------------------------------------------------------------------- TZqLogLock
 
-bool TZqLogLock::Take(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise) {
+ZQ_HOT bool TZqLogLock::Take(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise) {
   if (FLock.TryEnterFor(cLockTries)) return true;
   if (ARaise)
     throw Exception(u"A lock was requested by %s (ThreadId: %d), however  logger has already been locked by %s!",
@@ -81,7 +81,7 @@ bool TZqLogLock::Take(const UnicodeString& AOwner, const char16_t* AOperation, b
   return false;
 }
 
-bool TZqLogLock::Enter(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise) {
+ZQ_HOT bool TZqLogLock::Enter(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise) {
   if (!Take(AOwner, AOperation, ARaise)) return false;
   FOwner.store(&AOwner, std::memory_order_relaxed);
   FOperation.store(AOperation, std::memory_order_relaxed);
@@ -89,7 +89,7 @@ bool TZqLogLock::Enter(const UnicodeString& AOwner, const char16_t* AOperation, 
   return true;
 }
 
-bool TZqLogLock::Enter(const UnicodeString& ALockRequestedBy, bool ARaise) {
+ZQ_HOT bool TZqLogLock::Enter(const UnicodeString& ALockRequestedBy, bool ARaise) {
   if (!Take(ALockRequestedBy, u"", ARaise)) return false;
   const std::lock_guard Guard(FTextLock);
   FText = ALockRequestedBy;
@@ -212,7 +212,7 @@ void TZqLogAppenderList::Clear() {
   Dropped = TakeItems([](const auto&) { return true; });
 }
 
-IntfRef<IZqLogAppender> TZqLogAppenderList::ItemOrNone(std::size_t AIndex) const {
+ZQ_HOT IntfRef<IZqLogAppender> TZqLogAppenderList::ItemOrNone(std::size_t AIndex) const {
   const TLockScope Guard(FItemsLock);
   return AIndex < FList.size() ? FList[AIndex] : nullptr;
 }
@@ -298,7 +298,7 @@ Integer TZqLogger::_Release() {
 
 IntfRef<IZqLogger> TZqLogger::GetParentLogger() const { return FParent.load(); }
 
-TZqLogLevel TZqLogger::GetLevel() const {
+ZQ_HOT TZqLogLevel TZqLogger::GetLevel() const {
   const TZqLogger* Current = this;
   while (Current->FParentLevel.load(std::memory_order_relaxed)) {
     const TZqLogger* const Above = Current->FParent.load(std::memory_order_relaxed);
@@ -351,8 +351,8 @@ TZqLogAppenderList* TZqLogger::LockAppenders() {
 
 // A list whose lock stays busy is skipped. What an appender logs itself comes back here on the same thread; the depth
 // is bounded, so that one that answers every message with a message doesn't end the host.
-void TZqLogger::WriteToAppenders(const UnicodeString& ASender, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
-    PZqDataRec AValue, TZqLogIndent ALogIndent) {
+ZQ_HOT void TZqLogger::WriteToAppenders(const UnicodeString& ASender, TZqLogLevel ALogLevel,
+    const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   TZqLogAppenderList& List = *FAppenders;
   if (!List.FLock.Enter(FFullName, u".DoLog", false)) return;
   struct TScope {
@@ -372,7 +372,7 @@ void TZqLogger::WriteToAppenders(const UnicodeString& ASender, TZqLogLevel ALogL
 
 // Level and count are tested first, so that a message that nobody writes takes no lock. Each lock is left before the
 // message goes on to the parent.
-void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
+ZQ_HOT void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
     PZqDataRec AValue, TZqLogIndent ALogIndent) {
   try {
     for (TZqLogger* Current = this; Current != nullptr;) {
@@ -384,22 +384,24 @@ void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const
   }
 }
 
-void TZqLogger::Trace(const UnicodeString& ALogMessage) { Log(llTrace, ALogMessage); }
-void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName) {
+ZQ_HOT void TZqLogger::Trace(const UnicodeString& ALogMessage) { Log(llTrace, ALogMessage); }
+ZQ_HOT void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName) {
   Log(llTrace, Format(u"%s($%p).%s", {AObject->ClassName(), AObject, AMethodName}));
 }
-void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) {
+ZQ_HOT void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) {
   Trace(AObject, Format(AMethodName, AArgs));
 }
-void TZqLogger::Debug(const UnicodeString& ALogMessage) { Log(llDebug, ALogMessage); }
-void TZqLogger::Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) { Log(llDebug, Format(ALogMessage, AArgs)); }
-void TZqLogger::Debug(const UnicodeString& AMessage, const Variant& AValue) { Log(llDebug, AMessage, AValue); }
-void TZqLogger::Debug(const UnicodeString& AMessage, const TObject* AValue) { Log(llDebug, AMessage, AValue); }
-void TZqLogger::Debug(const UnicodeString& AMessage, const Exception& AValue) { Log(llDebug, AMessage, AValue); }
-void TZqLogger::Info(const UnicodeString& ALogMessage) { Log(llInfo, ALogMessage); }
-void TZqLogger::Warn(const UnicodeString& ALogMessage) { Log(llWarn, ALogMessage); }
-void TZqLogger::Error(const UnicodeString& ALogMessage) { Log(llError, ALogMessage); }
-void TZqLogger::Error(const UnicodeString& ALogMessage, const Exception& AException) {
+ZQ_HOT void TZqLogger::Debug(const UnicodeString& ALogMessage) { Log(llDebug, ALogMessage); }
+ZQ_HOT void TZqLogger::Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) {
+  Log(llDebug, Format(ALogMessage, AArgs));
+}
+ZQ_HOT void TZqLogger::Debug(const UnicodeString& AMessage, const Variant& AValue) { Log(llDebug, AMessage, AValue); }
+ZQ_HOT void TZqLogger::Debug(const UnicodeString& AMessage, const TObject* AValue) { Log(llDebug, AMessage, AValue); }
+ZQ_HOT void TZqLogger::Debug(const UnicodeString& AMessage, const Exception& AValue) { Log(llDebug, AMessage, AValue); }
+ZQ_HOT void TZqLogger::Info(const UnicodeString& ALogMessage) { Log(llInfo, ALogMessage); }
+ZQ_HOT void TZqLogger::Warn(const UnicodeString& ALogMessage) { Log(llWarn, ALogMessage); }
+ZQ_HOT void TZqLogger::Error(const UnicodeString& ALogMessage) { Log(llError, ALogMessage); }
+ZQ_HOT void TZqLogger::Error(const UnicodeString& ALogMessage, const Exception& AException) {
   Log(llError, ALogMessage + u"\r\n" + AException.Message());
 }
 void TZqLogger::Fatal(const UnicodeString& ALogMessage) { Log(llFatal, ALogMessage); }
@@ -435,25 +437,25 @@ void TZqLogger::ExitMethod(const TObject* AObject, const UnicodeString& AMethodN
   Log(ALogLevel, MethodOf(AObject, AMethodName), liIndentDecrease);
 }
 
-void TZqLogger::Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, TZqLogIndent ALogIndent) {
+ZQ_HOT void TZqLogger::Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, TZqLogIndent ALogIndent) {
   DoLog(FFullName, ALogLevel, ALogMessage, nullptr, ALogIndent);
 }
-void TZqLogger::Log(
+ZQ_HOT void TZqLogger::Log(
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Variant& AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = VariantRec(AValue);
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
-void TZqLogger::Log(
+ZQ_HOT void TZqLogger::Log(
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const TObject* AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = ObjectRec(AValue);
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
-void TZqLogger::Log(
+ZQ_HOT void TZqLogger::Log(
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Exception& AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = ExceptionRec(AValue);
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
-void TZqLogger::Log(const IntfRef<IZqLogData>& ALogData) {
+ZQ_HOT void TZqLogger::Log(const IntfRef<IZqLogData>& ALogData) {
   const TZqLogData& Event = *ALogData->Data();
   Log(Event.LogLevel, Event.LogMessage, Event.Indent);
 }

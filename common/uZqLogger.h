@@ -11,6 +11,7 @@
 #include "common/uZqTypes.h"
 #include "runtime/component/component.h"
 #include "runtime/core/interfaces.h"
+#include "runtime/core/utf8.h"
 #include "runtime/core/variants.h"
 #include "runtime/core/varrec.h"
 #include "runtime/sync/critical_section.h"
@@ -36,6 +37,11 @@ using enum TZqLogIndent;
 /// The value that travels with a message; DataType says which member is valid. Lives for the log call only: pointers
 /// are the caller's, and an appender keeps neither them nor the record.
 struct TZqDataRec {
+  struct TMethodRec {
+    const void* Code;
+    const void* Data;
+  };
+
   TZqDataRec() noexcept : VInt64(0) {}
 
   TZqTypeKind DataType = rtkUnknown;
@@ -63,10 +69,7 @@ struct TZqDataRec {
     const TObject* VObject;
     const void* VPointer;
     const void* VInterface;
-    struct {
-      const void* Code;
-      const void* Data;
-    } VMethod;
+    TMethodRec VMethod;
     const Variant* VVariant;
     const void* VRecord;
     const Exception* VException;
@@ -145,6 +148,17 @@ struct ZQ_API IZqLogLayoutEx : Extends<IZqLogLayout> {
 
  protected:
   ~IZqLogLayoutEx() = default;
+};
+
+/// A layout that can put its line into the caller's buffer as the bytes of the file.
+struct ZQ_API IZqLineLayout : Extends<IInterface> {
+  static constexpr TGUID IID = "{7B0F3A52-9D1E-4C68-8F27-5E1C6AD94B03}"_guid;
+  /// Appends what FormatLine returns, in UTF-8.
+  virtual void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) = 0;
+
+ protected:
+  ~IZqLineLayout() = default;
 };
 
 /// A layout that is told which appender it now serves.

@@ -1,5 +1,8 @@
 #include <gtest/gtest.h>
 
+#include <tuple>
+#include <utility>
+
 #include "runtime/core/interfaces.h"
 #include "tests/support/support.h"
 
@@ -24,41 +27,33 @@ struct IColour : Extends<IInterface> {
   virtual int Hue() = 0;
 };
 
-class TShape : public Implements<TInterfacedObject, IShape> {
- public:
+struct TShape : Implements<TInterfacedObject, IShape> {
   explicit TShape(int& AAlive) : FAlive(AAlive) {
     const IntfRef<IShape> Self(this);  // whose end must not be the object's
     FAlive += Self->Corners() / 8;
   }
   int Corners() override { return 8; }
-  bool Refuses = false;
-
- protected:
   ~TShape() override { --FAlive; }
   void BeforeDestruction() override {
     if (Refuses) throw EInvalidOperation(u"not yet");
     Implements::BeforeDestruction();
   }
-
- private:
+  bool Refuses = false;
   int& FAlive;
 };
 // Corners, which ISolid asks for too, comes from the base class.
-class TSolid : public Implements<TShape, ISolid> {
- public:
+struct TSolid : Implements<TShape, ISolid> {
   using Implements::Implements;
   int Faces() override { return 6; }
 };
-class TCube : public Implements<TShape, IColour, ISolidEx> {
- public:
+struct TCube : Implements<TShape, IColour, ISolidEx> {
   using Implements::Implements;
   int Faces() override { return 6; }
   int Edges() override { return 12; }
   int Hue() override { return 3; }
 };
 
-class Interface : public testing::Test {
- protected:
+struct Interface : testing::Test {
   ~Interface() override { EXPECT_EQ(FAlive, 0); }
   int FAlive = 0;
 };
@@ -84,15 +79,12 @@ TEST_F(Interface, SharedGuidDoesNotGrantTheLongerInterface) {
 
 TEST_F(Interface, EveryWayOfTakingAndDroppingKeepsTheCount) {
   auto* const Object = New<TCube>(FAlive);
-  EXPECT_EQ(Object->RefCount(), 0);
-  IntfRef<IShape> A(Object);
-  IntfRef<IShape> B = A;
+  IntfRef<IShape> A(Object), B = A;
   EXPECT_EQ(Object->RefCount(), 2);
   EXPECT_THROW(Object->Free(), Exception);
   A = std::move(B);
   EXPECT_EQ(Object->RefCount(), 1);
-  const IntfRef<IShape>& Same = A;
-  A = Same;
+  A = std::as_const(A);
   const IntfRef<IInterface> Wider = A;
   std::ignore = A.Supports<ISolidEx>();
   std::ignore = A.Supports<IColour>();

@@ -2,13 +2,18 @@
 #include <gtest/gtest.h>
 
 #include <functional>
+#include <memory>
+#include <string>
 #include <thread>
+#include <tuple>
+#include <utility>
 #include <vector>
 
 #include "runtime/core/delegates.h"
 #include "runtime/core/exceptions.h"
 #include "runtime/core/objects.h"
 #include "tests/plugin/plugin.h"
+#include "tests/support/raised.h"
 #include "tests/support/support.h"
 
 namespace zq {
@@ -30,7 +35,6 @@ TEST(ClassName, DropsWhatEnclosesTheClassAndKeepsItsArguments) {
   EXPECT_EQ(TLocal().ClassName(), u"TLocal");
   EXPECT_EQ(TBox<TOuter::TInner>().ClassName(), u"TBox<zq::TOuter::TInner>");
   EXPECT_EQ(TBox<THidden>().ClassName(), u"TBox<zq::(anonymous namespace)::THidden>");
-  EXPECT_EQ(TClass().ClassName(), u"");
 }
 
 struct TForeign {
@@ -46,17 +50,12 @@ TEST(Class, IsKnownThroughASecondBase) {
   EXPECT_FALSE(Deep.InheritsFrom(ClassOf<THidden>()) || Deep.InheritsFrom(TClass()));
   EXPECT_FALSE(ClassOf<TLeft>().InheritsFrom(ClassOf<TDeep>()));
   EXPECT_EQ(ClassOf<TLeft>().ClassParent(), ClassOf<TObject>()) << "the first base is none of the family";
-  EXPECT_FALSE(ClassOf<TObject>().ClassParent());
 }
 
 // ---- Life ----------------------------------------------------------------------------------------------------------
 
-class TLifeBase : public TObject {
- public:
+struct TLifeBase : TObject {
   TLifeBase(std::string& ASteps, char ARaiseAt) : RaiseAt(ARaiseAt), FSteps(ASteps) { Step('c'); }
-  char RaiseAt;
-
- protected:
   ~TLifeBase() override { FSteps += 'd'; }
   void AfterConstruction() override { Step('a'); }
   void BeforeDestruction() override { Step('b'); }
@@ -64,14 +63,12 @@ class TLifeBase : public TObject {
     FSteps += AStep;
     if (AStep == RaiseAt) throw Exception(u"at the step");
   }
+  char RaiseAt;
   std::string& FSteps;
 };
 
-class TLife : public TLifeBase {
- public:
+struct TLife : TLifeBase {
   using TLifeBase::TLifeBase;
-
- protected:
   ~TLife() override { FSteps += 'D'; }
   void AfterConstruction() override {
     TLifeBase::AfterConstruction();
@@ -81,33 +78,19 @@ class TLife : public TLifeBase {
 
 TEST(Life, RaiseOnTheWayInLeavesNothingBehind) {
   std::string Steps;
-  EXPECT_THROW(std::ignore = New<TLife>(Steps, 'c'), Exception);
-  EXPECT_THROW(std::ignore = New<TLife>(Steps, 'A'), Exception);
+  for (const char Step : {'c', 'A'}) EXPECT_THROW(std::ignore = New<TLife>(Steps, Step), Exception);
   EXPECT_EQ(Steps, "ccaADd");
 }
 
 TEST(Life, RaiseBeforeTheEndLeavesTheObjectAlive) {
   std::string Steps;
-  TLife* const Object = New<TLife>(Steps, 'b');
-  TLife* Field = Object;
+  TLife *const Object = New<TLife>(Steps, 'b'), *Field = Object;
   EXPECT_THROW(FreeAndNil(Field), Exception);
   EXPECT_EQ(Field, nullptr) << "the field is emptied first";
   EXPECT_EQ(Steps, "caAb");
   Object->RaiseAt = ' ';
   Free(Object);
   EXPECT_EQ(Steps, "caAbbDd");
-  Free(Field);
-}
-
-TEST(ClassRef, MakesTheClassThatItNames) {
-  using TLifeClass = TClassRef<TLifeBase(std::string&, char)>;
-  std::string Steps;
-  const TLifeClass Class = TLifeClass::Of<TLife>();
-  const TOwned<TLifeBase> Object(Class.Create(Steps, ' '));
-  EXPECT_EQ(Steps, "caA") << "the whole of the protocol has run";
-  EXPECT_EQ(Class.ClassName(), u"TLife");
-  EXPECT_NE(Class, TLifeClass::Of<TLifeBase>());
-  EXPECT_NE(Class, TLifeClass());
 }
 
 // ---- Callbacks -----------------------------------------------------------------------------------------------------
@@ -124,11 +107,9 @@ TEST(Method, BoundToAnObjectComparesByObjectAndFunction) {
   TCounter A, B;
   const TAdd OfA = Bind<&TCounter::Add>(&A);
   EXPECT_EQ(OfA(3) + OfA(4), 10);
-  EXPECT_EQ(OfA.Object(), &A);
   EXPECT_EQ(OfA, TAdd::Of<&TCounter::Add>(&A));
   EXPECT_NE(OfA, TAdd::Of<&TCounter::Add>(&B));
   EXPECT_NE(OfA, TAdd::Of<&TCounter::Twice>(&A));
-  EXPECT_NE(OfA, TAdd());
   EXPECT_THROW(TAdd()(1), std::bad_function_call);
 }
 
@@ -137,13 +118,10 @@ TEST(Method, CopiesOfALambdaShareItAndTheLastOneEndsIt) {
   TAdd First = [Token, Sum = 0](int ABy) mutable { return Sum += ABy; };
   const TAdd Second = First;
   EXPECT_EQ(First, Second);
-  EXPECT_EQ(First.Object(), nullptr);
   EXPECT_EQ(First(2) + Second(3), 2 + 5);
   TAdd Moved = std::move(First);
   Moved = Second;
   EXPECT_EQ(Token.use_count(), 2);
-  Moved = nullptr;
-  EXPECT_EQ(Second(1), 6);
 }
 
 TEST(Method, CallMayOverwriteTheFieldItWasMadeThrough) {
@@ -175,8 +153,8 @@ TEST(ThreadException, StaysTheSameObjectAcrossThreads) {
     Held.Raise();
   } catch (const EInOutError& e) {
     EXPECT_EQ(&e, Raised);
-    EXPECT_STREQ(e.what(), "d\xC3\xBCnn");
   }
+  EXPECT_STREQ(Held->what(), "d\xC3\xBCnn");
   Held->SetMessage(u"other");
   EXPECT_STREQ(Held->what(), "other") << "the text of an earlier what() is gone";
 }
@@ -203,26 +181,20 @@ TEST(Assertion, NamesTheUnitByItsPlaceInTheLibrary) {
       {"common/uZqLogger.h", u"common/uZqLogger"}, {"/home/common/lib/runtime/io/files.cpp", u"runtime/io/files"},
       {"/runtime/lib/common/uZqTypes.cpp", u"common/uZqTypes"}, {"/uncommon/host.cpp", u"/uncommon/host"},
       {"/v1.2/host", u"/v1.2/host"}};
-  for (const auto& [File, Unit] : cCases) try {
-      Assert(false, u"t", File, 7);
-      ADD_FAILURE();
-    } catch (const EAssertionFailed& e) {
-      EXPECT_EQ(e.Message(), u"t (" + Unit + u", line 7)");
-    }
-  EXPECT_NO_THROW(Assert(true));
-  const int Line = __LINE__ + 2;
+  for (const auto& [File, Unit] : cCases)
+    EXPECT_EQ(RaisedBy([&, &Place = File] { Assert(false, u"t", Place, 7); }),
+        u"EAssertionFailed: t (" + Unit + u", line 7)");
   try {
     Assert(1 + 1 == 3);
   } catch (const EAssertionFailed& e) {
-    EXPECT_EQ(e.Line(), Line) << "the caller's";
+    EXPECT_EQ(e.Line(), __LINE__ - 2) << "the caller's";
     EXPECT_EQ(e.Message().Pos(u"Assertion failure ("), 1);
   }
 }
 
 // ---- A second library ----------------------------------------------------------------------------------------------
 
-class Plugin : public testing::Test {
- protected:
+struct Plugin : testing::Test {
   void SetUp() override {
     void* const Library = dlopen(ZQ_TEST_PLUGIN, RTLD_NOW | RTLD_LOCAL);
     ASSERT_NE(Library, nullptr) << dlerror();
@@ -237,7 +209,6 @@ TEST_F(Plugin, ClassesAndInterfacesAreTheSameOnBothSides) {
   const IntfRef<IInterface> Held(Object);
   EXPECT_EQ(Object->ClassName(), u"TPluginEcho");
   EXPECT_TRUE(Object->InheritsFrom(ClassOf<TInterfacedObject>()) && Object->InheritsFrom(ClassOf<plugin::IEchoEx>()));
-  EXPECT_FALSE(Object->InheritsFrom(ClassOf<Exception>()));
   EXPECT_EQ(Supports<plugin::IEcho>(Object)->Echo(u"ab"), u"ab");
   EXPECT_EQ(Held.As<plugin::IEchoEx>()->EchoTwice(u"ab"), u"abab");
 }
@@ -255,11 +226,8 @@ TEST_F(Plugin, ExceptionIsCaughtByItsTypeAndOutlivesItsHandler) {
   EXPECT_EQ(Held.Message(), u"from afar");
   EXPECT_EQ(Held->ClassName(), u"EPluginError");
   EXPECT_EQ(Held->ClassType(), FEntries->ClassOfRaised().ClassType());
-}
-
-TEST_F(Plugin, CallbackRaisesThroughTheOtherLibrary) {
   const auto Refuse = [](const UnicodeString& AText) -> UnicodeString { throw EListError(AText); };
-  EXPECT_THROW(FEntries->Call(Refuse, u"x"), EListError);
+  EXPECT_THROW(FEntries->Call(Refuse, u"x"), EListError) << "raised here, through the other library";
 }
 
 }  // namespace

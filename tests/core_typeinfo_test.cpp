@@ -1,6 +1,6 @@
 #include <gtest/gtest.h>
 
-#include <algorithm>
+#include <array>
 #include <latch>
 #include <limits>
 #include <memory>
@@ -29,57 +29,45 @@ struct IShape : Extends<IInterface> {
   static constexpr TGUID IID = "{0B7B1E0C-0C2E-4D52-8DE5-1E5D3E2B7E61}"_guid;
   virtual Integer Corners() = 0;
 };
-class TShape : public Implements<TInterfacedObject, IShape> {
- public:
+struct TShape : Implements<TInterfacedObject, IShape> {
   Integer Corners() override { return 3; }
 };
 
-class TCustomer : public TObject {
- public:
+struct TCustomer : TObject {
   ~TCustomer() override = default;
-  [[nodiscard]] const UnicodeString& GetName() const { return FName; }
-  void SetName(const UnicodeString& AValue) { FName = AValue; }
-  [[nodiscard]] Integer GetRating() const { return FRating; }
+  [[nodiscard]] Integer GetRating() const { return Rating; }
   void SetRating(Integer AValue) {
     if (AValue < 0) throw EInvalidOperation(u"negative");
-    FRating = AValue;
+    Rating = AValue;
   }
-  [[nodiscard]] IntfRef<IShape> GetShape() const { return FShape; }
-  void SetShape(IntfRef<IShape> AValue) { FShape = std::move(AValue); }
-
+  UnicodeString Name;
+  Integer Rating = 0;
   TColour Colour = TColour::Red;
   TColours Colours;
   bool Active = false;
   TCustomer* Partner = nullptr;
-
- private:
-  UnicodeString FName;
-  Integer FRating = 0;
-  IntfRef<IShape> FShape;
+  IntfRef<IShape> Shape;
 };
-class TUndescribed : public TCustomer {};
-class TVip : public TUndescribed {
- public:
+struct TUndescribed : TCustomer {};
+struct TVip : TUndescribed {
   [[nodiscard]] Char GetGrade() const { return u'A'; }
-  [[nodiscard]] UnicodeString GetTitle() const { return u"Dr " + GetName(); }
 };
 
-class TypeInfoOfClass : public testing::Test {
- protected:
+struct TypeInfoOfClass : testing::Test {
   static void SetUpTestSuite() {
     DescribeType<TColour>(u"uShop").EnumNames({u"cRed", u"cGreen", u"", u"cBlue"});
     DescribeType<TCustomer>(u"uShop")
-        .Property(u"Name", &TCustomer::GetName, &TCustomer::SetName)
+        .Property(u"Name", &TCustomer::Name, [](TCustomer& A, const UnicodeString& AValue) { A.Name = AValue; })
         .Property(u"Rating", &TCustomer::GetRating, &TCustomer::SetRating)
         .Property(u"Colour", &TCustomer::Colour, [](TCustomer& A, TColour AValue) { A.Colour = AValue; })
         .Property(u"Colours", &TCustomer::Colours, [](TCustomer& A, const TColours& AValue) { A.Colours = AValue; })
-        .Property(
-            u"Active", [](const TCustomer& A) { return A.Active; },
-            [](TCustomer& A, bool AValue) { A.Active = AValue; })
+        .Property(u"Active", &TCustomer::Active, [](TCustomer& A, bool AValue) { A.Active = AValue; })
         .Property(u"Partner", &TCustomer::Partner, [](TCustomer& A, TCustomer* AValue) { A.Partner = AValue; })
-        .Property(u"Shape", &TCustomer::GetShape, &TCustomer::SetShape)
+        .Property(u"Shape", &TCustomer::Shape, [](TCustomer& A, IntfRef<IShape> AValue) { A.Shape = AValue; })
         .Property<Integer>(u"Secret", nullptr, &TCustomer::SetRating);
-    DescribeType<TVip>(u"uShop").Property(u"Grade", &TVip::GetGrade).Property(u"NAME", &TVip::GetTitle);
+    DescribeType<TVip>(u"uShop").Property(u"Grade", &TVip::GetGrade).Property(u"NAME", [](const TVip& A) {
+      return u"Dr " + A.Name;
+    });
   }
   static std::string Names(const TObject& AObject) {
     std::string Result;
@@ -89,25 +77,16 @@ class TypeInfoOfClass : public testing::Test {
 };
 
 TEST(TypeInfo, KindAndNameFollowTheCxxType) {
-  const std::tuple<PTypeInfo, TTypeKind, const char16_t*> Cases[] = {{TypeInfo<Byte>(), tkInteger, u"Byte"},
-      {TypeInfo<Integer>(), tkInteger, u"Integer"}, {TypeInfo<Int64>(), tkInt64, u"Int64"},
-      {TypeInfo<NativeInt>(), tkInt64, u"NativeInt"}, {TypeInfo<NativeUInt>(), tkInt64, u"NativeUInt"},
-      {TypeInfo<Char>(), tkWChar, u"Char"}, {TypeInfo<AnsiChar>(), tkChar, u"AnsiChar"},
-      {TypeInfo<bool>(), tkEnumeration, u"Boolean"}, {TypeInfo<WordBool>(), tkEnumeration, u"WordBool"},
-      {TypeInfo<TPair>(), tkRecord, u"TPair"}, {TypeInfo<Single>(), tkFloat, u"Single"},
-      {TypeInfo<TDateTime>(), tkFloat, u"TDateTime"}, {TypeInfo<TDate>(), tkFloat, u"TDate"},
-      {TypeInfo<UnicodeString>(), tkUString, u"string"}, {TypeInfo<WideString>(), tkWString, u"WideString"},
-      {TypeInfo<RawByteString>(), tkLString, u"RawByteString"}, {TypeInfo<UTF8String>(), tkLString, u"UTF8String"},
+  const std::tuple<PTypeInfo, TTypeKind, const char16_t*> Cases[] = {{TypeInfo<NativeInt>(), tkInt64, u"NativeInt"},
+      {TypeInfo<AnsiChar>(), tkChar, u"AnsiChar"}, {TypeInfo<bool>(), tkEnumeration, u"Boolean"},
+      {TypeInfo<TPair>(), tkRecord, u"TPair"}, {TypeInfo<TDateTime>(), tkFloat, u"TDateTime"},
+      {TypeInfo<UnicodeString>(), tkUString, u"string"}, {TypeInfo<RawByteString>(), tkLString, u"RawByteString"},
       {TypeInfo<ShortString>(), tkString, u"ShortString"}, {TypeInfo<TColours>(), tkSet, nullptr},
-      {TypeInfo<TShape>(), tkClass, u"TShape"}, {TypeInfo<IntfRef<IShape>>(), tkInterface, u"IShape"},
-      {TypeInfo<Variant>(), tkVariant, u"Variant"}, {TypeInfo<TArray<TPair>>(), tkDynArray, u"TArray<TPair>"},
-      {TypeInfo<TArray<Byte>>(), tkDynArray, u"TArray<System.Byte>"},
-      {TypeInfo<TArray<UnicodeString>>(), tkDynArray, u"TStringDynArray"},
-      {TypeInfo<std::array<int, 3>>(), tkArray, nullptr}, {TypeInfo<int[3]>(), tkArray, nullptr},
-      {TypeInfo<TMethod<void()>>(), tkMethod, nullptr}, {TypeInfo<TClass>(), tkClassRef, u"TClass"},
-      {TypeInfo<TClassRef<TObject()>>(), tkClassRef, nullptr}, {TypeInfo<ExceptionClass>(), tkClassRef, nullptr},
-      {TypeInfo<Pointer>(), tkPointer, u"Pointer"}, {TypeInfo<void (*)(int)>(), tkProcedure, nullptr},
-      {TypeInfo<void()>(), tkProcedure, nullptr}, {TypeInfo<void>(), tkUnknown, nullptr}};
+      {TypeInfo<IntfRef<IShape>>(), tkInterface, u"IShape"},
+      {TypeInfo<TArray<Byte>>(), tkDynArray, u"TArray<System.Byte>"}, {TypeInfo<int[3]>(), tkArray, nullptr},
+      {TypeInfo<TArray<UnicodeString>>(), tkDynArray, u"TStringDynArray"}, {TypeInfo<void>(), tkUnknown, nullptr},
+      {TypeInfo<TMethod<void()>>(), tkMethod, nullptr}, {TypeInfo<ExceptionClass>(), tkClassRef, nullptr},
+      {TypeInfo<Pointer>(), tkPointer, u"Pointer"}, {TypeInfo<void (*)(int)>(), tkProcedure, nullptr}};
   for (const auto& [Type, Kind, Name] : Cases) {
     EXPECT_EQ(Type->Kind, Kind) << Type->Name.ToUTF8();
     EXPECT_EQ(Type->Name, Name == nullptr ? Type->Name : Name);
@@ -144,8 +123,7 @@ TEST_F(TypeInfoOfClass, PropertiesComeInOrderWithTheAncestorsFirst) {
   TVip Vip;
   EXPECT_EQ(Names(Vip), "NAME Rating Colour Colours Active Partner Shape Secret Grade ");
   EXPECT_EQ(Names(TUndescribed()), "Name Rating Colour Colours Active Partner Shape Secret ");
-  EXPECT_EQ(Names(*std::make_unique<EAbort>(u"x")), "");
-  Vip.SetName(u"Who");
+  Vip.Name = u"Who";
   EXPECT_EQ(GetPropValue(&Vip, u"name"), u"Dr Who");
   EXPECT_FALSE(GetPropInfo(&Vip, u"Name")->IsWritable());
   const auto Before = GetPropList(TypeInfo<TVip>());
@@ -168,12 +146,10 @@ TEST_F(TypeInfoOfClass, PropertiesAreReadAndWrittenByKind) {
   TUndescribed Partner;
   SetPropValue(&Customer, u"Partner", &Partner);
   EXPECT_EQ(GetObjectProp(&Customer, u"Partner"), &Partner);
-  SetPropValue(&Customer, u"Partner", Null());
-  EXPECT_EQ(GetObjectProp(&Customer, u"Partner"), nullptr);
   SetPropValue(&Customer, u"Shape", IntfRef<IInterface>(New<TShape>()));
-  EXPECT_EQ(Customer.GetShape()->Corners(), 3);
+  EXPECT_EQ(Customer.Shape->Corners(), 3);
   SetPropValue(&Customer, u"Secret", 42);
-  EXPECT_EQ(Customer.GetRating(), 42);
+  EXPECT_EQ(Customer.Rating, 42);
 }
 
 TEST_F(TypeInfoOfClass, WhatAPropertyCannotTakeOrGiveIsRefused) {
@@ -184,12 +160,9 @@ TEST_F(TypeInfoOfClass, WhatAPropertyCannotTakeOrGiveIsRefused) {
   EXPECT_THROW(SetPropValue(&Customer, u"Rating", u"abc"), EVariantTypeCast);
   EXPECT_THROW(SetPropValue(&Customer, u"Colour", u"cPink"), EVariantTypeCast);
   EXPECT_THROW(SetPropValue(&Customer, u"Colour", 4), EVariantOverflow);
-  EXPECT_THROW(SetPropValue(&Customer, u"Colours", u"cPink"), EPropertyError);
   EXPECT_THROW(SetPropValue(&Customer, u"Partner", &Stranger), EInvalidCast);
-  EXPECT_THROW(SetPropValue(&Customer, u"Nothing", 1), EPropertyError);
   EXPECT_THROW(SetPropValue(&Vip, u"Grade", u"B"), EPropertyError);
-  EXPECT_THROW(static_cast<void>(GetPropValue(&Customer, u"Secret")), EPropertyError);
-  EXPECT_THROW(static_cast<void>(GetObjectProp(&Customer, u"Name")), EPropertyError);
+  EXPECT_THROW(std::ignore = GetPropValue(&Customer, u"Secret"), EPropertyError);
   const PPropInfo Rating = GetPropInfo(&Customer, u"Rating");
   EXPECT_THROW(static_cast<void>(Rating->GetValue(&Stranger)), EPropertyError);
   EXPECT_THROW(Rating->SetValue(nullptr, TValue::From(1)), EPropertyError);
@@ -200,9 +173,7 @@ TEST_F(TypeInfoOfClass, EnumerationsAndSetsHaveNames) {
   EXPECT_EQ(GetEnumName(Colour, 3), u"cBlue");
   EXPECT_EQ(GetEnumName(Colour, 2), u"2");
   EXPECT_EQ(GetEnumName(TypeInfo<WordBool>(), -1), u"True");
-  EXPECT_EQ(GetEnumName(TypeInfo<TTypeKind>(), 21), u"tkProcedure");
   EXPECT_EQ(GetEnumValue(Colour, u"CGREEN"), 1);
-  EXPECT_EQ(GetEnumValue(Colour, u""), -1);
   const std::tuple<const char16_t*, Integer, const char16_t*> Cases[] = {
       {u"", 0, u"[]"}, {u" [ ] ", 0, u"[]"}, {u"cBlue, cred", 9, u"[cRed,cBlue]"}, {u"[cGreen]", 2, u"[cGreen]"}};
   for (const auto& [Text, Bits, Written] : Cases) {
@@ -216,19 +187,12 @@ TEST_F(TypeInfoOfClass, TypesAreFoundByQualifiedName) {
   const TRttiContext Context;
   EXPECT_EQ(Context.FindType(u"System.TDatetime"), Context.GetType(TypeInfo<TDateTime>()));
   EXPECT_EQ(Context.FindType(u"uShop.TCustomer")->GetHandle(), TypeInfo<TCustomer>());
-  EXPECT_EQ(Context.GetType(ClassOf<TVip>())->GetQualifiedName(), u"uShop.TVip");
   EXPECT_EQ(Context.FindType(u"TCustomer"), nullptr);
   EXPECT_FALSE(Context.GetType(TypeInfo<TPair>())->GetIsPublicType());
-  EXPECT_EQ(Context.GetType(TypeInfo<TBytes>())->GetElementType()->GetName(), u"Byte");
-
   DescribeType<TNumbered<-1>>(u"uOld", u"TOne");
   DescribeType<TNumbered<-1>>(u"uNew", u"TTwo");
   EXPECT_EQ(Context.FindType(u"uOld.TOne"), nullptr);
   EXPECT_EQ(Context.FindType(u"uNew.TTwo")->GetHandle(), TypeInfo<TNumbered<-1>>());
-  const auto All = Context.GetTypes();
-  EXPECT_NE(std::find(All.begin(), All.end(), Context.FindType(u"uShop.TColour")), All.end());
-
-  EXPECT_FALSE(GetClass(u"TShape"));
   RegisterClass<TShape>();
   EXPECT_EQ(GetClass(u"tshape"), ClassOf<TShape>());
 }
@@ -238,84 +202,63 @@ TEST_F(TypeInfoOfClass, TypesAreFoundByQualifiedName) {
 class Values : public TypeInfoOfClass {};  // with its descriptions
 
 TEST_F(Values, ValuesOfEverySizeSurviveCopyAndMove) {
-  struct alignas(64) TWide {
-    std::array<double, 8> Numbers;
-  };
-  const TWide Wide{{1, 2, 3}};
+  struct alignas(64) TWide : std::array<double, 8> {};
   const TPair Pair{u"a text too long for any short string buffer", 2.5, 3};
-  TValue Value = TValue::From(Pair);
-  TValue Other = TValue::From(Wide);
+  TValue Value = TValue::From(Pair), Other = TValue::From(TWide{{1, 2, 3}});
   EXPECT_EQ(reinterpret_cast<std::uintptr_t>(Other.GetReferenceToRawData()) % 64, 0U);
   const TValue Copy = Value;
   std::swap(Value, Other);
-  EXPECT_EQ(Value.AsType<TWide>().Numbers[2], 3);
+  EXPECT_EQ(Value.AsType<TWide>()[2], 3);
   Other = TValue::From(AnsiString("a text too long for any short string buffer"));
   EXPECT_EQ(Copy.AsType<TPair>().Text, Pair.Text);
   Other = Copy;
   Value = std::move(Other);
   EXPECT_EQ(Value.AsType<TPair>().Number, 2.5);
   EXPECT_EQ(TValue::Make(&Pair, TypeInfo<TPair>()).AsType<TPair>().Rest, 3);
-  EXPECT_EQ(TValue::Make(nullptr, TypeInfo<TPair>()).AsType<TPair>().Text, u"");
   EXPECT_THROW(static_cast<void>(TValue::Make(nullptr, TypeInfo<std::unique_ptr<int>>())), EInvalidCast);
   EXPECT_EQ(TValue::From(0.1L).AsExtended(), 0.1L) << "through a double it is another number";
 }
 
 TEST_F(Values, ValuesAreReadAsWhatTheyAreOnly) {
   constexpr UInt64 cHigh = std::numeric_limits<UInt64>::max();
-  EXPECT_EQ(TValue::From(ShortInt{-3}).AsInteger(), -3);
   EXPECT_EQ(static_cast<UInt64>(TValue::From(cHigh).AsInt64()), cHigh);
   EXPECT_EQ(TValue::From(cHigh).AsExtended(), 18446744073709551615.0L);
   EXPECT_EQ(TValue::From('\xE9').AsOrdinal(), 0xE9);
-  EXPECT_EQ(TValue::From(TColours{TColour::Blue}).AsOrdinal(), 8);
-  EXPECT_TRUE(TValue::From(WordBool(true)).AsBoolean());
   EXPECT_EQ(TValue::From(Variant(u"12")).AsInteger(), 12);
-  const TValue Refused[] = {TValue(), TValue::From(2.0), TValue::From(UnicodeString(u"2")), TValue::From(TPair{})};
-  for (const TValue& Value : Refused) EXPECT_THROW(static_cast<void>(Value.AsInt64()), EInvalidCast);
-  EXPECT_THROW(static_cast<void>(TValue::From(4000000000U).AsInteger()), EInvalidCast);
-  EXPECT_THROW(static_cast<void>(TValue::From(1).AsBoolean()), EInvalidCast);
-  EXPECT_THROW(static_cast<void>(TValue::From(1).AsString()), EInvalidCast);
-  EXPECT_THROW(static_cast<void>(TValue::From(TColour::Red).AsExtended()), EInvalidCast);
-  EXPECT_THROW(static_cast<void>(TValue::From(TPair{}).AsVariant()), EInvalidCast);
-}
-
-TEST_F(Values, OrdinalsMakeValuesOfTheirType) {
-  EXPECT_EQ(TValue::Make(3, TypeInfo<TColour>()).AsType<TColour>(), TColour::Blue);
+  const TValue Refused[] = {
+      TValue(), TValue::From(2.0), TValue::From(UnicodeString(u"2")), TValue::From(TPair{}), TValue::From(4000000000U)};
+  for (const TValue& Value : Refused) EXPECT_THROW(std::ignore = Value.AsInteger(), EInvalidCast);
+  EXPECT_THROW(std::ignore = TValue::From(1).AsBoolean(), EInvalidCast);
+  EXPECT_THROW(std::ignore = TValue::From(1).AsString(), EInvalidCast);
+  EXPECT_THROW(std::ignore = TValue::From(TPair{}).AsVariant(), EInvalidCast);
   EXPECT_EQ(TValue::Make(300, TypeInfo<Byte>()).AsInteger(), 44);
-  EXPECT_EQ(TValue::Make(-1, TypeInfo<Int64>()).AsInt64(), -1);
   EXPECT_TRUE(TValue::Make(2, TypeInfo<bool>()).AsBoolean());
   EXPECT_TRUE(TValue::Make(9, TypeInfo<TColours>()).AsType<TColours>() == TColours({TColour::Red, TColour::Blue}));
-  EXPECT_THROW(static_cast<void>(TValue::Make(1, TypeInfo<Double>())), EInvalidCast);
+  EXPECT_THROW(std::ignore = TValue::Make(1, TypeInfo<Double>()), EInvalidCast);
 }
 
 TEST_F(Values, CastsKeepTheValueOrRefuse) {
   TVip Vip;
   EXPECT_EQ(TValue::From(200).AsType<Byte>(), 200);
-  EXPECT_EQ(TValue::From(7).AsType<Double>(), 7.0);
   EXPECT_EQ(TValue::From(AnsiString("ab")).AsType<WideString>(), u"ab");
-  EXPECT_EQ(TValue::From(UnicodeString(u"a")).AsType<Char>(), u'a');
   EXPECT_EQ(TValue::From(Variant(u"2.5")).AsType<UnicodeString>(), u"2.5");
   EXPECT_EQ(TValue::From(TColour::Blue).AsType<Variant>(), 3);
   EXPECT_EQ(TValue::From<TCustomer*>(&Vip).AsType<TVip*>(), &Vip);
-  EXPECT_EQ(TValue().AsType<TVip*>(), nullptr);
-  const TValue Shape = TValue::From<TObject*>(New<TShape>());
-  EXPECT_EQ(Shape.AsType<IntfRef<IShape>>()->Corners(), 3);
+  EXPECT_EQ(TValue::From<TObject*>(New<TShape>()).AsType<IntfRef<IShape>>()->Corners(), 3);
   EXPECT_THROW(static_cast<void>(TValue::From<TObject*>(&Vip).AsType<IntfRef<IShape>>()), EInvalidCast);
   TValue Ignored;
   const std::pair<TValue, PTypeInfo> Refused[] = {{TValue::From(256), TypeInfo<Byte>()},
       {TValue::From(1.0), TypeInfo<Integer>()}, {TValue::From(UnicodeString(u"ab")), TypeInfo<Char>()},
-      {TValue::From(1), TypeInfo<bool>()}, {TValue::From<TCustomer*>(&Vip), TypeInfo<TShape>()},
-      {TValue(), TypeInfo<Integer>()}};
+      {TValue::From<TCustomer*>(&Vip), TypeInfo<TShape>()}, {TValue(), TypeInfo<Integer>()}};
   for (const auto& [Value, Type] : Refused) EXPECT_FALSE(Value.TryCast(Type, Ignored)) << Type->Name.ToUTF8();
 }
 
 TEST_F(Values, ToStringIsForReaders) {
   TVip Vip;
-  const std::pair<TValue, const char16_t*> Cases[] = {{TValue(), u"(empty)"},
-      {TValue::From<TVip*>(nullptr), u"(empty)"}, {TValue::From(&Vip), u"TVip"}, {TValue::From(-5), u"-5"},
-      {TValue::From(TColour::Green), u"cGreen"}, {TValue::From(true), u"True"},
-      {TValue::From(TColours{TColour::Red, TColour::Blue}), u"[cRed,cBlue]"}, {TValue::From(UTF8String("é")), u"é"},
-      {TValue::From(TPair{}), u"(TPair)"}, {TValue::From(Variant(u"x")), u"x"}, {TValue::From(Null()), u"(empty)"},
-      {TValue::From(VarArrayOf({1})), u"(Variant)"},
+  const std::pair<TValue, const char16_t*> Cases[] = {{TValue::From<TVip*>(nullptr), u"(empty)"},
+      {TValue::From(&Vip), u"TVip"}, {TValue::From(TColour::Green), u"cGreen"}, {TValue::From(true), u"True"},
+      {TValue::From(TColours{TColour::Red, TColour::Blue}), u"[cRed,cBlue]"}, {TValue::From(TPair{}), u"(TPair)"},
+      {TValue::From(UTF8String("é")), u"é"}, {TValue::From(VarArrayOf({1})), u"(Variant)"},
       {TValue::From(std::numeric_limits<UInt64>::max()), u"18446744073709551615"}};
   for (const auto& [Value, Text] : Cases) EXPECT_EQ(Value.ToString(), Text);
 }
@@ -324,8 +267,7 @@ TEST_F(Values, VariantsUnpackToTheTypeOfTheirContent) {
   auto* const Object = New<TShape>();
   const IntfRef<IShape> Held(Object);
   {
-    const TValue Value = TValue::FromVariant(IntfRef<IInterface>(Object));
-    const TValue Copy = Value;
+    const TValue Value = TValue::FromVariant(IntfRef<IInterface>(Object)), Copy = Value;
     EXPECT_EQ(Object->RefCount(), 3);
     EXPECT_EQ(Copy.AsType<IntfRef<IShape>>(), Held);
   }

@@ -318,7 +318,7 @@ TEST(AppenderList, HoldsEachAppenderOnce) {
   List.Remove(Appender);
   EXPECT_EQ(List.Count(), 0);
   EXPECT_THROW(List.Add(IntfRef<IZqLogAppender>()), EAssertionFailed);
-  EXPECT_THROW(List.GetAppender(0), EListError);
+  EXPECT_THROW(static_cast<void>(List.GetAppender(0)), EListError);
 }
 
 TEST(AppenderList, AppenderFreedByHandLeavesEveryList) {

@@ -1,7 +1,9 @@
 #include "runtime/core/utf8.h"
 
+#include <algorithm>
 #include <cstdint>
 #include <cstring>
+#include <utility>
 
 #if defined(__SSE2__)
 #include <emmintrin.h>
@@ -204,7 +206,7 @@ std::size_t AsciiRun(const char16_t* ASource, std::size_t ALength) noexcept {
 
 // Where the short loops of Decode and Encode fall on the cache lines is a quarter of their speed, hence the alignment.
 
-[[gnu::aligned(64)]] std::size_t Decode(
+[[gnu::hot, gnu::aligned(64)]] std::size_t Decode(
     const char* ASource, std::size_t ALength, char16_t* ADest, TMalformed AMalformed) noexcept {
   const auto* Source = reinterpret_cast<const unsigned char*>(ASource);
   const auto* const End = Source + ALength;
@@ -240,7 +242,7 @@ std::size_t DecodedLength(const char* ASource, std::size_t ALength) noexcept {
   return Result;
 }
 
-[[gnu::aligned(64)]] std::size_t Encode(
+[[gnu::hot, gnu::aligned(64)]] std::size_t Encode(
     const char16_t* ASource, std::size_t ALength, char* ADest, TMalformed AMalformed) noexcept {
   const char16_t* Source = ASource;
   const char16_t* const End = ASource + ALength;
@@ -287,6 +289,14 @@ std::string Encode(std::u16string_view ASource, TMalformed AMalformed) {
   std::string Result(ASource.size() * 3, '\0');
   Result.resize(Encode(ASource.data(), ASource.size(), Result.data(), AMalformed));
   return Result;
+}
+
+void TBuffer::Grow(std::size_t ABytes) {
+  const std::size_t Room = std::max(FSize + ABytes, 2 * FRoom);
+  auto Bytes = std::make_unique_for_overwrite<char[]>(Room);
+  if (FSize != 0) std::memcpy(Bytes.get(), FBytes.get(), FSize);
+  FBytes = std::move(Bytes);
+  FRoom = Room;
 }
 
 }  // namespace zq::utf8

@@ -1,8 +1,10 @@
 #pragma once
 
 #include <cstddef>
+#include <memory>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include "runtime/core/api.h"
 
@@ -33,5 +35,39 @@ ZQ_API std::size_t AsciiRun(const char16_t* ASource, std::size_t ALength) noexce
 
 ZQ_API std::u16string Decode(std::string_view ASource, TMalformed AMalformed = TMalformed::Replace);
 ZQ_API std::string Encode(std::u16string_view ASource, TMalformed AMalformed = TMalformed::Replace);
+
+/// Bytes that grow at the end and keep their room, so that one buffer serves for many texts.
+class TBuffer {
+ public:
+  TBuffer() noexcept = default;
+  TBuffer(TBuffer&& AOther) noexcept { Swap(AOther); }
+  TBuffer& operator=(TBuffer&& AOther) noexcept {
+    TBuffer Taken(std::move(AOther));
+    Swap(Taken);
+    return *this;
+  }
+
+  void Clear() noexcept { FSize = 0; }
+  /// AText in UTF-8.
+  void Append(std::u16string_view AText) {
+    if (FRoom - FSize < 3 * AText.size()) Grow(3 * AText.size());
+    FSize += Encode(AText.data(), AText.size(), FBytes.get() + FSize);
+  }
+  [[nodiscard]] std::string_view View() const noexcept { return {FBytes.get(), FSize}; }
+  [[nodiscard]] bool IsEmpty() const noexcept { return FSize == 0; }
+  [[nodiscard]] std::size_t Room() const noexcept { return FRoom; }
+
+ private:
+  ZQ_API void Grow(std::size_t ABytes);
+  void Swap(TBuffer& AOther) noexcept {
+    std::swap(FBytes, AOther.FBytes);
+    std::swap(FSize, AOther.FSize);
+    std::swap(FRoom, AOther.FRoom);
+  }
+
+  std::unique_ptr<char[]> FBytes;
+  std::size_t FSize = 0;
+  std::size_t FRoom = 0;
+};
 
 }  // namespace zq::utf8

@@ -19,14 +19,14 @@ namespace {
 
 constexpr Word cUTF8 = 65001;
 constexpr std::string_view cLineEnd = "\r\n";
-constexpr std::size_t cOnStack = 8192;
+constexpr std::size_t cOnStack = 2048;
 constexpr std::size_t cKeptRoom = 1 << 20;
 
 // At most this many bytes for one unit; the stateful code pages put an escape sequence around it.
 constexpr std::size_t MaxBytesPerUnit(Word ACodePage) noexcept { return ACodePage == cUTF8 ? 3 : 8; }
 
 // Bytes written to ADest, which has ARoom; 0 for a text that the code page's converter refuses.
-std::size_t EncodeTo(char* ADest, std::size_t ARoom, std::u16string_view AText, Word ACodePage) {
+ZQ_HOT std::size_t EncodeTo(char* ADest, std::size_t ARoom, std::u16string_view AText, Word ACodePage) {
   if (ACodePage == cUTF8) return utf8::Encode(AText.data(), AText.size(), ADest);
   return static_cast<std::size_t>(
       WideCharToMultiByte(ACodePage, 0, AText.data(), static_cast<int>(AText.size()), ADest, static_cast<int>(ARoom)));
@@ -64,9 +64,9 @@ void TTextFile::Open(int AFlags, const char16_t* AStep) {
 
 void TTextFile::Write(const UnicodeString& AText) { WriteText(AText, {}); }
 
-void TTextFile::WriteLn(const UnicodeString& AText) { WriteText(AText, cLineEnd); }
+ZQ_HOT void TTextFile::WriteLn(const UnicodeString& AText) { WriteText(AText, cLineEnd); }
 
-void TTextFile::WriteText(std::u16string_view AText, std::string_view ALineEnd) {
+ZQ_HOT void TTextFile::WriteText(std::u16string_view AText, std::string_view ALineEnd) {
   RequireOpen();
   char OnStack[cOnStack];
   const std::size_t Room = MaxBytesPerUnit(FCodePage) * AText.size();
@@ -84,14 +84,14 @@ void TTextFile::WriteText(std::u16string_view AText, std::string_view ALineEnd) 
   if (FLong.size() > cKeptRoom) std::string().swap(FLong);
 }
 
-void TTextFile::WriteBytes(std::string_view ABytes) {
+ZQ_HOT void TTextFile::WriteBytes(std::string_view ABytes) {
   RequireOpen();
   if (ABytes.empty()) return;
   if (FTorn) Put(cLineEnd);
   Put(ABytes);
 }
 
-void TTextFile::Put(std::string_view ABytes) {
+ZQ_HOT void TTextFile::Put(std::string_view ABytes) {
   while (!ABytes.empty()) {
     const ssize_t Count = ::write(FHandle, ABytes.data(), ABytes.size());
     if (Count < 0 && errno == EINTR) continue;
@@ -109,7 +109,7 @@ void TTextFile::Close() {
   if (IsOpen() && ::close(std::exchange(FHandle, -1)) != 0 && errno != EINTR) Fail(u"close", errno);
 }
 
-void TTextFile::RequireOpen() const {
+ZQ_HOT void TTextFile::RequireOpen() const {
   if (!IsOpen()) Fail(u"write", EBADF);
 }
 

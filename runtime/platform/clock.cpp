@@ -4,6 +4,7 @@
 #include <cmath>
 #include <ctime>
 #include <limits>
+#include <mutex>
 
 namespace zq {
 
@@ -17,6 +18,7 @@ constexpr Int64 FloorDiv(Int64 AValue, Int64 ABy) noexcept { return AValue / ABy
 
 // Rises when the zone may have changed.
 constinit std::atomic<unsigned> ZoneGeneration{0};
+constinit std::mutex ZoneLock;  // the system's own lock about its zone is none that a race detector sees
 
 Integer SystemOffset(Int64 AUtcSeconds) noexcept {
   const auto Moment = static_cast<std::time_t>(AUtcSeconds);
@@ -28,16 +30,18 @@ Integer SystemOffset(Int64 AUtcSeconds) noexcept {
 // of one that begins and ends alike, and asks the system only on leaving it.
 class TLinuxClock : public TClockService {
  public:
-  Int64 UtcMicroseconds() override {
+  ZQ_HOT Int64 UtcMicroseconds() override {
     timespec Time{};
     clock_gettime(CLOCK_REALTIME, &Time);
     return Time.tv_sec * 1000000LL + Time.tv_nsec / 1000;
   }
-  Integer UtcOffsetSeconds(Int64 AUtcSeconds) override {
-    thread_local constinit TQuarter Known;
+  ZQ_HOT Integer UtcOffsetSeconds(Int64 AUtcSeconds) override {
+    // Initial-exec: no call where a shared library would otherwise make one.
+    __attribute__((tls_model("initial-exec"))) thread_local constinit TQuarter Known;
     const Int64 Quarter = FloorDiv(AUtcSeconds, cQuarter);
     const unsigned Generation = ZoneGeneration.load(std::memory_order_relaxed);
     if (Known.Number == Quarter && Known.Generation == Generation) return Known.Offset;
+    const std::lock_guard Guard(ZoneLock);
     tzset();
     const Integer First = SystemOffset(Quarter * cQuarter);
     if (First != SystemOffset(Quarter * cQuarter + cQuarter - 1)) return SystemOffset(AUtcSeconds);
@@ -54,20 +58,20 @@ class TLinuxClock : public TClockService {
   };
 };
 
-Int64 LocalMilliseconds() {
+}  // namespace
+
+ZQ_HOT std::atomic<TClockService*>& ServiceSlot(const TClockService*) noexcept {
+  static std::atomic<TClockService*> Slot{new TLinuxClock};
+  return Slot;
+}
+
+ZQ_HOT Int64 NowMilliseconds() {
   TClockService& Clock = Platform().Clock();
   const Int64 Utc = FloorDiv(Clock.UtcMicroseconds(), 1000);
   return Utc + Int64{1000} * Clock.UtcOffsetSeconds(FloorDiv(Utc, 1000));
 }
 
-}  // namespace
-
-std::atomic<TClockService*>& ServiceSlot(const TClockService*) noexcept {
-  static std::atomic<TClockService*> Slot{new TLinuxClock};
-  return Slot;
-}
-
-TDateTime Now() { return UnixMillisecondsToDateTime(LocalMilliseconds()); }
+TDateTime Now() { return UnixMillisecondsToDateTime(NowMilliseconds()); }
 
 TDate Date() { return TDate(std::trunc(Now().Value)); }
 

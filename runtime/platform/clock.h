@@ -18,6 +18,8 @@ class ZQ_API TClockService {
 
 /// The current service's time of day, local, in whole milliseconds: what a log line shows never lies in the future.
 [[nodiscard]] ZQ_API TDateTime Now();
+/// The same moment as milliseconds since 1970-01-01 00:00 local time, for who needs no TDateTime.
+[[nodiscard]] ZQ_API Int64 NowMilliseconds();
 [[nodiscard]] ZQ_API TDate Date();
 [[nodiscard]] ZQ_API TTime Time();
 

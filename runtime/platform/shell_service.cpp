@@ -105,7 +105,7 @@ std::optional<UnicodeString> FindShellFolder(Integer ACsidl) {
 
 // ----------------------------------------------------------------------------------------------------------- Trash
 
-// By the freedesktop Trash Specification. The path is recorded as ARecorded: absolute in the user's own trash, below
+// By the freedesktop rules for the trash. The path is recorded as ARecorded: absolute in the user's own trash, below
 // the mount's top in that one's. False with errno.
 bool MoveIntoTrash(const std::string& ATrash, const std::string& APath, const std::string& ARecorded) {
   std::error_code Ignored;

@@ -20,7 +20,7 @@ inline constexpr Integer CSIDL_PERSONAL = 5;
 inline constexpr Integer CSIDL_COMMON_DOCUMENTS = 46;
 inline constexpr Cardinal STGM_SHARE_DENY_NONE = 0x40;
 
-/// A shortcut to a file. On Linux a desktop entry (freedesktop Desktop Entry Specification): an application with its
+/// A shortcut to a file. On Linux a desktop entry (freedesktop): an application with its
 /// command line where the target is a program, a link to it otherwise.
 class ZQ_API TShellLink {
  public:

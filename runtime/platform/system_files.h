@@ -17,7 +17,7 @@ std::string_view TakeLine(std::string_view& AText) noexcept;
 [[nodiscard]] std::string EnvironmentText(const char* AName);
 /// The user's home folder, without a separator at the end.
 [[nodiscard]] std::string HomeFolder();
-/// A base folder of the XDG Base Directory Specification: the variable's, if absolute, or AUsual below the home folder.
+/// A base folder of XDG: the variable's, if absolute, or AUsual below the home folder.
 [[nodiscard]] std::string XdgFolder(const char* AVariable, std::string_view AUsual);
 
 }  // namespace zq

@@ -45,13 +45,13 @@ void Futex(std::atomic<std::uint32_t>& AWord, int AOperation, std::uint32_t AVal
 
 }  // namespace
 
-Cardinal GetCurrentThreadId() noexcept { return MyThreadId(); }
+ZQ_HOT Cardinal GetCurrentThreadId() noexcept { return MyThreadId(); }
 
 Cardinal GetCurrentProcessId() noexcept { return static_cast<Cardinal>(::getpid()); }
 
 // As long as the process has one thread, which the system's library knows, a plain store does what else takes an atomic
 // exchange.
-bool TCriticalSection::Take(std::uint32_t AThread) noexcept {
+ZQ_HOT bool TCriticalSection::Take(std::uint32_t AThread) noexcept {
   std::uint32_t Free = 0;
   if (FOwner.load(std::memory_order_relaxed) != 0) return false;
   if (!__libc_single_threaded)
@@ -60,19 +60,19 @@ bool TCriticalSection::Take(std::uint32_t AThread) noexcept {
   return true;
 }
 
-bool TCriticalSection::TryEnter() noexcept {
+ZQ_HOT bool TCriticalSection::TryEnter() noexcept {
   const std::uint32_t Me = MyThreadId();
   if (FOwner.load(std::memory_order_relaxed) != Me && !Take(Me)) return false;
   ++FDepth;
   return true;
 }
 
-void TCriticalSection::Enter() noexcept {
+ZQ_HOT void TCriticalSection::Enter() noexcept {
   if (!TryEnter()) [[unlikely]]
     Wait(cForEver);
 }
 
-bool TCriticalSection::TryEnterFor(Cardinal AMilliseconds) noexcept { return TryEnter() || Wait(AMilliseconds); }
+ZQ_HOT bool TCriticalSection::TryEnterFor(Cardinal AMilliseconds) noexcept { return TryEnter() || Wait(AMilliseconds); }
 
 // Leave stores and then reads FSleepers without a full barrier between them, which keeps leaving cheap: a wake-up can
 // be missed when a thread lies down at that very moment. Sleeping in slices bounds what that costs.
@@ -95,7 +95,7 @@ bool TCriticalSection::TryEnterFor(Cardinal AMilliseconds) noexcept { return Try
   return Taken;
 }
 
-void TCriticalSection::Leave() noexcept {
+ZQ_HOT void TCriticalSection::Leave() noexcept {
   if (--FDepth != 0) return;
   FOwner.store(0, std::memory_order_release);
   if (FSleepers.load(std::memory_order_relaxed) != 0) Futex(FOwner, FUTEX_WAKE, 1, nullptr);
