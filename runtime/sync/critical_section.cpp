@@ -16,7 +16,7 @@ namespace {
 
 constexpr Cardinal cForEver = 0xFFFFFFFF;
 constexpr std::int64_t cSlice = 1'000'000;  // ns; see Wait
-constexpr int cSpins = 100;
+constexpr int cSpins = 400;
 
 // Initial-exec: one load relative to the thread pointer, where a shared library would otherwise make a call.
 __attribute__((tls_model("initial-exec"))) constinit thread_local std::uint32_t ThreadId = 0;
@@ -90,6 +90,7 @@ ZQ_HOT bool TCriticalSection::TryEnterFor(Cardinal AMilliseconds) noexcept { ret
     if (Owner == 0 || Left <= 0) continue;
     const timespec Timeout{0, static_cast<long>(Left)};
     Futex(FOwner, FUTEX_WAIT, Owner, &Timeout);
+    FWaking.store(false, std::memory_order_relaxed);
   }
   FSleepers.fetch_sub(1);
   return Taken;
@@ -98,7 +99,9 @@ ZQ_HOT bool TCriticalSection::TryEnterFor(Cardinal AMilliseconds) noexcept { ret
 ZQ_HOT void TCriticalSection::Leave() noexcept {
   if (--FDepth != 0) return;
   FOwner.store(0, std::memory_order_release);
-  if (FSleepers.load(std::memory_order_relaxed) != 0) Futex(FOwner, FUTEX_WAKE, 1, nullptr);
+  if (FSleepers.load(std::memory_order_relaxed) == 0 || FWaking.load(std::memory_order_relaxed)) return;
+  FWaking.store(true, std::memory_order_relaxed);
+  Futex(FOwner, FUTEX_WAKE, 1, nullptr);
 }
 
 }  // namespace zq

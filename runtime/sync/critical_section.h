@@ -41,7 +41,8 @@ class ZQ_API TCriticalSection {
 
   std::atomic<std::uint32_t> FOwner = 0;  // thread id, and the word that sleepers wait on; 0 when free
   std::atomic<std::uint32_t> FSleepers = 0;
-  std::uint32_t FDepth = 0;  // the owner's alone
+  std::atomic<bool> FWaking = false;  // a sleeper has been woken and hasn't run yet
+  std::uint32_t FDepth = 0;           // the owner's alone
 };
 
 /// Holds ALock, anything with Enter and Leave, for a scope.
