@@ -40,7 +40,7 @@ UnicodeString ZqExpandEnvVarsAndStrings(const UnicodeString& AText) {
 }
 
 UnicodeString ZqExpandFileName(const UnicodeString& AName) {
-  const UnicodeString Text = ZqExpandEnvVarsAndStrings(AName);
+  UnicodeString Text = ZqExpandEnvVarsAndStrings(AName);
   const UnicodeString Folder = ExtractFilePath(ParamStr(0));
   if (Text.IsEmpty() || !DirectoryExists(Folder)) return Text;
   return ExpandFileName(IsPathSeparator(Text[1]) ? Text : Folder + Text);
@@ -58,14 +58,14 @@ constexpr std::u16string_view cNoFileNameChars = u"\"*/:<>?\\|";
 }  // namespace
 
 UnicodeString ZqIncludeTrailingBackslash(const UnicodeString& ADir) {
-  const UnicodeString Dir = Trim(ADir);
+  UnicodeString Dir = Trim(ADir);
   if (EndsInSeparator(Dir)) return Dir;
   const bool IsPath = Dir.View().starts_with(u'\\') || Dir.View().find_first_of(u":/") != std::u16string_view::npos;
   return IsPath ? Dir + PathSeparatorOf(Dir) : Dir + u":\\";
 }
 
 UnicodeString ZqCheckDirSlash(const UnicodeString& ADir, bool AAddSlash) {
-  const UnicodeString Dir = Trim(ADir);
+  UnicodeString Dir = Trim(ADir);
   if (Dir.IsEmpty()) return Dir;
   return AAddSlash ? IncludeTrailingBackslash(Dir) : ExcludeTrailingBackslash(Dir);
 }
@@ -271,7 +271,7 @@ UnicodeString ZqGetShellFolder(Integer ACsidl) {
   UnicodeString Path;
   if (Shell.SHGetSpecialFolderPath(ACsidl, true, Path)) return Path;
   if (!Shell.SHGetMalloc()) return {};
-  const TItemList List = Shell.SHGetSpecialFolderLocation(ACsidl);
+  TItemList List = Shell.SHGetSpecialFolderLocation(ACsidl);
   const bool Found = Shell.SHGetPathFromIDList(List, Path);
   if (List != nullptr) Shell.FreeIDList(List);
   if (!Found) throw Exception(u"Invalid pidl");

@@ -172,24 +172,17 @@ INSTANTIATE_TEST_SUITE_P(Series, AppenderRollOver,
                 {"apple.log", "apple.log"}}}),
     [](const auto& AInfo) { return std::string(AInfo.param.Name); });
 
-struct TFileInfoCase {
-  const char* Name;
-  const char16_t* File;
-  Integer Index;
-  const char16_t* Right;
-};
-
 TEST(AppenderRolling, TakesNamesApart) {
   const IntfRef<IZqLogBase> Made(New<TZqRollingFileAppender>(Logger(), u"x"));
   auto& Rolling = dynamic_cast<TZqRollingFileAppender&>(*Made);
   Rolling.SetFileName(u"/l/app.log");
-  for (const TFileInfoCase& Case :
-      {TFileInfoCase{"", u"app.log", 0, u""}, {"", u"app.3.log", 3, u""}, {"", u"app.3.x.log", 3, u".x"},
-          {"", u"apple.log", 0, u"le"}, {"", u"app.x.log", 0, u""}, {"", u"app.007.log", 7, u""}}) {
-    const auto Info = Rolling.CreateFileInfo(Case.File);
+  const std::tuple<const char16_t*, Integer, const char16_t*> cCases[] = {{u"app.log", 0, u""}, {u"app.3.log", 3, u""},
+      {u"app.3.x.log", 3, u".x"}, {u"apple.log", 0, u"le"}, {u"app.x.log", 0, u""}, {u"app.007.log", 7, u""}};
+  for (const auto& [File, Index, Right] : cCases) {
+    const auto Info = Rolling.CreateFileInfo(File);
     EXPECT_EQ(Info->FileNameLeft, u"app");
-    EXPECT_EQ(Info->Index, Case.Index) << UnicodeString(Case.File).ToUTF8();
-    EXPECT_EQ(Info->FileNameRight, Case.Right) << UnicodeString(Case.File).ToUTF8();
+    EXPECT_EQ(Info->Index, Index) << UnicodeString(File).ToUTF8();
+    EXPECT_EQ(Info->FileNameRight, Right) << UnicodeString(File).ToUTF8();
   }
 }
 

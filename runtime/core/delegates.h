@@ -26,6 +26,7 @@ class TMethod<R(TArgs...)> {
   template <class TCallable>
     requires(!std::same_as<std::remove_cvref_t<TCallable>, TMethod> &&
              std::is_invocable_r_v<R, std::remove_cvref_t<TCallable>&, TArgs...>)
+  // NOLINTNEXTLINE(bugprone-forwarding-reference-overload): the constraint leaves copies and moves alone
   TMethod(TCallable&& ACallable)
       : FOps(&TShared<std::remove_cvref_t<TCallable>>::Ops),
         FData(new TShared<std::remove_cvref_t<TCallable>>(std::forward<TCallable>(ACallable))) {}
@@ -85,8 +86,7 @@ class TMethod<R(TArgs...)> {
 
   template <class TCallable>
   struct TShared {
-    template <class T>
-    explicit TShared(T&& ACallable) : Callable(std::forward<T>(ACallable)) {}
+    explicit TShared(TCallable ACallable) : Callable(std::move(ACallable)) {}
     static R Call(void* AData, TArgs... AArgs) {
       return std::invoke(static_cast<TShared*>(AData)->Callable, std::forward<TArgs>(AArgs)...);
     }

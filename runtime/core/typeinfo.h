@@ -264,7 +264,7 @@ template <class S>
 constexpr TTypeStorage MakeStorage() noexcept {
   TTypeStorage Result;
   if constexpr (std::is_object_v<S> && !std::is_array_v<S>) {
-    Result.Size = sizeof(S);
+    Result.Size = sizeof(S);  // NOLINT(bugprone-sizeof-expression): a TObject* is stored as such
     Result.Alignment = alignof(S);
     if constexpr (std::default_initializable<S>) Result.Init = [](void* ADest) { new (ADest) S(); };
     if constexpr (std::copy_constructible<S> && std::is_nothrow_move_constructible_v<S>) {

@@ -30,7 +30,7 @@ struct TVarAccess {
   static Variant Make(TVarType AType, TData AData) noexcept { return {AType, AData}; }
   static Variant Make(TVarType AType, UnicodeString AText) { return {AType, std::move(AText)}; }
   static Variant Make(TVarType AType, RawByteString ABytes) { return {AType, std::move(ABytes)}; }
-  static Variant Make(TVarType AType, IntfRef<IInterface> AIntf) noexcept { return {AType, std::move(AIntf)}; }
+  static Variant Make(TVarType AType, const IntfRef<IInterface>& AIntf) noexcept { return {AType, AIntf}; }
 };
 
 }  // namespace detail
@@ -129,7 +129,8 @@ T ToWhole(const Variant& AValue, std::u16string_view AWanted) {
 
 // ---- Variant --------------------------------------------------------------------------------------------------------
 
-Variant::Variant(TVarType AType, IntfRef<IInterface> AIntf) noexcept : Variant(AType, TData{.Intf = AIntf.Get()}) {
+Variant::Variant(TVarType AType, const IntfRef<IInterface>& AIntf) noexcept
+    : Variant(AType, TData{.Intf = AIntf.Get()}) {
   if (FData.Intf != nullptr) FData.Intf->_AddRef();
 }
 

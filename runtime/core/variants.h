@@ -113,7 +113,7 @@ class ZQ_API Variant {
   template <detail::TWholeNumber T>
   Variant(T AValue) noexcept : FType(detail::VarTypeOf<T>()) {
     if constexpr (std::same_as<T, bool>) FData.Int = AValue ? -1 : 0;
-    else FData.Int = static_cast<Int64>(AValue);
+    else FData.Int = static_cast<Int64>(AValue);  // NOLINT(bugprone-signed-char-misuse): ShortInt is a number
   }
   template <std::floating_point T>
   Variant(T AValue) noexcept
@@ -160,7 +160,7 @@ class ZQ_API Variant {
   [[nodiscard]] const Variant& operator[](Integer AIndex) const;
 
   friend ZQ_API std::partial_ordering operator<=>(const Variant& A, const Variant& B);
-  friend bool operator==(const Variant& A, const Variant& B) { return (A <=> B) == 0; }
+  friend bool operator==(const Variant& A, const Variant& B) { return std::is_eq(A <=> B); }
 
  private:
   friend struct detail::TVarAccess;
@@ -178,7 +178,7 @@ class ZQ_API Variant {
   Variant(TVarType AType, UnicodeString&& AText) : Variant(AType, TData{.Text = new UnicodeString(std::move(AText))}) {}
   Variant(TVarType AType, RawByteString&& ABytes)
       : Variant(AType, TData{.Bytes = new RawByteString(std::move(ABytes))}) {}
-  Variant(TVarType AType, IntfRef<IInterface> AIntf) noexcept;
+  Variant(TVarType AType, const IntfRef<IInterface>& AIntf) noexcept;
 
   [[nodiscard]] bool Owns() const noexcept {
     return FType >= varString || FType == varOleStr || FType == varUnknown || FType == varDispatch;

@@ -60,7 +60,7 @@ class TLinuxClock : public TClockService {
 
 }  // namespace
 
-ZQ_HOT std::atomic<TClockService*>& ServiceSlot(const TClockService*) noexcept {
+ZQ_HOT std::atomic<TClockService*>& ServiceSlot(const TClockService*) {
   static std::atomic<TClockService*> Slot{new TLinuxClock};
   return Slot;
 }

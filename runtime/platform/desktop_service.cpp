@@ -11,7 +11,7 @@ class TLinuxDesktop : public TDesktopService {
 
 }  // namespace
 
-std::atomic<TDesktopService*>& ServiceSlot(const TDesktopService*) noexcept {
+std::atomic<TDesktopService*>& ServiceSlot(const TDesktopService*) {
   static std::atomic<TDesktopService*> Slot{new TLinuxDesktop};
   return Slot;
 }

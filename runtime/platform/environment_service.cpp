@@ -21,7 +21,7 @@ class TLinuxEnvironment : public TEnvironmentService {
 
 }  // namespace
 
-std::atomic<TEnvironmentService*>& ServiceSlot(const TEnvironmentService*) noexcept {
+std::atomic<TEnvironmentService*>& ServiceSlot(const TEnvironmentService*) {
   static std::atomic<TEnvironmentService*> Slot{new TLinuxEnvironment};
   return Slot;
 }

@@ -54,7 +54,7 @@ class TLinuxFiles : public TFileService {
     const std::string Folders = ToSystemPath(ExtractFileDir(ParamStr(0))) + ':' + EnvironmentText("PATH");
     for (std::string_view Rest = Folders; !Rest.empty();) {
       const std::string_view Folder = Rest.substr(0, Rest.find(':'));
-      const UnicodeString Name = FromSystemPath(Folder) + u'/' + AName;
+      UnicodeString Name = FromSystemPath(Folder) + u'/' + AName;
       if (!Folder.empty() && FileExists(Name)) return Name;
       Rest.remove_prefix(std::min(Folder.size() + 1, Rest.size()));
     }
@@ -64,7 +64,7 @@ class TLinuxFiles : public TFileService {
 
 }  // namespace
 
-std::atomic<TFileService*>& ServiceSlot(const TFileService*) noexcept {
+std::atomic<TFileService*>& ServiceSlot(const TFileService*) {
   static std::atomic<TFileService*> Slot{new TLinuxFiles};
   return Slot;
 }

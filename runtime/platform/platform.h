@@ -19,16 +19,16 @@ class TVersionService;
 
 /// Where the current service of a seam is kept. Each stands in the .cpp of its seam and begins with the Linux feeder,
 /// which lives to the end of the process.
-ZQ_API std::atomic<TClockService*>& ServiceSlot(const TClockService*) noexcept;
-ZQ_API std::atomic<TDesktopService*>& ServiceSlot(const TDesktopService*) noexcept;
-ZQ_API std::atomic<TEnvironmentService*>& ServiceSlot(const TEnvironmentService*) noexcept;
-ZQ_API std::atomic<TFileService*>& ServiceSlot(const TFileService*) noexcept;
-ZQ_API std::atomic<TProcessFacts*>& ServiceSlot(const TProcessFacts*) noexcept;
-ZQ_API std::atomic<TRegistryService*>& ServiceSlot(const TRegistryService*) noexcept;
-ZQ_API std::atomic<TResourceService*>& ServiceSlot(const TResourceService*) noexcept;
-ZQ_API std::atomic<TShellService*>& ServiceSlot(const TShellService*) noexcept;
-ZQ_API std::atomic<TUserService*>& ServiceSlot(const TUserService*) noexcept;
-ZQ_API std::atomic<TVersionService*>& ServiceSlot(const TVersionService*) noexcept;
+ZQ_API std::atomic<TClockService*>& ServiceSlot(const TClockService*);
+ZQ_API std::atomic<TDesktopService*>& ServiceSlot(const TDesktopService*);
+ZQ_API std::atomic<TEnvironmentService*>& ServiceSlot(const TEnvironmentService*);
+ZQ_API std::atomic<TFileService*>& ServiceSlot(const TFileService*);
+ZQ_API std::atomic<TProcessFacts*>& ServiceSlot(const TProcessFacts*);
+ZQ_API std::atomic<TRegistryService*>& ServiceSlot(const TRegistryService*);
+ZQ_API std::atomic<TResourceService*>& ServiceSlot(const TResourceService*);
+ZQ_API std::atomic<TShellService*>& ServiceSlot(const TShellService*);
+ZQ_API std::atomic<TUserService*>& ServiceSlot(const TUserService*);
+ZQ_API std::atomic<TVersionService*>& ServiceSlot(const TVersionService*);
 
 /// The services of the system: the Linux ones, unless a TPlatformOverride has put another in. Any thread.
 class TPlatform {

@@ -30,7 +30,7 @@ class TLinuxProcess : public TProcessFacts {
 
 }  // namespace
 
-std::atomic<TProcessFacts*>& ServiceSlot(const TProcessFacts*) noexcept {
+std::atomic<TProcessFacts*>& ServiceSlot(const TProcessFacts*) {
   static std::atomic<TProcessFacts*> Slot{new TLinuxProcess};
   return Slot;
 }

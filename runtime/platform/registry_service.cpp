@@ -99,7 +99,7 @@ class TLinuxRegistry : public TRegistryService {
 
 }  // namespace
 
-std::atomic<TRegistryService*>& ServiceSlot(const TRegistryService*) noexcept {
+std::atomic<TRegistryService*>& ServiceSlot(const TRegistryService*) {
   static std::atomic<TRegistryService*> Slot{new TLinuxRegistry};
   return Slot;
 }

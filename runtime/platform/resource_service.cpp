@@ -72,7 +72,7 @@ class TLinuxResources : public TResourceService {
 
 HINST HInstance() noexcept { return ModuleAt(reinterpret_cast<const void*>(&HInstance)).dli_fbase; }
 
-std::atomic<TResourceService*>& ServiceSlot(const TResourceService*) noexcept {
+std::atomic<TResourceService*>& ServiceSlot(const TResourceService*) {
   static std::atomic<TResourceService*> Slot{new TLinuxResources};
   return Slot;
 }

@@ -113,18 +113,18 @@ bool MoveIntoTrash(const std::string& ATrash, const std::string& APath, const st
   std::filesystem::permissions(ATrash, std::filesystem::perms::owner_all, Ignored);
   const TDateTime Moment = Now();
   const std::string Info = "[Trash Info]\nPath=" + PercentEncoded(ARecorded) +
-                           "\nDeletionDate=" + FormatDateTime(u"yyyy-mm-dd", Moment).ToUTF8() + 'T' +
-                           FormatDateTime(u"hh:mm:ss", Moment).ToUTF8() + '\n';
+                           "\nDeletionDate=" + FormatDateTime(u"yyyy-mm-dd\"T\"hh:mm:ss", Moment).ToUTF8() + '\n';
   const std::string Name = APath.substr(APath.rfind('/') + 1);
   for (int Number = 1; Number < 10000; ++Number) {
-    const std::string Unique = Number == 1 ? Name : Name + '.' + std::to_string(Number);
-    const std::string InfoFile = ATrash + "/info/" + Unique + ".trashinfo";
+    const std::string Unique = Number == 1 ? Name : std::string(Name).append(".").append(std::to_string(Number));
+    const std::string InfoFile = std::string(ATrash).append("/info/").append(Unique).append(".trashinfo");
     const int Handle = ::open(InfoFile.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
     if (Handle < 0 && errno == EEXIST) continue;
     if (Handle < 0) return false;
     const bool Written = ::write(Handle, Info.data(), Info.size()) == static_cast<ssize_t>(Info.size());
-    const bool Done = ::close(Handle) == 0 && Written &&
-                      RenameFile(FromSystemPath(APath), FromSystemPath(ATrash + "/files/" + Unique));
+    const bool Done =
+        ::close(Handle) == 0 && Written &&
+        RenameFile(FromSystemPath(APath), FromSystemPath(std::string(ATrash).append("/files/").append(Unique)));
     if (Done) return true;
     const int Reason = errno;
     ::unlink(InfoFile.c_str());
@@ -334,7 +334,7 @@ class TLinuxShell : public TShellService {
 
 }  // namespace
 
-std::atomic<TShellService*>& ServiceSlot(const TShellService*) noexcept {
+std::atomic<TShellService*>& ServiceSlot(const TShellService*) {
   static std::atomic<TShellService*> Slot{new TLinuxShell};
   return Slot;
 }

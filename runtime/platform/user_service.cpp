@@ -49,7 +49,7 @@ class TLinuxUsers : public TUserService {
 
 }  // namespace
 
-std::atomic<TUserService*>& ServiceSlot(const TUserService*) noexcept {
+std::atomic<TUserService*>& ServiceSlot(const TUserService*) {
   static std::atomic<TUserService*> Slot{new TLinuxUsers};
   return Slot;
 }

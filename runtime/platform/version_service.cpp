@@ -29,7 +29,7 @@ class TLinuxVersion : public TVersionService {
 
 }  // namespace
 
-std::atomic<TVersionService*>& ServiceSlot(const TVersionService*) noexcept {
+std::atomic<TVersionService*>& ServiceSlot(const TVersionService*) {
   static std::atomic<TVersionService*> Slot{new TLinuxVersion};
   return Slot;
 }

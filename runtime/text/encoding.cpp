@@ -1,7 +1,6 @@
 #include "runtime/text/encoding.h"
 
 #include <langinfo.h>
-#include <locale.h>
 #include <unicode/ucnv.h>
 #include <unicode/ucnv_cb.h>
 #include <unicode/unorm2.h>
@@ -9,6 +8,7 @@
 #include <algorithm>
 #include <array>
 #include <atomic>
+#include <clocale>
 #include <cstring>
 #include <limits>
 #include <span>

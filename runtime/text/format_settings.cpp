@@ -1,9 +1,9 @@
 #include "runtime/text/format_settings.h"
 
 #include <langinfo.h>
-#include <locale.h>
 
 #include <climits>
+#include <clocale>
 #include <cstdlib>
 #include <mutex>
 #include <span>
