@@ -1,15 +1,12 @@
 #include <gtest/gtest.h>
 
-#include <array>
+#include <future>
 #include <latch>
 #include <limits>
-#include <memory>
 #include <set>
 #include <string>
-#include <thread>
 #include <tuple>
 #include <utility>
-#include <vector>
 
 #include "runtime/core/typeinfo.h"
 #include "runtime/core/values.h"
@@ -23,7 +20,6 @@ using TColours = TSet<TColour>;
 struct TPair {
   UnicodeString Text;
   double Number;
-  Integer Rest;
 };
 struct IShape : Extends<IInterface> {
   static constexpr TGUID IID = "{0B7B1E0C-0C2E-4D52-8DE5-1E5D3E2B7E61}"_guid;
@@ -69,6 +65,8 @@ struct TypeInfoOfClass : testing::Test {
       return u"Dr " + A.Name;
     });
   }
+  TCustomer Customer;
+  TVip Vip;
   static std::string Names(const TObject& AObject) {
     std::string Result;
     for (const PPropInfo Property : GetPropList(&AObject)) Result += Property->Name.ToUTF8() + ' ';
@@ -78,21 +76,18 @@ struct TypeInfoOfClass : testing::Test {
 
 TEST(TypeInfo, KindAndNameFollowTheCxxType) {
   const std::tuple<PTypeInfo, TTypeKind, const char16_t*> Cases[] = {{TypeInfo<NativeInt>(), tkInt64, u"NativeInt"},
-      {TypeInfo<AnsiChar>(), tkChar, u"AnsiChar"}, {TypeInfo<bool>(), tkEnumeration, u"Boolean"},
-      {TypeInfo<TPair>(), tkRecord, u"TPair"}, {TypeInfo<TDateTime>(), tkFloat, u"TDateTime"},
+      {TypeInfo<bool>(), tkEnumeration, u"Boolean"}, {TypeInfo<TDateTime>(), tkFloat, u"TDateTime"},
       {TypeInfo<UnicodeString>(), tkUString, u"string"}, {TypeInfo<RawByteString>(), tkLString, u"RawByteString"},
-      {TypeInfo<ShortString>(), tkString, u"ShortString"}, {TypeInfo<TColours>(), tkSet, nullptr},
-      {TypeInfo<IntfRef<IShape>>(), tkInterface, u"IShape"},
+      {TypeInfo<TPair>(), tkRecord, u"TPair"}, {TypeInfo<IntfRef<IShape>>(), tkInterface, u"IShape"},
       {TypeInfo<TArray<Byte>>(), tkDynArray, u"TArray<System.Byte>"}, {TypeInfo<int[3]>(), tkArray, nullptr},
       {TypeInfo<TArray<UnicodeString>>(), tkDynArray, u"TStringDynArray"}, {TypeInfo<void>(), tkUnknown, nullptr},
       {TypeInfo<TMethod<void()>>(), tkMethod, nullptr}, {TypeInfo<ExceptionClass>(), tkClassRef, nullptr},
-      {TypeInfo<Pointer>(), tkPointer, u"Pointer"}, {TypeInfo<void (*)(int)>(), tkProcedure, nullptr}};
+      {TypeInfo<TColours>(), tkSet, nullptr}, {TypeInfo<void (*)(int)>(), tkProcedure, nullptr}};
   for (const auto& [Type, Kind, Name] : Cases) {
     EXPECT_EQ(Type->Kind, Kind) << Type->Name.ToUTF8();
     EXPECT_EQ(Type->Name, Name == nullptr ? Type->Name : Name);
   }
-  EXPECT_NE(TypeInfo<NativeInt>(), TypeInfo<Int64>());
-  EXPECT_EQ(TypeInfo<TShape*>(), TypeInfo<TShape>());
+  EXPECT_TRUE(TypeInfo<NativeInt>() != TypeInfo<Int64>() && TypeInfo<TShape*>() == TypeInfo<TShape>());
   EXPECT_EQ(GetTypeData(TypeInfo<int[3]>())->ElementType, TypeInfo<Integer>());
   EXPECT_EQ(GetTypeData(TypeInfo<TColours>())->ElementType, TypeInfo<TColour>());
 }
@@ -107,20 +102,17 @@ std::set<PTypeInfo> AskForAll(std::integer_sequence<int, N...>) {
 TEST(ThreadTypeInfo, FirstQuestionsFromTwoThreadsGetOneRecord) {
   constexpr auto cAll = std::make_integer_sequence<int, 100>();
   std::latch Start(2);
-  std::set<PTypeInfo> Forwards;
-  std::jthread Thread([&] {
+  const auto Ask = [&](auto ABackwards) {
     Start.arrive_and_wait();
-    Forwards = AskForAll<false>(cAll);
-  });
-  Start.arrive_and_wait();
-  const std::set<PTypeInfo> Backwards = AskForAll<true>(cAll);
-  Thread.join();
+    return AskForAll<ABackwards()>(cAll);
+  };
+  auto Other = std::async(std::launch::async, Ask, std::false_type());
+  const std::set<PTypeInfo> Backwards = Ask(std::true_type()), Forwards = Other.get();
   EXPECT_EQ(Forwards, Backwards);
   EXPECT_EQ(Forwards.size(), 100U);
 }
 
 TEST_F(TypeInfoOfClass, PropertiesComeInOrderWithTheAncestorsFirst) {
-  TVip Vip;
   EXPECT_EQ(Names(Vip), "NAME Rating Colour Colours Active Partner Shape Secret Grade ");
   EXPECT_EQ(Names(TUndescribed()), "Name Rating Colour Colours Active Partner Shape Secret ");
   Vip.Name = u"Who";
@@ -132,7 +124,6 @@ TEST_F(TypeInfoOfClass, PropertiesComeInOrderWithTheAncestorsFirst) {
 }
 
 TEST_F(TypeInfoOfClass, PropertiesAreReadAndWrittenByKind) {
-  TCustomer Customer;
   const std::tuple<const char16_t*, Variant, Variant, Variant> Cases[] = {{u"Name", 12, u"12", u"12"},
       {u"Rating", u"7", 7, 7}, {u"Colour", u"CBLUE", 3, u"cBlue"}, {u"Colour", 1, 1, u"cGreen"},
       {u"Colours", u"[cRed, cBlue]", 9, u"cRed,cBlue"}, {u"Colours", 2, 2, u"cGreen"},
@@ -143,9 +134,8 @@ TEST_F(TypeInfoOfClass, PropertiesAreReadAndWrittenByKind) {
     EXPECT_EQ(VarType(GetPropValue(&Customer, Name, false)), VarType(Read));
     EXPECT_EQ(GetPropValue(&Customer, Name), Preferred);
   }
-  TUndescribed Partner;
-  SetPropValue(&Customer, u"Partner", &Partner);
-  EXPECT_EQ(GetObjectProp(&Customer, u"Partner"), &Partner);
+  SetPropValue(&Customer, u"Partner", &Vip);
+  EXPECT_EQ(GetObjectProp(&Customer, u"Partner"), &Vip);
   SetPropValue(&Customer, u"Shape", IntfRef<IInterface>(New<TShape>()));
   EXPECT_EQ(Customer.Shape->Corners(), 3);
   SetPropValue(&Customer, u"Secret", 42);
@@ -153,8 +143,6 @@ TEST_F(TypeInfoOfClass, PropertiesAreReadAndWrittenByKind) {
 }
 
 TEST_F(TypeInfoOfClass, WhatAPropertyCannotTakeOrGiveIsRefused) {
-  TCustomer Customer;
-  TVip Vip;
   EAbort Stranger(u"x");
   EXPECT_THROW(SetPropValue(&Customer, u"Rating", -1), EInvalidOperation) << "the setter's own";
   EXPECT_THROW(SetPropValue(&Customer, u"Rating", u"abc"), EVariantTypeCast);
@@ -169,17 +157,13 @@ TEST_F(TypeInfoOfClass, WhatAPropertyCannotTakeOrGiveIsRefused) {
 }
 
 TEST_F(TypeInfoOfClass, EnumerationsAndSetsHaveNames) {
-  const PTypeInfo Colour = TypeInfo<TColour>();
-  EXPECT_EQ(GetEnumName(Colour, 3), u"cBlue");
-  EXPECT_EQ(GetEnumName(Colour, 2), u"2");
-  EXPECT_EQ(GetEnumName(TypeInfo<WordBool>(), -1), u"True");
+  const PTypeInfo Colour = TypeInfo<TColour>(), Set = TypeInfo<TColours>();
+  EXPECT_EQ(GetEnumName(Colour, 3) + GetEnumName(Colour, 2) + GetEnumName(TypeInfo<WordBool>(), -1), u"cBlue2True");
   EXPECT_EQ(GetEnumValue(Colour, u"CGREEN"), 1);
   const std::tuple<const char16_t*, Integer, const char16_t*> Cases[] = {
       {u"", 0, u"[]"}, {u" [ ] ", 0, u"[]"}, {u"cBlue, cred", 9, u"[cRed,cBlue]"}, {u"[cGreen]", 2, u"[cGreen]"}};
-  for (const auto& [Text, Bits, Written] : Cases) {
-    EXPECT_EQ(StringToSet(TypeInfo<TColours>(), Text), Bits);
-    EXPECT_EQ(SetToString(TypeInfo<TColours>(), Bits, true), Written);
-  }
+  for (const auto& [Text, Bits, Written] : Cases)
+    EXPECT_TRUE(StringToSet(Set, Text) == Bits && SetToString(Set, Bits, true) == Written) << ToUTF8(Text);
   EXPECT_THROW(static_cast<void>(StringToSet(Colour, u"cRed,,cBlue")), EPropertyError);
 }
 
@@ -187,11 +171,10 @@ TEST_F(TypeInfoOfClass, TypesAreFoundByQualifiedName) {
   const TRttiContext Context;
   EXPECT_EQ(Context.FindType(u"System.TDatetime"), Context.GetType(TypeInfo<TDateTime>()));
   EXPECT_EQ(Context.FindType(u"uShop.TCustomer")->GetHandle(), TypeInfo<TCustomer>());
-  EXPECT_EQ(Context.FindType(u"TCustomer"), nullptr);
   EXPECT_FALSE(Context.GetType(TypeInfo<TPair>())->GetIsPublicType());
   DescribeType<TNumbered<-1>>(u"uOld", u"TOne");
   DescribeType<TNumbered<-1>>(u"uNew", u"TTwo");
-  EXPECT_EQ(Context.FindType(u"uOld.TOne"), nullptr);
+  for (const char16_t* Name : {u"TCustomer", u"uOld.TOne"}) EXPECT_EQ(Context.FindType(Name), nullptr);
   EXPECT_EQ(Context.FindType(u"uNew.TTwo")->GetHandle(), TypeInfo<TNumbered<-1>>());
   RegisterClass<TShape>();
   EXPECT_EQ(GetClass(u"tshape"), ClassOf<TShape>());
@@ -202,20 +185,20 @@ TEST_F(TypeInfoOfClass, TypesAreFoundByQualifiedName) {
 class Values : public TypeInfoOfClass {};  // with its descriptions
 
 TEST_F(Values, ValuesOfEverySizeSurviveCopyAndMove) {
-  struct alignas(64) TWide : std::array<double, 8> {};
-  const TPair Pair{u"a text too long for any short string buffer", 2.5, 3};
-  TValue Value = TValue::From(Pair), Other = TValue::From(TWide{{1, 2, 3}});
+  struct alignas(64) TWide : TPair {};
+  const TPair Pair{u"a text too long for any short string buffer", 2.5};
+  TValue Value = TValue::From(Pair), Other = TValue::From(TWide{Pair});
   EXPECT_EQ(reinterpret_cast<std::uintptr_t>(Other.GetReferenceToRawData()) % 64, 0U);
   const TValue Copy = Value;
   std::swap(Value, Other);
-  EXPECT_EQ(Value.AsType<TWide>()[2], 3);
+  EXPECT_EQ(Value.AsType<TWide>().Number, 2.5);
   Other = TValue::From(AnsiString("a text too long for any short string buffer"));
   EXPECT_EQ(Copy.AsType<TPair>().Text, Pair.Text);
   Other = Copy;
   Value = std::move(Other);
   EXPECT_EQ(Value.AsType<TPair>().Number, 2.5);
-  EXPECT_EQ(TValue::Make(&Pair, TypeInfo<TPair>()).AsType<TPair>().Rest, 3);
-  EXPECT_THROW(static_cast<void>(TValue::Make(nullptr, TypeInfo<std::unique_ptr<int>>())), EInvalidCast);
+  EXPECT_EQ(TValue::Make(&Pair, TypeInfo<TPair>()).AsType<TPair>().Text, Pair.Text);
+  EXPECT_THROW(static_cast<void>(TValue::Make(nullptr, TypeInfo<std::future<int>>())), EInvalidCast);
   EXPECT_EQ(TValue::From(0.1L).AsExtended(), 0.1L) << "through a double it is another number";
 }
 
@@ -223,14 +206,14 @@ TEST_F(Values, ValuesAreReadAsWhatTheyAreOnly) {
   constexpr UInt64 cHigh = std::numeric_limits<UInt64>::max();
   EXPECT_EQ(static_cast<UInt64>(TValue::From(cHigh).AsInt64()), cHigh);
   EXPECT_EQ(TValue::From(cHigh).AsExtended(), 18446744073709551615.0L);
-  EXPECT_EQ(TValue::From('\xE9').AsOrdinal(), 0xE9);
-  EXPECT_EQ(TValue::From(Variant(u"12")).AsInteger(), 12);
   const TValue Refused[] = {
       TValue(), TValue::From(2.0), TValue::From(UnicodeString(u"2")), TValue::From(TPair{}), TValue::From(4000000000U)};
   for (const TValue& Value : Refused) EXPECT_THROW(std::ignore = Value.AsInteger(), EInvalidCast);
   EXPECT_THROW(std::ignore = TValue::From(1).AsBoolean(), EInvalidCast);
   EXPECT_THROW(std::ignore = TValue::From(1).AsString(), EInvalidCast);
   EXPECT_THROW(std::ignore = TValue::From(TPair{}).AsVariant(), EInvalidCast);
+  EXPECT_EQ(TValue::From('\xE9').AsOrdinal(), 0xE9);
+  EXPECT_EQ(TValue::From(Variant(u"12")).AsInteger(), 12);
   EXPECT_EQ(TValue::Make(300, TypeInfo<Byte>()).AsInteger(), 44);
   EXPECT_TRUE(TValue::Make(2, TypeInfo<bool>()).AsBoolean());
   EXPECT_TRUE(TValue::Make(9, TypeInfo<TColours>()).AsType<TColours>() == TColours({TColour::Red, TColour::Blue}));
@@ -238,7 +221,6 @@ TEST_F(Values, ValuesAreReadAsWhatTheyAreOnly) {
 }
 
 TEST_F(Values, CastsKeepTheValueOrRefuse) {
-  TVip Vip;
   EXPECT_EQ(TValue::From(200).AsType<Byte>(), 200);
   EXPECT_EQ(TValue::From(AnsiString("ab")).AsType<WideString>(), u"ab");
   EXPECT_EQ(TValue::From(Variant(u"2.5")).AsType<UnicodeString>(), u"2.5");
@@ -254,7 +236,6 @@ TEST_F(Values, CastsKeepTheValueOrRefuse) {
 }
 
 TEST_F(Values, ToStringIsForReaders) {
-  TVip Vip;
   const std::pair<TValue, const char16_t*> Cases[] = {{TValue::From<TVip*>(nullptr), u"(empty)"},
       {TValue::From(&Vip), u"TVip"}, {TValue::From(TColour::Green), u"cGreen"}, {TValue::From(true), u"True"},
       {TValue::From(TColours{TColour::Red, TColour::Blue}), u"[cRed,cBlue]"}, {TValue::From(TPair{}), u"(TPair)"},
@@ -266,11 +247,10 @@ TEST_F(Values, ToStringIsForReaders) {
 TEST_F(Values, VariantsUnpackToTheTypeOfTheirContent) {
   auto* const Object = New<TShape>();
   const IntfRef<IShape> Held(Object);
-  {
-    const TValue Value = TValue::FromVariant(IntfRef<IInterface>(Object)), Copy = Value;
-    EXPECT_EQ(Object->RefCount(), 3);
-    EXPECT_EQ(Copy.AsType<IntfRef<IShape>>(), Held);
-  }
+  TValue Value = TValue::FromVariant(IntfRef<IInterface>(Object)), Copy = Value;
+  EXPECT_EQ(Object->RefCount(), 3);
+  EXPECT_EQ(Copy.AsType<IntfRef<IShape>>(), Held);
+  Value = Copy = TValue();
   EXPECT_EQ(Object->RefCount(), 1);
   EXPECT_EQ(TValue::FromVariant(Word{5}).GetTypeInfo(), TypeInfo<Word>());
   EXPECT_TRUE(TValue::FromVariant(Null()).IsEmpty());

@@ -96,12 +96,13 @@ ZQ_HOT bool TCriticalSection::TryEnterFor(Cardinal AMilliseconds) noexcept { ret
   return Taken;
 }
 
+// Nothing of the lock is touched once it is free: whoever takes it next may destroy it.
 ZQ_HOT void TCriticalSection::Leave() noexcept {
   if (--FDepth != 0) return;
+  const bool Wakes = FSleepers.load(std::memory_order_relaxed) != 0 && !FWaking.load(std::memory_order_relaxed);
+  if (Wakes) FWaking.store(true, std::memory_order_relaxed);
   FOwner.store(0, std::memory_order_release);
-  if (FSleepers.load(std::memory_order_relaxed) == 0 || FWaking.load(std::memory_order_relaxed)) return;
-  FWaking.store(true, std::memory_order_relaxed);
-  Futex(FOwner, FUTEX_WAKE, 1, nullptr);
+  if (Wakes) Futex(FOwner, FUTEX_WAKE, 1, nullptr);
 }
 
 }  // namespace zq
