@@ -151,9 +151,9 @@ void TZqObjectAdapter::BeforeDestruction() {
 
 TZqComponent::~TZqComponent() { ClearBindings(); }
 
-ZQ_HOT Integer TZqComponent::_AddRef() { return FCount.Up(Owner() == nullptr); }
+Integer TZqComponent::_AddRef() { return FCount.Up(Owner() == nullptr); }
 
-ZQ_HOT Integer TZqComponent::_Release() {
+Integer TZqComponent::_Release() {
   const bool Ends = FCount.State() == radTrue;  // asked first, as in TZqObject
   const Integer Result = FCount.Down();
   if (Result == 0 && Ends && !ComponentState().Contains(csDestroying)) Free();

@@ -17,6 +17,12 @@ constexpr Word cVista = 601;
 constexpr Integer cCommonDocuments = 46;
 constexpr std::size_t cKeptLine = 1 << 16;  // bytes
 
+TZqSimpleLayout* ExactlySimple(const IntfRef<IZqLogLayout>& ALayout) {
+  TComponent* const Component = ALayout ? ALayout->Component() : nullptr;
+  const bool Simple = Component != nullptr && Component->ClassType() == ClassOf<TZqSimpleLayout>();
+  return Simple ? static_cast<TZqSimpleLayout*>(Component) : nullptr;
+}
+
 }  // namespace
 
 // ---------------------------------------------------------------------------------------- TZqBaseAppender
@@ -38,7 +44,7 @@ void TZqBaseAppender::Initialize() { FInitialized = true; }
 
 void TZqBaseAppender::Close() { FInitialized = false; }
 
-ZQ_HOT void TZqBaseAppender::Write(
+void TZqBaseAppender::Write(
     const UnicodeString&, const UnicodeString&, TZqLogLevel, const UnicodeString&, PZqDataRec, TZqLogIndent) {
   if (!FInitialized) Initialize();
 }
@@ -63,7 +69,7 @@ TZqTextFile::TZqTextFile(const TFileName& AFileName) {
   const bool Existed = FileExists(AFileName);
   ForceDirectories(ExtractFileDir(AFileName));  // a folder that can't be made shows at the open
   FFile.Assign(AFileName, 65001);
-  if (Existed) FSize = std::max<Int64>(FileSizeOf(AFileName), 0);
+  if (Existed) FFound = std::max<Int64>(FileSizeOf(AFileName), 0);
   FFile.AppendOrCreate();
 }
 
@@ -75,32 +81,22 @@ TZqTextFile::~TZqTextFile() {
 }
 
 ZQ_HOT Cardinal TZqTextFile::Size() const {
-  return static_cast<Cardinal>(std::clamp<Int64>(FSize.load(), 0, std::numeric_limits<Cardinal>::max()));
-}
-
-// Counts also what a failed step has brought into the file.
-template <class TStep>
-ZQ_HOT void TZqTextFile::Counting(TStep AStep) {
-  const TLockScope Scope(FCritSect);
-  struct TCount {
-    ~TCount() { Size.store(Before + File.Written(), std::memory_order_relaxed); }
-    std::atomic<Int64>& Size;
-    const TTextFile& File;
-    Int64 Before;
-  } const Count{FSize, FFile, FSize.load(std::memory_order_relaxed) - FFile.Written()};
-  AStep();
+  return static_cast<Cardinal>(std::clamp<Int64>(FFound + FFile.Written(), 0, std::numeric_limits<Cardinal>::max()));
 }
 
 void TZqTextFile::Write(const UnicodeString& AValue) {
-  Counting([&] { FFile.Write(AValue); });
+  const TLockScope Scope(FCritSect);
+  FFile.Write(AValue);
 }
 
-ZQ_HOT void TZqTextFile::WriteLn(const UnicodeString& AValue) {
-  Counting([&] { FFile.WriteLn(AValue); });
+void TZqTextFile::WriteLn(const UnicodeString& AValue) {
+  const TLockScope Scope(FCritSect);
+  FFile.WriteLn(AValue);
 }
 
 ZQ_HOT void TZqTextFile::WriteBytes(std::string_view ABytes) {
-  Counting([&] { FFile.WriteBytes(ABytes); });
+  const TLockScope Scope(FCritSect);
+  FFile.WriteBytes(ABytes);
 }
 
 void TZqTextFile::Close() {
@@ -175,7 +171,7 @@ void TZqFileAppender::Initialize() {
   if (Trim(FFileName).IsEmpty()) return;
   if (!FAppendExisting && FileExists(FFileName)) DeleteFile(FFileName);
   FFileStream = std::make_unique<TZqTextFile>(FFileName);
-  FLineLayout = FLayout.Supports<IZqLineLayout>();
+  FSimpleLayout = ExactlySimple(FLayout);
   if (FLayout) {
     const UnicodeString Header = FLayout->GetHeader();
     if (!Header.IsEmpty()) FFileStream->WriteLn(Header);
@@ -186,18 +182,19 @@ void TZqFileAppender::Initialize() {
 ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeString& ALoggerName,
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   const TScope Scope(FLock);
+  if (!PrepareWrite()) return;
   TZqBaseAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
   if (!FLayout || !FFileStream) return;
-  if (!FLineLayout) {
+  if (FSimpleLayout == nullptr) {
     const UnicodeString Line = FLayout->FormatLine(ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
     if (!Line.IsEmpty() && FFileStream) FFileStream->WriteLn(Line);
     return;
   }
   utf8::TBuffer Line = std::move(FSpareLine);  // a message from within the layout comes back here and finds none
   Line.Clear();
-  FLineLayout->AppendLine(Line, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+  FSimpleLayout->AppendLine(Line, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
   if (!Line.IsEmpty() && FFileStream) {
-    Line.Append(u"\r\n");
+    Line.AppendBytes("\r\n");
     FFileStream->WriteBytes(Line.View());
   }
   if (Line.Room() <= cKeptLine) FSpareLine = std::move(Line);
@@ -309,12 +306,10 @@ ZQ_HOT void TZqRollingFileAppender::CheckRollover() {
   if (FFileStream && FMaxFileSize != 0 && FFileStream->Size() >= FMaxFileSize) RollOver();
 }
 
-ZQ_HOT void TZqRollingFileAppender::Write(const UnicodeString& ASender, const UnicodeString& ALoggerName,
-    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
-  const TScope Scope(FLock);
-  if (FMaxBackupCount == 0) return;
+ZQ_HOT bool TZqRollingFileAppender::PrepareWrite() {
+  if (FMaxBackupCount == 0) return false;
   CheckRollover();
-  TZqFileAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+  return true;
 }
 
 void TZqRollingFileAppender::Initialize() {

@@ -3,7 +3,9 @@
 #include <atomic>
 #include <memory>
 
+#include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
+#include "runtime/core/utf8.h"
 #include "runtime/io/files.h"
 #include "runtime/io/text_file.h"
 
@@ -77,11 +79,8 @@ class ZQ_API TZqTextFile : public TObject {
   void Close();
 
  private:
-  template <class TStep>
-  void Counting(TStep AStep);
-
   TTextFile FFile;
-  std::atomic<Int64> FSize = 0;
+  Int64 FFound = 0;  // bytes that the file had when it was opened
   mutable TCriticalSection FCritSect;
 };
 
@@ -128,6 +127,8 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
 
  protected:
   ~TZqFileAppender() override = default;
+  // Begins each Write, under its lock; a message is dropped for false.
+  virtual bool PrepareWrite() { return true; }
   // Writes the footer and closes the file, also when the footer fails, which raises then.
   void EndFile();
 
@@ -137,8 +138,8 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
   UnicodeString FFileExt = u".log";
 
  private:
-  IntfRef<IZqLineLayout> FLineLayout;  // the layout of the open file, if it can do so
-  utf8::TBuffer FSpareLine;            // room of the last line, for the next one
+  TZqSimpleLayout* FSimpleLayout = nullptr;  // the layout of the open file, if it is of just that class
+  utf8::TBuffer FSpareLine;                  // room of the last line, for the next one
 };
 
 struct ZQ_API IZqRollingFileAppender : Extends<IZqFileAppender> {
@@ -178,8 +179,6 @@ class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRoll
   /// A file that must not be continued is kept as a backup.
   void Initialize() override;
   void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) override;
-  void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
-      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
   /// Takes a name from the folder apart, without path. The caller owns the result.
   [[nodiscard]] virtual std::unique_ptr<TZqFileInfo> CreateFileInfo(const UnicodeString& AFileName);
   Cardinal GetMaxFileSize() const override;
@@ -192,6 +191,7 @@ class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRoll
 
  protected:
   ~TZqRollingFileAppender() override = default;
+  bool PrepareWrite() override;
   // Whether a name from the folder is the log file or one of its backups: those alone are renamed and deleted.
   [[nodiscard]] virtual bool IsOfSeries(const UnicodeString& AFileName) const;
 

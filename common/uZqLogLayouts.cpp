@@ -1,48 +1,58 @@
 #include "common/uZqLogLayouts.h"
 
+#include <algorithm>
+
 #include "runtime/platform/clock.h"
 #include "runtime/text/datetime.h"
 
 namespace zq {
 
 namespace {
+
 constexpr std::u16string_view cIndentStep = u"  ";
+constexpr std::size_t cTimeLength = std::string_view("yyyy-mm-dd hh:mm:ss:zzz - ").size();
+
+void AppendAscii(utf8::TBuffer& ALine, std::string_view AText) { ALine.AppendBytes(AText); }
+void AppendAscii(UnicodeString& ALine, std::string_view AText) { ALine.Append(FromUTF8(AText)); }
+
 }  // namespace
 
 UnicodeString TZqSimpleLayout::GetHeader() { return u"Log started on : " + DateTimeToStr(Now()); }
 
 UnicodeString TZqSimpleLayout::GetFooter() { return u"Log stopped on : " + DateTimeToStr(Now()); }
 
-ZQ_HOT void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
+void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
   if (ALogIndent == liIndentIncrease) FIndent += cIndentStep;
   if (ALogIndent == liIndentDecrease) FIndent.SetLength(FIndent.Length() - static_cast<Integer>(cIndentStep.size()));
 }
 
 // Most lines come in the second of the one before: then the milliseconds alone are written anew.
-ZQ_HOT const UnicodeString& TZqSimpleLayout::TimeNow() {
+ZQ_HOT const char* TZqSimpleLayout::TimeNow() {
   const Int64 Milliseconds = NowMilliseconds();
   const auto Rest = static_cast<Integer>((Milliseconds % 1000 + 1000) % 1000);
   const Int64 Second = (Milliseconds - Rest) / 1000;
-  if (Second != FSecond)
-    FTime = FormatDateTime(u"yyyy-mm-dd hh:mm:ss:", UnixMillisecondsToDateTime(Milliseconds - Rest)) + u"zzz - ";
-  FSecond = Second;
-  Char* const Digits = FTime.data() + FTime.size() - 6;
-  Digits[0] = static_cast<Char>(u'0' + Rest / 100);
-  Digits[1] = static_cast<Char>(u'0' + Rest / 10 % 10);
-  Digits[2] = static_cast<Char>(u'0' + Rest % 10);
+  if (Second != FSecond) {
+    const UnicodeString Text = FormatDateTime(u"yyyy-mm-dd hh:mm:ss:", UnixMillisecondsToDateTime(Milliseconds - Rest));
+    std::copy(Text.begin(), Text.end(), FTime);
+    FSecond = Second;
+  }
+  char* const Digits = FTime + cTimeLength - 6;
+  Digits[0] = static_cast<char>('0' + Rest / 100);
+  Digits[1] = static_cast<char>('0' + Rest / 10 % 10);
+  Digits[2] = static_cast<char>('0' + Rest % 10);
   return FTime;
 }
 
 template <class TLine>
-void TZqSimpleLayout::Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+inline void TZqSimpleLayout::Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   ChangeIndent(ALogIndent);
   if (!FIndent.IsEmpty()) ALine.Append(FIndent);
-  ALine.Append(TimeNow());
+  AppendAscii(ALine, {TimeNow(), cTimeLength});
   ALine.Append(ZqLogLevels[ALogLevel]);
-  ALine.Append(u" ");
+  AppendAscii(ALine, " ");
   ALine.Append(ALoggerName);
-  ALine.Append(u" - ");
+  AppendAscii(ALine, " - ");
   ALine.Append(ALogMessage);
   if (AValue != nullptr) ALine.Append(u" - " + ZqDataRecToString(AValue));
 }
@@ -57,12 +67,6 @@ UnicodeString TZqSimpleLayout::FormatLine(const UnicodeString& ALoggerName, TZqL
   UnicodeString Result;
   Compose(Result, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
   return Result;
-}
-
-bool TZqSimpleLayout::GetInterface(const TGUID& AIID, void** AObj) {
-  *AObj = nullptr;
-  if (AIID == IZqLineLayout::IID && ClassType() != ClassOf<TZqSimpleLayout>()) return false;
-  return Implements::GetInterface(AIID, AObj);
 }
 
 void uZqLogLayouts::Start() { RegisteredLayouts()->Add(TZqLogBaseClass::Of<TZqSimpleLayout>()); }

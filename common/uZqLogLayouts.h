@@ -3,6 +3,7 @@
 #include <limits>
 
 #include "common/uZqLogger.h"
+#include "runtime/core/utf8.h"
 
 namespace zq {
 
@@ -10,7 +11,7 @@ namespace zq {
 ///
 /// The indentation that EnterMethod and ExitMethod build up is the layout's, so one layout serves one appender, which
 /// calls it under its lock.
-class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqLogLayout, IZqLineLayout> {
+class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqLogLayout> {
  public:
   using Implements::Implements;
   void Initialize(TZqLogBase*) override {}
@@ -18,25 +19,23 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
   UnicodeString GetHeader() override;
   UnicodeString FormatLine(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
       PZqDataRec AValue, TZqLogIndent ALogIndent) override;
-
+  /// Appends, in UTF-8, what this class's FormatLine returns; a descendant's own FormatLine isn't asked.
   void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
-      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
-  /// A descendant, whose FormatLine may be its own, doesn't answer to IZqLineLayout.
-  bool GetInterface(const TGUID& AIID, void** AObj) override;
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent);
 
  protected:
   ~TZqSimpleLayout() override = default;
 
  private:
   void ChangeIndent(TZqLogIndent ALogIndent);
-  const UnicodeString& TimeNow();
+  const char* TimeNow();
   template <class TLine>
   void Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
       PZqDataRec AValue, TZqLogIndent ALogIndent);
 
   UnicodeString FIndent;
   Int64 FSecond = std::numeric_limits<Int64>::min();  // the one that FTime shows
-  UnicodeString FTime;                                // time of the last line and the dash behind it
+  char FTime[27] = "yyyy-mm-dd hh:mm:ss:zzz - ";      // how the last line began
 };
 
 namespace uZqLogLayouts {

@@ -89,7 +89,7 @@ ZQ_HOT bool TZqLogLock::Enter(const UnicodeString& AOwner, const char16_t* AOper
   return true;
 }
 
-ZQ_HOT bool TZqLogLock::Enter(const UnicodeString& ALockRequestedBy, bool ARaise) {
+bool TZqLogLock::Enter(const UnicodeString& ALockRequestedBy, bool ARaise) {
   if (!Take(ALockRequestedBy, u"", ARaise)) return false;
   const std::lock_guard Guard(FTextLock);
   FText = ALockRequestedBy;
@@ -153,8 +153,8 @@ void TZqLogAppenderList::Add(const IntfRef<IZqLogAppender>& AAppender) {
     const TLockScope Guard(FItemsLock);
     TComponent* const Added = AAppender->Component();
     for (const auto& Item : FList)
-      if (Item == AAppender || (Added != nullptr && Item->Component() == Added)) return;
-    FList.push_back(AAppender);
+      if (*Item == AAppender || (Added != nullptr && (*Item)->Component() == Added)) return;
+    FList.push_back(std::make_shared<const IntfRef<IZqLogAppender>>(AAppender));
     FCount = static_cast<Integer>(FList.size());
   }
   if (TComponent* const Component = AAppender->Component()) Component->FreeNotification(this);
@@ -189,7 +189,7 @@ template <class TLeaves>
 TZqLogAppenderList::TItems TZqLogAppenderList::TakeItems(TLeaves ALeaves) {
   const TLockScope Guard(FItemsLock);
   const auto Kept =
-      std::stable_partition(FList.begin(), FList.end(), [&](const auto& AItem) { return !ALeaves(AItem); });
+      std::stable_partition(FList.begin(), FList.end(), [&](const auto& AItem) { return !ALeaves(*AItem); });
   TItems Result(std::make_move_iterator(Kept), std::make_move_iterator(FList.end()));
   FList.erase(Kept, FList.end());
   FCount = static_cast<Integer>(FList.size());
@@ -212,15 +212,15 @@ void TZqLogAppenderList::Clear() {
   Dropped = TakeItems([](const auto&) { return true; });
 }
 
-ZQ_HOT IntfRef<IZqLogAppender> TZqLogAppenderList::ItemOrNone(std::size_t AIndex) const {
+ZQ_HOT TZqLogAppenderList::TItem TZqLogAppenderList::ItemOrNone(std::size_t AIndex) const {
   const TLockScope Guard(FItemsLock);
   return AIndex < FList.size() ? FList[AIndex] : nullptr;
 }
 
 IntfRef<IZqLogAppender> TZqLogAppenderList::GetAppender(Integer AIndex) const {
-  IntfRef<IZqLogAppender> Result = AIndex < 0 ? nullptr : ItemOrNone(static_cast<std::size_t>(AIndex));
-  if (!Result) throw EListError(u"List index out of bounds (%d)", {AIndex});
-  return Result;
+  const TItem Item = AIndex < 0 ? nullptr : ItemOrNone(static_cast<std::size_t>(AIndex));
+  if (!Item) throw EListError(u"List index out of bounds (%d)", {AIndex});
+  return *Item;
 }
 
 void TZqLogAppenderList::Notification(TComponent* AComponent, TOperation AOperation) {
@@ -351,7 +351,7 @@ TZqLogAppenderList* TZqLogger::LockAppenders() {
 
 // A list whose lock stays busy is skipped. What an appender logs itself comes back here on the same thread; the depth
 // is bounded, so that one that answers every message with a message doesn't end the host.
-ZQ_HOT void TZqLogger::WriteToAppenders(const UnicodeString& ASender, TZqLogLevel ALogLevel,
+inline void TZqLogger::WriteToAppenders(const UnicodeString& ASender, TZqLogLevel ALogLevel,
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   TZqLogAppenderList& List = *FAppenders;
   if (!List.FLock.Enter(FFullName, u".DoLog", false)) return;
@@ -367,7 +367,7 @@ ZQ_HOT void TZqLogger::WriteToAppenders(const UnicodeString& ASender, TZqLogLeve
   const auto AtStart = static_cast<std::size_t>(List.Count());
   for (std::size_t i = 0; i < AtStart; ++i)
     if (const auto Appender = List.ItemOrNone(i))
-      Appender->Write(ASender, FFullName, ALogLevel, ALogMessage, AValue, ALogIndent);
+      (*Appender)->Write(ASender, FFullName, ALogLevel, ALogMessage, AValue, ALogIndent);
 }
 
 // Level and count are tested first, so that a message that nobody writes takes no lock. Each lock is left before the
@@ -376,32 +376,32 @@ ZQ_HOT void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel
     PZqDataRec AValue, TZqLogIndent ALogIndent) {
   try {
     for (TZqLogger* Current = this; Current != nullptr;) {
-      if (Current->FAppenders->Count() != 0 && Current->GetLevel() <= ALogLevel)
+      if (Current->FAppenders->Count() != 0 && Current->TZqLogger::GetLevel() <= ALogLevel)
         Current->WriteToAppenders(ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
-      Current = Current->GetAdditive() ? Current->FParent.load(std::memory_order_relaxed) : nullptr;
+      Current = Current->FAdditive.load(std::memory_order_relaxed) ? Current->FParent.load(std::memory_order_relaxed) : nullptr;
     }
   } catch (const Exception&) {  // logging never raises into its caller
   }
 }
 
-ZQ_HOT void TZqLogger::Trace(const UnicodeString& ALogMessage) { Log(llTrace, ALogMessage); }
-ZQ_HOT void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName) {
+void TZqLogger::Trace(const UnicodeString& ALogMessage) { Log(llTrace, ALogMessage); }
+void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName) {
   Log(llTrace, Format(u"%s($%p).%s", {AObject->ClassName(), AObject, AMethodName}));
 }
-ZQ_HOT void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) {
+void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) {
   Trace(AObject, Format(AMethodName, AArgs));
 }
-ZQ_HOT void TZqLogger::Debug(const UnicodeString& ALogMessage) { Log(llDebug, ALogMessage); }
-ZQ_HOT void TZqLogger::Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) {
+void TZqLogger::Debug(const UnicodeString& ALogMessage) { Log(llDebug, ALogMessage); }
+void TZqLogger::Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) {
   Log(llDebug, Format(ALogMessage, AArgs));
 }
-ZQ_HOT void TZqLogger::Debug(const UnicodeString& AMessage, const Variant& AValue) { Log(llDebug, AMessage, AValue); }
-ZQ_HOT void TZqLogger::Debug(const UnicodeString& AMessage, const TObject* AValue) { Log(llDebug, AMessage, AValue); }
-ZQ_HOT void TZqLogger::Debug(const UnicodeString& AMessage, const Exception& AValue) { Log(llDebug, AMessage, AValue); }
-ZQ_HOT void TZqLogger::Info(const UnicodeString& ALogMessage) { Log(llInfo, ALogMessage); }
-ZQ_HOT void TZqLogger::Warn(const UnicodeString& ALogMessage) { Log(llWarn, ALogMessage); }
-ZQ_HOT void TZqLogger::Error(const UnicodeString& ALogMessage) { Log(llError, ALogMessage); }
-ZQ_HOT void TZqLogger::Error(const UnicodeString& ALogMessage, const Exception& AException) {
+void TZqLogger::Debug(const UnicodeString& AMessage, const Variant& AValue) { Log(llDebug, AMessage, AValue); }
+void TZqLogger::Debug(const UnicodeString& AMessage, const TObject* AValue) { Log(llDebug, AMessage, AValue); }
+void TZqLogger::Debug(const UnicodeString& AMessage, const Exception& AValue) { Log(llDebug, AMessage, AValue); }
+ZQ_HOT void TZqLogger::Info(const UnicodeString& ALogMessage) { DoLog(FFullName, llInfo, ALogMessage, nullptr, liIndentNone); }
+void TZqLogger::Warn(const UnicodeString& ALogMessage) { Log(llWarn, ALogMessage); }
+void TZqLogger::Error(const UnicodeString& ALogMessage) { Log(llError, ALogMessage); }
+void TZqLogger::Error(const UnicodeString& ALogMessage, const Exception& AException) {
   Log(llError, ALogMessage + u"\r\n" + AException.Message());
 }
 void TZqLogger::Fatal(const UnicodeString& ALogMessage) { Log(llFatal, ALogMessage); }
@@ -440,22 +440,22 @@ void TZqLogger::ExitMethod(const TObject* AObject, const UnicodeString& AMethodN
 ZQ_HOT void TZqLogger::Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, TZqLogIndent ALogIndent) {
   DoLog(FFullName, ALogLevel, ALogMessage, nullptr, ALogIndent);
 }
-ZQ_HOT void TZqLogger::Log(
+void TZqLogger::Log(
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Variant& AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = VariantRec(AValue);
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
-ZQ_HOT void TZqLogger::Log(
+void TZqLogger::Log(
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const TObject* AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = ObjectRec(AValue);
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
-ZQ_HOT void TZqLogger::Log(
+void TZqLogger::Log(
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Exception& AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = ExceptionRec(AValue);
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
-ZQ_HOT void TZqLogger::Log(const IntfRef<IZqLogData>& ALogData) {
+void TZqLogger::Log(const IntfRef<IZqLogData>& ALogData) {
   const TZqLogData& Event = *ALogData->Data();
   Log(Event.LogLevel, Event.LogMessage, Event.Indent);
 }

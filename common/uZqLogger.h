@@ -11,7 +11,6 @@
 #include "common/uZqTypes.h"
 #include "runtime/component/component.h"
 #include "runtime/core/interfaces.h"
-#include "runtime/core/utf8.h"
 #include "runtime/core/variants.h"
 #include "runtime/core/varrec.h"
 #include "runtime/sync/critical_section.h"
@@ -23,7 +22,7 @@ using enum TZqLogLevel;
 
 /// Texts of the levels as they stand in log lines.
 struct TZqLogLevelTexts {
-  std::u16string_view Texts[8];
+  char16_t Texts[8][9];
   [[nodiscard]] constexpr std::u16string_view operator[](TZqLogLevel ALevel) const noexcept {
     return Texts[static_cast<Byte>(ALevel)];
   }
@@ -148,17 +147,6 @@ struct ZQ_API IZqLogLayoutEx : Extends<IZqLogLayout> {
 
  protected:
   ~IZqLogLayoutEx() = default;
-};
-
-/// A layout that can put its line into the caller's buffer as the bytes of the file.
-struct ZQ_API IZqLineLayout : Extends<IInterface> {
-  static constexpr TGUID IID = "{7B0F3A52-9D1E-4C68-8F27-5E1C6AD94B03}"_guid;
-  /// Appends what FormatLine returns, in UTF-8.
-  virtual void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
-      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) = 0;
-
- protected:
-  ~IZqLineLayout() = default;
 };
 
 /// A layout that is told which appender it now serves.
@@ -397,18 +385,20 @@ class ZQ_API TZqLogAppenderList : public TComponent {
 
  private:
   friend class TZqLogger;
-  using TItems = std::vector<IntfRef<IZqLogAppender>>;
+  // A step of a walk shares the entry instead of counting the appender once more, which spares two calls to it.
+  using TItem = std::shared_ptr<const IntfRef<IZqLogAppender>>;
+  using TItems = std::vector<TItem>;
 
-  IntfRef<IZqLogAppender> ItemOrNone(std::size_t AIndex) const;
+  TItem ItemOrNone(std::size_t AIndex) const;
   template <class TLeaves>
   TItems TakeItems(TLeaves ALeaves);
 
   TZqLogger* FLogger;
+  std::atomic<Integer> FCount = 0;      // FList's size
+  Integer FNesting = 0;                 // calls to appenders under way, guarded by FLock
   mutable TCriticalSection FItemsLock;  // innermost, for a few instructions: an appender may end on any thread
   TItems FList;
-  std::atomic<Integer> FCount = 0;  // FList's size
   TZqLogLock FLock;
-  Integer FNesting = 0;  // calls to appenders under way, guarded by FLock
 };
 
 /// A logger. The root is made by Logger() and never dies by its count; all others come from GetLogger and live as long

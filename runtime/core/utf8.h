@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstring>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -52,6 +53,12 @@ class TBuffer {
   void Append(std::u16string_view AText) {
     if (FRoom - FSize < 3 * AText.size()) Grow(3 * AText.size());
     FSize += Encode(AText.data(), AText.size(), FBytes.get() + FSize);
+  }
+  /// Bytes as they are.
+  void AppendBytes(std::string_view ABytes) {
+    if (FRoom - FSize < ABytes.size()) Grow(ABytes.size());
+    std::memcpy(FBytes.get() + FSize, ABytes.data(), ABytes.size());
+    FSize += ABytes.size();
   }
   [[nodiscard]] std::string_view View() const noexcept { return {FBytes.get(), FSize}; }
   [[nodiscard]] bool IsEmpty() const noexcept { return FSize == 0; }

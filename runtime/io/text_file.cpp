@@ -26,7 +26,7 @@ constexpr std::size_t cKeptRoom = 1 << 20;
 constexpr std::size_t MaxBytesPerUnit(Word ACodePage) noexcept { return ACodePage == cUTF8 ? 3 : 8; }
 
 // Bytes written to ADest, which has ARoom; 0 for a text that the code page's converter refuses.
-ZQ_HOT std::size_t EncodeTo(char* ADest, std::size_t ARoom, std::u16string_view AText, Word ACodePage) {
+std::size_t EncodeTo(char* ADest, std::size_t ARoom, std::u16string_view AText, Word ACodePage) {
   if (ACodePage == cUTF8) return utf8::Encode(AText.data(), AText.size(), ADest);
   return static_cast<std::size_t>(
       WideCharToMultiByte(ACodePage, 0, AText.data(), static_cast<int>(AText.size()), ADest, static_cast<int>(ARoom)));
@@ -64,9 +64,9 @@ void TTextFile::Open(int AFlags, const char16_t* AStep) {
 
 void TTextFile::Write(const UnicodeString& AText) { WriteText(AText, {}); }
 
-ZQ_HOT void TTextFile::WriteLn(const UnicodeString& AText) { WriteText(AText, cLineEnd); }
+void TTextFile::WriteLn(const UnicodeString& AText) { WriteText(AText, cLineEnd); }
 
-ZQ_HOT void TTextFile::WriteText(std::u16string_view AText, std::string_view ALineEnd) {
+void TTextFile::WriteText(std::u16string_view AText, std::string_view ALineEnd) {
   RequireOpen();
   char OnStack[cOnStack];
   const std::size_t Room = MaxBytesPerUnit(FCodePage) * AText.size();
@@ -96,7 +96,7 @@ ZQ_HOT void TTextFile::Put(std::string_view ABytes) {
     const ssize_t Count = ::write(FHandle, ABytes.data(), ABytes.size());
     if (Count < 0 && errno == EINTR) continue;
     if (Count <= 0) Fail(u"write", Count < 0 ? errno : ENOSPC);
-    FWritten += Count;
+    FWritten.store(Written() + Count, std::memory_order_relaxed);
     ABytes.remove_prefix(static_cast<std::size_t>(Count));
     FTorn = !ABytes.empty();
   }
@@ -109,7 +109,7 @@ void TTextFile::Close() {
   if (IsOpen() && ::close(std::exchange(FHandle, -1)) != 0 && errno != EINTR) Fail(u"close", errno);
 }
 
-ZQ_HOT void TTextFile::RequireOpen() const {
+void TTextFile::RequireOpen() const {
   if (!IsOpen()) Fail(u"write", EBADF);
 }
 

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <string>
 #include <string_view>
 
@@ -40,8 +41,8 @@ class ZQ_API TTextFile : public TObject {
 
   [[nodiscard]] bool IsOpen() const noexcept { return FHandle >= 0; }
   [[nodiscard]] const UnicodeString& FileName() const noexcept { return FFileName; }
-  /// Bytes that have reached the file since it was opened; failed writes count what they got through.
-  [[nodiscard]] Int64 Written() const noexcept { return FWritten; }
+  /// Bytes that have reached the file since it was opened; failed writes count what they got through. Any thread.
+  [[nodiscard]] Int64 Written() const noexcept { return FWritten.load(std::memory_order_relaxed); }
 
  private:
   void Open(int AFlags, const char16_t* AStep);
@@ -52,7 +53,7 @@ class ZQ_API TTextFile : public TObject {
 
   UnicodeString FFileName;
   std::string FLong;  // room for texts that the stack doesn't take; kept for the next one
-  Int64 FWritten = 0;
+  std::atomic<Int64> FWritten = 0;
   int FHandle = -1;
   Word FCodePage = 65001;
   bool FTorn = false;  // the last write got through in part

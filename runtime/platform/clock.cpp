@@ -28,14 +28,14 @@ Integer SystemOffset(Int64 AUtcSeconds) noexcept {
 
 // Zones change their offset at most once in a quarter of an hour, mostly at its start. So a thread remembers the offset
 // of one that begins and ends alike, and asks the system only on leaving it.
-class TLinuxClock : public TClockService {
+class TLinuxClock final : public TClockService {
  public:
-  ZQ_HOT Int64 UtcMicroseconds() override {
+  Int64 UtcMicroseconds() override {
     timespec Time{};
     clock_gettime(CLOCK_REALTIME, &Time);
     return Time.tv_sec * 1000000LL + Time.tv_nsec / 1000;
   }
-  ZQ_HOT Integer UtcOffsetSeconds(Int64 AUtcSeconds) override {
+  Integer UtcOffsetSeconds(Int64 AUtcSeconds) override {
     // Initial-exec: no call where a shared library would otherwise make one.
     __attribute__((tls_model("initial-exec"))) thread_local constinit TQuarter Known;
     const Int64 Quarter = FloorDiv(AUtcSeconds, cQuarter);
@@ -58,17 +58,21 @@ class TLinuxClock : public TClockService {
   };
 };
 
+constinit TLinuxClock LinuxClock;
+constinit std::atomic<TClockService*> Slot = &LinuxClock;
+
 }  // namespace
 
-ZQ_HOT std::atomic<TClockService*>& ServiceSlot(const TClockService*) {
-  static std::atomic<TClockService*> Slot{new TLinuxClock};
-  return Slot;
-}
+std::atomic<TClockService*>& ServiceSlot(const TClockService*) { return Slot; }
 
+// Calls to the system's own clock, whose class is final, are direct.
 ZQ_HOT Int64 NowMilliseconds() {
-  TClockService& Clock = Platform().Clock();
-  const Int64 Utc = FloorDiv(Clock.UtcMicroseconds(), 1000);
-  return Utc + Int64{1000} * Clock.UtcOffsetSeconds(FloorDiv(Utc, 1000));
+  const auto Local = [](auto& AClock) {
+    const Int64 Utc = FloorDiv(AClock.UtcMicroseconds(), 1000);
+    return Utc + Int64{1000} * AClock.UtcOffsetSeconds(FloorDiv(Utc, 1000));
+  };
+  TClockService* const Clock = Slot.load(std::memory_order_acquire);
+  return Clock == &LinuxClock ? Local(LinuxClock) : Local(*Clock);
 }
 
 TDateTime Now() { return UnixMillisecondsToDateTime(NowMilliseconds()); }

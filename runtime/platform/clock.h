@@ -9,11 +9,13 @@ namespace zq {
 /// The system's clock and time zone. Called on every log line, from any thread.
 class ZQ_API TClockService {
  public:
-  virtual ~TClockService() = default;
   /// Since 1970-01-01 00:00 UTC.
   virtual Int64 UtcMicroseconds() = 0;
   /// What the local clock showed more than UTC at that moment, in seconds; AUtcSeconds since 1970-01-01.
   virtual Integer UtcOffsetSeconds(Int64 AUtcSeconds) = 0;
+
+ protected:
+  ~TClockService() = default;
 };
 
 /// The current service's time of day, local, in whole milliseconds: what a log line shows never lies in the future.

@@ -4,16 +4,16 @@ namespace zq {
 
 namespace {
 
-class TLinuxDesktop : public TDesktopService {
+class TLinuxDesktop final : public TDesktopService {
  public:
   bool FindWindow(const char16_t*, const char16_t*) override { return false; }
 };
 
+constinit TLinuxDesktop LinuxDesktop;
+constinit std::atomic<TDesktopService*> Slot = &LinuxDesktop;
+
 }  // namespace
 
-std::atomic<TDesktopService*>& ServiceSlot(const TDesktopService*) {
-  static std::atomic<TDesktopService*> Slot{new TLinuxDesktop};
-  return Slot;
-}
+std::atomic<TDesktopService*>& ServiceSlot(const TDesktopService*) { return Slot; }
 
 }  // namespace zq

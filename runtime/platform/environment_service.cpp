@@ -10,7 +10,7 @@ namespace zq {
 
 namespace {
 
-class TLinuxEnvironment : public TEnvironmentService {
+class TLinuxEnvironment final : public TEnvironmentService {
  public:
   std::optional<UnicodeString> GetEnvironmentVariable(const UnicodeString& AName) override {
     const char* const Value = std::getenv(utf8::Encode(AName, utf8::TMalformed::Escape).c_str());
@@ -19,12 +19,12 @@ class TLinuxEnvironment : public TEnvironmentService {
   }
 };
 
+constinit TLinuxEnvironment LinuxEnvironment;
+constinit std::atomic<TEnvironmentService*> Slot = &LinuxEnvironment;
+
 }  // namespace
 
-std::atomic<TEnvironmentService*>& ServiceSlot(const TEnvironmentService*) {
-  static std::atomic<TEnvironmentService*> Slot{new TLinuxEnvironment};
-  return Slot;
-}
+std::atomic<TEnvironmentService*>& ServiceSlot(const TEnvironmentService*) { return Slot; }
 
 UnicodeString TEnvironmentService::ExpandEnvironmentStrings(const UnicodeString& AText) {
   UnicodeString Result;

@@ -25,7 +25,7 @@ bool IsSoleOpener(int AHandle) noexcept {
   return ::fcntl(AHandle, F_SETLEASE, F_WRLCK) == 0 || errno != EAGAIN;
 }
 
-class TLinuxFiles : public TFileService {
+class TLinuxFiles final : public TFileService {
  public:
   UnicodeString GetShortPathName(const UnicodeString& AName) override {
     const UnicodeString Full = ExpandFileName(AName);
@@ -62,11 +62,11 @@ class TLinuxFiles : public TFileService {
   }
 };
 
+constinit TLinuxFiles LinuxFiles;
+constinit std::atomic<TFileService*> Slot = &LinuxFiles;
+
 }  // namespace
 
-std::atomic<TFileService*>& ServiceSlot(const TFileService*) {
-  static std::atomic<TFileService*> Slot{new TLinuxFiles};
-  return Slot;
-}
+std::atomic<TFileService*>& ServiceSlot(const TFileService*) { return Slot; }
 
 }  // namespace zq

@@ -9,7 +9,6 @@ namespace zq {
 /// File facts beyond what runtime/io has. Any thread.
 class ZQ_API TFileService {
  public:
-  virtual ~TFileService() = default;
   /// The short form of an existing file's path; empty on failure. Linux knows none: the absolute path itself.
   [[nodiscard]] virtual UnicodeString GetShortPathName(const UnicodeString& AName) = 0;
   /// Folder for temporary files, with a separator at the end; empty on failure.
@@ -22,6 +21,9 @@ class ZQ_API TFileService {
   [[nodiscard]] virtual bool OpensExclusively(const UnicodeString& AName) = 0;
   /// Looks a file up along the search path for programs; empty if it isn't there.
   [[nodiscard]] virtual UnicodeString SearchPath(const UnicodeString& AName) = 0;
+
+ protected:
+  ~TFileService() = default;
 };
 
 }  // namespace zq

@@ -11,7 +11,7 @@ namespace zq {
 
 namespace {
 
-class TLinuxProcess : public TProcessFacts {
+class TLinuxProcess final : public TProcessFacts {
  public:
   std::optional<bool> IsWow64Process() override {
     utsname System{};
@@ -28,11 +28,11 @@ class TLinuxProcess : public TProcessFacts {
   }
 };
 
+constinit TLinuxProcess LinuxProcess;
+constinit std::atomic<TProcessFacts*> Slot = &LinuxProcess;
+
 }  // namespace
 
-std::atomic<TProcessFacts*>& ServiceSlot(const TProcessFacts*) {
-  static std::atomic<TProcessFacts*> Slot{new TLinuxProcess};
-  return Slot;
-}
+std::atomic<TProcessFacts*>& ServiceSlot(const TProcessFacts*) { return Slot; }
 
 }  // namespace zq

@@ -10,10 +10,12 @@ namespace zq {
 /// Facts about this process. Each is absent where the system can't tell.
 class ZQ_API TProcessFacts {
  public:
-  virtual ~TProcessFacts() = default;
   /// A 32-bit program on a 64-bit system.
   [[nodiscard]] virtual std::optional<bool> IsWow64Process() = 0;
   [[nodiscard]] virtual std::optional<bool> IsDebuggerPresent() = 0;
+
+ protected:
+  ~TProcessFacts() = default;
 };
 
 }  // namespace zq

@@ -63,7 +63,7 @@ struct TFileTypeKey {
   UnicodeString ContentType;
 };
 
-class TLinuxRegistry : public TRegistryService {
+class TLinuxRegistry final : public TRegistryService {
  public:
   Integer RegOpenKeyEx(HKEY AKey, const UnicodeString& ASubKey, Cardinal, HKEY& AResult) override {
     if (IsRoot(AKey) && ASubKey.IsEmpty()) {
@@ -97,11 +97,11 @@ class TLinuxRegistry : public TRegistryService {
   }
 };
 
+constinit TLinuxRegistry LinuxRegistry;
+constinit std::atomic<TRegistryService*> Slot = &LinuxRegistry;
+
 }  // namespace
 
-std::atomic<TRegistryService*>& ServiceSlot(const TRegistryService*) {
-  static std::atomic<TRegistryService*> Slot{new TLinuxRegistry};
-  return Slot;
-}
+std::atomic<TRegistryService*>& ServiceSlot(const TRegistryService*) { return Slot; }
 
 }  // namespace zq

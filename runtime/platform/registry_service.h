@@ -37,7 +37,6 @@ inline constexpr Integer ERROR_ACCESS_DENIED = 5;
 /// tables. Any other key is not found, and none can be made or written.
 class ZQ_API TRegistryService {
  public:
-  virtual ~TRegistryService() = default;
   [[nodiscard]] virtual Integer RegOpenKeyEx(
       HKEY AKey, const UnicodeString& ASubKey, Cardinal AAccess, HKEY& AResult) = 0;
   /// Opens a key that exists.
@@ -48,6 +47,9 @@ class ZQ_API TRegistryService {
   [[nodiscard]] virtual Integer RegSetValueEx(
       HKEY AKey, const UnicodeString& AName, Cardinal AType, const TBytes& AData) = 0;
   virtual void RegCloseKey(HKEY AKey) = 0;
+
+ protected:
+  ~TRegistryService() = default;
 };
 
 }  // namespace zq

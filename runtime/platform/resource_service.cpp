@@ -48,7 +48,7 @@ UnicodeString ResourceFile(HINST AModule, const UnicodeString& AName, const Unic
   return Folder.IsEmpty() ? UnicodeString() : EntryOf(Folder, AName, 0);
 }
 
-class TLinuxResources : public TResourceService {
+class TLinuxResources final : public TResourceService {
  public:
   bool FindResource(HINST AModule, const UnicodeString& AName, const UnicodeString& AType) override {
     return !ResourceFile(AModule, AName, AType).IsEmpty();
@@ -68,13 +68,13 @@ class TLinuxResources : public TResourceService {
   }
 };
 
+constinit TLinuxResources LinuxResources;
+constinit std::atomic<TResourceService*> Slot = &LinuxResources;
+
 }  // namespace
 
 HINST HInstance() noexcept { return ModuleAt(reinterpret_cast<const void*>(&HInstance)).dli_fbase; }
 
-std::atomic<TResourceService*>& ServiceSlot(const TResourceService*) {
-  static std::atomic<TResourceService*> Slot{new TLinuxResources};
-  return Slot;
-}
+std::atomic<TResourceService*>& ServiceSlot(const TResourceService*) { return Slot; }
 
 }  // namespace zq

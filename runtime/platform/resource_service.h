@@ -23,11 +23,13 @@ inline constexpr const WideChar* RT_MANIFEST = u"#24";
 /// number is its digits.
 class ZQ_API TResourceService {
  public:
-  virtual ~TResourceService() = default;
   [[nodiscard]] virtual bool FindResource(HINST AModule, const UnicodeString& AName, const UnicodeString& AType) = 0;
   /// The content; none where it isn't found or can't be read.
   [[nodiscard]] virtual std::optional<TBytes> LoadResource(
       HINST AModule, const UnicodeString& AName, const UnicodeString& AType) = 0;
+
+ protected:
+  ~TResourceService() = default;
 };
 
 /// This library's module, and the program's.

@@ -300,7 +300,7 @@ class TDesktopEntry : public TShellLink {
   UnicodeString FDescription;
 };
 
-class TLinuxShell : public TShellService {
+class TLinuxShell final : public TShellService {
  public:
   bool SHGetSpecialFolderPath(Integer ACsidl, bool ACreate, UnicodeString& APath) override {
     const auto Found = FindShellFolder(ACsidl);
@@ -332,11 +332,11 @@ class TLinuxShell : public TShellService {
   std::unique_ptr<TShellLink> CreateShellLink() override { return std::make_unique<TDesktopEntry>(); }
 };
 
+constinit TLinuxShell LinuxShell;
+constinit std::atomic<TShellService*> Slot = &LinuxShell;
+
 }  // namespace
 
-std::atomic<TShellService*>& ServiceSlot(const TShellService*) {
-  static std::atomic<TShellService*> Slot{new TLinuxShell};
-  return Slot;
-}
+std::atomic<TShellService*>& ServiceSlot(const TShellService*) { return Slot; }
 
 }  // namespace zq

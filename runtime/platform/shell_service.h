@@ -40,7 +40,6 @@ using TItemList = void*;
 /// Shell folders, operations on whole folders, shortcuts.
 class ZQ_API TShellService {
  public:
-  virtual ~TShellService() = default;
   /// Path of the shell folder with that number; with ACreate it is made if it isn't there. On Linux the XDG folders: a
   /// program's files for all users (46) lie in the user's data folder, which is always writable.
   [[nodiscard]] virtual bool SHGetSpecialFolderPath(Integer ACsidl, bool ACreate, UnicodeString& APath) = 0;
@@ -57,6 +56,9 @@ class ZQ_API TShellService {
       Cardinal AFunc, const UnicodeString& AFrom, const UnicodeString& ATo, Word AFlags) = 0;
   /// Raises where the shell has no such objects.
   [[nodiscard]] virtual std::unique_ptr<TShellLink> CreateShellLink() = 0;
+
+ protected:
+  ~TShellService() = default;
 };
 
 }  // namespace zq

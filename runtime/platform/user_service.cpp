@@ -20,7 +20,7 @@ UnicodeString NameBy(TNameCall ACall) {
   return ACall(Name, sizeof Name - 1) == 0 ? FromUTF8(Name) : UnicodeString();
 }
 
-class TLinuxUsers : public TUserService {
+class TLinuxUsers final : public TUserService {
  public:
   UnicodeString GetComputerName() override { return NameBy(&::gethostname); }
 
@@ -47,11 +47,11 @@ class TLinuxUsers : public TUserService {
   }
 };
 
+constinit TLinuxUsers LinuxUsers;
+constinit std::atomic<TUserService*> Slot = &LinuxUsers;
+
 }  // namespace
 
-std::atomic<TUserService*>& ServiceSlot(const TUserService*) {
-  static std::atomic<TUserService*> Slot{new TLinuxUsers};
-  return Slot;
-}
+std::atomic<TUserService*>& ServiceSlot(const TUserService*) { return Slot; }
 
 }  // namespace zq

@@ -11,7 +11,6 @@ namespace zq {
 /// Who runs this process, and where. Texts are empty where the system refuses.
 class ZQ_API TUserService {
  public:
-  virtual ~TUserService() = default;
   [[nodiscard]] virtual UnicodeString GetComputerName() = 0;
   [[nodiscard]] virtual UnicodeString GetUserName() = 0;
   /// Name and domain of the account in the process's token. Linux: the NIS domain, else the computer's name.
@@ -23,6 +22,9 @@ class ZQ_API TUserService {
   [[nodiscard]] virtual bool HasServerGetInfo() = 0;
   /// The computer's description; 0 for success. Linux: PRETTY_HOSTNAME of /etc/machine-info, empty if none is set.
   [[nodiscard]] virtual Cardinal NetServerGetInfo(UnicodeString& AComment) = 0;
+
+ protected:
+  ~TUserService() = default;
 };
 
 }  // namespace zq

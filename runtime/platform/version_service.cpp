@@ -8,7 +8,7 @@ namespace zq {
 
 namespace {
 
-class TLinuxVersion : public TVersionService {
+class TLinuxVersion final : public TVersionService {
  public:
   bool HasKernel() override { return true; }
   bool KernelExports(const char16_t* AName) override { return std::u16string_view(AName) == u"GetVersionExA"; }
@@ -27,11 +27,11 @@ class TLinuxVersion : public TVersionService {
   }
 };
 
+constinit TLinuxVersion LinuxVersion;
+constinit std::atomic<TVersionService*> Slot = &LinuxVersion;
+
 }  // namespace
 
-std::atomic<TVersionService*>& ServiceSlot(const TVersionService*) {
-  static std::atomic<TVersionService*> Slot{new TLinuxVersion};
-  return Slot;
-}
+std::atomic<TVersionService*>& ServiceSlot(const TVersionService*) { return Slot; }
 
 }  // namespace zq

@@ -27,7 +27,6 @@ inline constexpr Integer SM_SERVERR2 = 89;
 /// a workstation of major version 10.
 class ZQ_API TVersionService {
  public:
-  virtual ~TVersionService() = default;
   /// The kernel library is loaded.
   [[nodiscard]] virtual bool HasKernel() = 0;
   /// It exports AName.
@@ -35,6 +34,9 @@ class ZQ_API TVersionService {
   [[nodiscard]] virtual bool GetVersionEx(TOSVersionInfo& AInfo) = 0;
   [[nodiscard]] virtual Integer GetSystemMetrics(Integer AIndex) = 0;
   [[nodiscard]] virtual TSystemRelease Release() = 0;
+
+ protected:
+  ~TVersionService() = default;
 };
 
 }  // namespace zq
