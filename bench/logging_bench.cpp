@@ -80,14 +80,32 @@ struct TPlainFile {
   int Handle;
 };
 
-// One log call that writes, against the same bytes, preformatted, through one write(2). The two take turns, so that what
-// the machine does meanwhile meets both; the counter is the median of the rounds.
-double NanosecondsPerCall(std::size_t ACalls, auto ACall) {
-  const auto Start = std::chrono::steady_clock::now();
-  for (std::size_t i = 0; i < ACalls; ++i) ACall();
-  const std::chrono::duration<double, std::nano> Time = std::chrono::steady_clock::now() - Start;
-  return Time.count() / static_cast<double>(ACalls);
+double Median(std::vector<double> AValues) {
+  const auto Middle = AValues.begin() + static_cast<std::ptrdiff_t>(AValues.size() / 2);
+  std::nth_element(AValues.begin(), Middle, AValues.end());
+  return *Middle;
 }
+
+double Seconds(auto ARun) {
+  const auto Start = std::chrono::steady_clock::now();
+  ARun();
+  return std::chrono::duration<double>(std::chrono::steady_clock::now() - Start).count();
+}
+
+void Lines(std::size_t ACount, auto ACall) {
+  for (std::size_t i = 0; i < ACount; ++i) ACall();
+}
+
+void OnThreads(std::size_t AThreads, auto ARun) {
+  std::vector<std::thread> Running;
+  for (std::size_t t = 0; t < AThreads; ++t) Running.emplace_back(ARun);
+  for (std::thread& Thread : Running) Thread.join();
+}
+
+// In these two cases both sides take turns, so that what the machine does meanwhile meets both. The counter is the
+// median of the rounds.
+
+// One log call that writes, against the same bytes, preformatted, through one write(2): time to time.
 void LineByLoggerToOneWrite(benchmark::State& AState) {
   constexpr std::size_t cLines = 5000;
   const TPlainFile File;
@@ -97,17 +115,39 @@ void LineByLoggerToOneWrite(benchmark::State& AState) {
   std::vector<double> Ratios;
   std::size_t Allocated = 0;
   for (auto _ : AState) {
-    const double Plain = NanosecondsPerCall(cLines, [&] { File.Put(cLine, sizeof cLine - 1); });
+    const double Plain = Seconds([&] { Lines(cLines, [&] { File.Put(cLine, sizeof cLine - 1); }); });
     const std::size_t Before = Allocations;
-    const double Logged = NanosecondsPerCall(cLines, [&] { Logging.Log->Info(Message); });
+    const double Logged = Seconds([&] { Lines(cLines, [&] { Logging.Log->Info(Message); }); });
     Allocated += Allocations - Before;
     Ratios.push_back(Logged / Plain);
   }
-  std::nth_element(Ratios.begin(), Ratios.begin() + static_cast<std::ptrdiff_t>(Ratios.size() / 2), Ratios.end());
-  AState.counters["ratio"] = Ratios[Ratios.size() / 2];
+  AState.counters["ratio"] = Median(Ratios);
   AState.counters["allocations"] = static_cast<double>(Allocated) / static_cast<double>(cLines * AState.iterations());
 }
 BENCHMARK(LineByLoggerToOneWrite)->Unit(benchmark::kMillisecond)->Iterations(101);
+
+// Threads on one appender, against the same bytes written under one std::mutex: lines per second to lines per second.
+void ThreadsOnOneAppenderToOneMutex(benchmark::State& AState) {
+  constexpr std::size_t cLines = 20000;
+  const auto Threads = static_cast<std::size_t>(AState.range(0));
+  const TPlainFile File;
+  std::mutex Mutex;
+  const TLogging Logging;
+  const UnicodeString Message = cMessage;
+  std::vector<double> Ratios;
+  for (auto _ : AState) {
+    const auto PutLocked = [&] {
+      const std::lock_guard Guard(Mutex);
+      File.Put(cLine, sizeof cLine - 1);
+    };
+    const double Plain = Seconds([&] { OnThreads(Threads, [&] { Lines(cLines, PutLocked); }); });
+    const double Logged =
+        Seconds([&] { OnThreads(Threads, [&] { Lines(cLines, [&] { Logging.Log->Info(Message); }); }); });
+    Ratios.push_back(Plain / Logged);
+  }
+  AState.counters["ratio"] = Median(Ratios);
+}
+BENCHMARK(ThreadsOnOneAppenderToOneMutex)->Arg(2)->Arg(4)->Unit(benchmark::kMillisecond)->UseRealTime()->Iterations(21);
 
 // A call below the level, chain of three loggers, against two uncontended pairs of std::recursive_mutex.
 void TwoRecursiveMutexPairs(benchmark::State& AState) {
@@ -133,37 +173,6 @@ void CallBelowTheLevel(benchmark::State& AState) {
 }
 BENCHMARK(TwoRecursiveMutexPairs)->Repetitions(5)->ReportAggregatesOnly();
 BENCHMARK(CallBelowTheLevel)->Repetitions(5)->ReportAggregatesOnly();
-
-// Threads on one appender, against the same bytes written under one std::mutex. Items are lines in all.
-template <class TCall>
-void OnThreads(benchmark::State& AState, TCall ACall) {
-  constexpr std::size_t cLines = 100000;
-  const auto Threads = static_cast<std::size_t>(AState.range(0));
-  for (auto _ : AState) {
-    std::vector<std::thread> Running;
-    for (std::size_t t = 0; t < Threads; ++t)
-      Running.emplace_back([&] {
-        for (std::size_t i = 0; i < cLines; ++i) ACall();
-      });
-    for (std::thread& Thread : Running) Thread.join();
-  }
-  AState.SetItemsProcessed(static_cast<std::int64_t>(static_cast<std::size_t>(AState.iterations()) * Threads * cLines));
-}
-void ThreadsUnderOneMutex(benchmark::State& AState) {
-  const TPlainFile File;
-  std::mutex Mutex;
-  OnThreads(AState, [&] {
-    const std::lock_guard Guard(Mutex);
-    File.Put(cLine, sizeof cLine - 1);
-  });
-}
-void ThreadsOnOneAppender(benchmark::State& AState) {
-  const TLogging Logging;
-  const UnicodeString Message = cMessage;
-  OnThreads(AState, [&] { Logging.Log->Info(Message); });
-}
-BENCHMARK(ThreadsUnderOneMutex)->Arg(2)->Arg(4)->UseRealTime()->Iterations(2)->Repetitions(5)->ReportAggregatesOnly();
-BENCHMARK(ThreadsOnOneAppender)->Arg(2)->Arg(4)->UseRealTime()->Iterations(2)->Repetitions(5)->ReportAggregatesOnly();
 
 // 200,000 lines that roll at 1 MiB with 5 backups, against a loop that formats, writes and rolls the same way by hand.
 constexpr std::size_t cRollLines = 200000;

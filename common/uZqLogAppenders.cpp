@@ -94,11 +94,6 @@ void TZqTextFile::WriteLn(const UnicodeString& AValue) {
   FFile.WriteLn(AValue);
 }
 
-ZQ_HOT void TZqTextFile::WriteBytes(std::string_view ABytes) {
-  const TLockScope Scope(FCritSect);
-  FFile.WriteBytes(ABytes);
-}
-
 void TZqTextFile::Close() {
   const TLockScope Scope(FCritSect);
   FFile.Close();

@@ -75,7 +75,10 @@ class ZQ_API TZqTextFile : public TObject {
   /// With CR LF behind it.
   void WriteLn(const UnicodeString& AValue);
   /// UTF-8 as it is, line ends and all.
-  void WriteBytes(std::string_view ABytes);
+  void WriteBytes(std::string_view ABytes) {
+    const TLockScope Scope(FCritSect);
+    FFile.WriteBytes(ABytes);
+  }
   void Close();
 
  private:

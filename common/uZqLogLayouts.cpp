@@ -44,7 +44,7 @@ ZQ_HOT const char* TZqSimpleLayout::TimeNow() {
 }
 
 template <class TLine>
-inline void TZqSimpleLayout::Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+ZQ_HOT void TZqSimpleLayout::Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   ChangeIndent(ALogIndent);
   if (!FIndent.IsEmpty()) ALine.Append(FIndent);

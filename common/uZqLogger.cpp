@@ -378,7 +378,8 @@ ZQ_HOT void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel
     for (TZqLogger* Current = this; Current != nullptr;) {
       if (Current->FAppenders->Count() != 0 && Current->TZqLogger::GetLevel() <= ALogLevel)
         Current->WriteToAppenders(ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
-      Current = Current->FAdditive.load(std::memory_order_relaxed) ? Current->FParent.load(std::memory_order_relaxed) : nullptr;
+      Current = Current->FAdditive.load(std::memory_order_relaxed) ? Current->FParent.load(std::memory_order_relaxed)
+                                                                   : nullptr;
     }
   } catch (const Exception&) {  // logging never raises into its caller
   }
@@ -392,13 +393,13 @@ void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName, 
   Trace(AObject, Format(AMethodName, AArgs));
 }
 void TZqLogger::Debug(const UnicodeString& ALogMessage) { Log(llDebug, ALogMessage); }
-void TZqLogger::Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) {
-  Log(llDebug, Format(ALogMessage, AArgs));
-}
+void TZqLogger::Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) { Log(llDebug, Format(ALogMessage, AArgs)); }
 void TZqLogger::Debug(const UnicodeString& AMessage, const Variant& AValue) { Log(llDebug, AMessage, AValue); }
 void TZqLogger::Debug(const UnicodeString& AMessage, const TObject* AValue) { Log(llDebug, AMessage, AValue); }
 void TZqLogger::Debug(const UnicodeString& AMessage, const Exception& AValue) { Log(llDebug, AMessage, AValue); }
-ZQ_HOT void TZqLogger::Info(const UnicodeString& ALogMessage) { DoLog(FFullName, llInfo, ALogMessage, nullptr, liIndentNone); }
+ZQ_HOT void TZqLogger::Info(const UnicodeString& ALogMessage) {
+  DoLog(FFullName, llInfo, ALogMessage, nullptr, liIndentNone);
+}
 void TZqLogger::Warn(const UnicodeString& ALogMessage) { Log(llWarn, ALogMessage); }
 void TZqLogger::Error(const UnicodeString& ALogMessage) { Log(llError, ALogMessage); }
 void TZqLogger::Error(const UnicodeString& ALogMessage, const Exception& AException) {

@@ -91,9 +91,7 @@ std::size_t NarrowAscii(const char16_t* ASource, std::size_t ALength, char* ADes
   const auto IsAscii = [&](__m128i ABlock) {
     return _mm_movemask_epi8(_mm_cmpeq_epi8(_mm_and_si128(ABlock, High), _mm_setzero_si128())) == 0xFFFF;
   };
-  const auto Load = [&](std::size_t AAt) {
-    return _mm_loadu_si128(reinterpret_cast<const __m128i*>(ASource + AAt));
-  };
+  const auto Load = [&](std::size_t AAt) { return _mm_loadu_si128(reinterpret_cast<const __m128i*>(ASource + AAt)); };
   for (; i + 16 <= ALength; i += 16) {
     const __m128i Low8 = Load(i);
     const __m128i High8 = Load(i + 8);

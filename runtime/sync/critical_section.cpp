@@ -14,9 +14,9 @@ namespace zq {
 
 namespace {
 
-constexpr Cardinal cForEver = 0xFFFFFFFF;
 constexpr std::int64_t cSlice = 1'000'000;  // ns; see Wait
-constexpr int cSpins = 400;
+constexpr int cSpins = 2000;                // pauses in all, some 20 to 90 us
+constexpr int cLongestPause = 512;
 
 // Initial-exec: one load relative to the thread pointer, where a shared library would otherwise make a call.
 __attribute__((tls_model("initial-exec"))) constinit thread_local std::uint32_t ThreadId = 0;
@@ -67,24 +67,25 @@ ZQ_HOT bool TCriticalSection::TryEnter() noexcept {
   return true;
 }
 
-ZQ_HOT void TCriticalSection::Enter() noexcept {
-  if (!TryEnter()) [[unlikely]]
-    Wait(cForEver);
-}
-
-ZQ_HOT bool TCriticalSection::TryEnterFor(Cardinal AMilliseconds) noexcept { return TryEnter() || Wait(AMilliseconds); }
-
-// Leave stores and then reads FSleepers without a full barrier between them, which keeps leaving cheap: a wake-up can
-// be missed when a thread lies down at that very moment. Sleeping in slices bounds what that costs.
-[[gnu::noinline]] bool TCriticalSection::Wait(Cardinal AMilliseconds) noexcept {
-  for (int i = 0; i < cSpins; ++i) {
-    __builtin_ia32_pause();
+// The pauses between two looks grow, so that the owner can take the lock several times in a row before it changes cores
+// with all that it guards.
+bool TCriticalSection::Spin() noexcept {
+  for (int Pauses = 1, Left = cSpins; Left > 0; Left -= Pauses) {
+    Pauses = std::min(2 * Pauses, cLongestPause);
+    for (int i = 0; i < Pauses; ++i) __builtin_ia32_pause();
     if (TryEnter()) return true;
   }
+  return false;
+}
+
+// Leave reads FSleepers and stores without a full barrier about them, which keeps leaving cheap: a wake-up can be
+// missed when a thread lies down at that very moment. Sleeping in slices bounds what that costs.
+[[gnu::noinline]] bool TCriticalSection::Wait(Cardinal AMilliseconds) noexcept {
   const std::int64_t Deadline = AMilliseconds == cForEver ? 0 : Nanoseconds() + std::int64_t{AMilliseconds} * 1'000'000;
+  if (Spin()) return true;
   FSleepers.fetch_add(1);
   bool Taken = false;
-  for (std::int64_t Left = cSlice; !(Taken = TryEnter()) && Left > 0;) {
+  for (std::int64_t Left = cSlice; !Taken && Left > 0; Taken = Spin()) {
     if (Deadline != 0) Left = std::min(cSlice, Deadline - Nanoseconds());
     const std::uint32_t Owner = FOwner.load(std::memory_order_relaxed);
     if (Owner == 0 || Left <= 0) continue;
@@ -96,10 +97,8 @@ ZQ_HOT bool TCriticalSection::TryEnterFor(Cardinal AMilliseconds) noexcept { ret
   return Taken;
 }
 
-// Nothing of the lock is touched once it is free: whoever takes it next may destroy it.
-ZQ_HOT void TCriticalSection::Leave() noexcept {
-  if (--FDepth != 0) return;
-  const bool Wakes = FSleepers.load(std::memory_order_relaxed) != 0 && !FWaking.load(std::memory_order_relaxed);
+void TCriticalSection::LeaveAndWake() noexcept {
+  const bool Wakes = !FWaking.load(std::memory_order_relaxed);
   if (Wakes) FWaking.store(true, std::memory_order_relaxed);
   FOwner.store(0, std::memory_order_release);
   if (Wakes) Futex(FOwner, FUTEX_WAKE, 1, nullptr);

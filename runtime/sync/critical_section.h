@@ -15,8 +15,8 @@ namespace zq {
 /// Lock that its owner may take again, and must then leave as often.
 ///
 /// Taking a free lock is one atomic exchange, leaving it one store: there is no system call unless threads meet.
-/// Then a thread spins for some microseconds and goes to sleep. Not fair: a thread that comes by may take the lock
-/// before one that sleeps for it.
+/// Then a thread spins for a while, goes to sleep, and spins again once it is woken. Not fair: a thread that comes by
+/// may take the lock before one that waits for it.
 class ZQ_API TCriticalSection {
  public:
   TCriticalSection() noexcept = default;
@@ -24,20 +24,32 @@ class ZQ_API TCriticalSection {
   TCriticalSection& operator=(const TCriticalSection&) = delete;
   ~TCriticalSection() = default;
 
-  void Enter() noexcept;
+  void Enter() noexcept {
+    if (!TryEnter()) [[unlikely]]
+      Wait(cForEver);
+  }
   /// Never waits.
   [[nodiscard]] bool TryEnter() noexcept;
   /// Waits for at most that many milliseconds; 0xFFFFFFFF is for ever.
-  [[nodiscard]] bool TryEnterFor(Cardinal AMilliseconds) noexcept;
+  [[nodiscard]] bool TryEnterFor(Cardinal AMilliseconds) noexcept { return TryEnter() || Wait(AMilliseconds); }
   /// By the owner only.
-  void Leave() noexcept;
+  ZQ_HOT void Leave() noexcept {
+    // Nothing of the lock is touched once it is free: whoever takes it next may destroy it.
+    if (--FDepth != 0) return;
+    if (FSleepers.load(std::memory_order_relaxed) == 0) FOwner.store(0, std::memory_order_release);
+    else LeaveAndWake();
+  }
   void Acquire() noexcept { Enter(); }
   void Release() noexcept { Leave(); }
   [[nodiscard]] bool IsOwned() const noexcept { return FOwner.load(std::memory_order_relaxed) == GetCurrentThreadId(); }
 
  private:
+  static constexpr Cardinal cForEver = 0xFFFFFFFF;
+
   bool Take(std::uint32_t AThread) noexcept;
+  bool Spin() noexcept;
   bool Wait(Cardinal AMilliseconds) noexcept;
+  void LeaveAndWake() noexcept;
 
   std::atomic<std::uint32_t> FOwner = 0;  // thread id, and the word that sleepers wait on; 0 when free
   std::atomic<std::uint32_t> FSleepers = 0;
