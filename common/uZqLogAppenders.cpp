@@ -174,6 +174,8 @@ void TZqFileAppender::Initialize() {
   TZqBaseAppender::Initialize();
 }
 
+ZQ_HOT bool TZqFileAppender::PrepareWrite() { return true; }
+
 ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeString& ALoggerName,
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   const TScope Scope(FLock);

@@ -131,7 +131,7 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
  protected:
   ~TZqFileAppender() override = default;
   // Begins each Write, under its lock; a message is dropped for false.
-  virtual bool PrepareWrite() { return true; }
+  virtual bool PrepareWrite();
   // Writes the footer and closes the file, also when the footer fails, which raises then.
   void EndFile();
 
