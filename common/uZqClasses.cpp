@@ -4,8 +4,7 @@ namespace zq {
 
 using namespace uZqClasses;
 
-// ---- Counted objects
-// -------------------------------------------------------------------------------------------------
+// ---- Counted objects -----------------------------------------------------------------------------------------------
 
 Integer TZqRefCount::Up(bool AClaim) noexcept {
   const Integer Result = FCount.fetch_add(1, std::memory_order_relaxed) + 1;
@@ -39,8 +38,7 @@ void TZqObject::BeforeDestruction() {
   Implements::BeforeDestruction();
 }
 
-// ---- Linked objects
-// --------------------------------------------------------------------------------------------------
+// ---- Linked objects ------------------------------------------------------------------------------------------------
 
 TZqObjectEx::~TZqObjectEx() {  // finds partners only where the construction failed or a destructor made new ones
   try {
@@ -146,8 +144,7 @@ void TZqObjectAdapter::BeforeDestruction() {
   FObject = nullptr;
 }
 
-// ---- Components
-// ------------------------------------------------------------------------------------------------------
+// ---- Components ----------------------------------------------------------------------------------------------------
 
 TZqComponent::~TZqComponent() { ClearBindings(); }
 

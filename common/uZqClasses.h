@@ -19,8 +19,7 @@ inline constexpr TResStringRec _SCompRefCountNotZero{
 inline constexpr TResStringRec _SEncodingNotSupported{65510, u"The specified encoding is not supported!"};
 }  // namespace uZqClasses
 
-// ---- Interfaces
-// ------------------------------------------------------------------------------------------------------
+// ---- Interfaces ----------------------------------------------------------------------------------------------------
 
 struct IZqObject : Extends<IInterface> {
   static constexpr TGUID IID = "{0417F540-9CCC-4DE6-B2C4-1063D0508346}"_guid;
@@ -59,8 +58,7 @@ enum class TZqAutoDestroy : std::uint8_t {
 };
 using enum TZqAutoDestroy;
 
-// ---- Counted objects
-// -------------------------------------------------------------------------------------------------
+// ---- Counted objects -----------------------------------------------------------------------------------------------
 
 /// A reference count and what it means when it is zero. Any thread.
 class ZQ_API TZqRefCount {
@@ -225,8 +223,7 @@ class ZQ_API TZqObjectAdapter : public Implements<TInterfacedObject, IZqObjectAd
   TZqObjectOwnership FOwnership;
 };
 
-// ---- Components
-// ------------------------------------------------------------------------------------------------------
+// ---- Components ----------------------------------------------------------------------------------------------------
 
 /// A component with the count-or-own choice of TZqObject, and with its properties bound to those of other objects.
 ///

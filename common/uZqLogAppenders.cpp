@@ -17,6 +17,8 @@ constexpr Word cVista = 601;
 constexpr Integer cCommonDocuments = 46;
 constexpr std::size_t cKeptLine = 1 << 16;  // bytes
 
+bool IsBlank(const TFileName& AName) { return Trim(AName).IsEmpty(); }
+
 TZqSimpleLayout* ExactlySimple(const IntfRef<IZqLogLayout>& ALayout) {
   TComponent* const Component = ALayout ? ALayout->Component() : nullptr;
   const bool Simple = Component != nullptr && Component->ClassType() == ClassOf<TZqSimpleLayout>();
@@ -40,19 +42,25 @@ void TZqBaseAppender::BeforeDestruction() {
   Implements::BeforeDestruction();
 }
 
+IntfRef<IZqLogLayout> TZqBaseAppender::Layout() const {
+  const TScope Scope(FLock);
+  return FLayout;
+}
+
 void TZqBaseAppender::Initialize() { FInitialized = true; }
 
 void TZqBaseAppender::Close() { FInitialized = false; }
 
 void TZqBaseAppender::Write(
     const UnicodeString&, const UnicodeString&, TZqLogLevel, const UnicodeString&, PZqDataRec, TZqLogIndent) {
-  if (!FInitialized) Initialize();
+  if (!FInitialized && FInitializing == 0) Initialize();
 }
 
 void TZqBaseAppender::SetConfig(const IntfRef<IZqLogConfigurator>&) {}
 
 void TZqBaseAppender::SetLayout(const IntfRef<IZqLogLayout>& ALayout) {
   FLayout = ALayout;
+  FSimpleLayout = ExactlySimple(ALayout);
   if (const auto Told = ALayout.Supports<_IZqLogLayout>()) Told->Initialize(this);
 }
 
@@ -130,7 +138,7 @@ void TZqFileAppender::SetFileName(const TFileName& AValue) {
   if (AValue == FFileName) return;
   Close();
   const UnicodeString Ext = ExtractFileExt(AValue);
-  FFileName = Ext.IsEmpty() ? AValue + FFileExt : AValue;
+  FFileName = Ext.IsEmpty() && !IsBlank(AValue) ? AValue + FFileExt : AValue;
   if (!Ext.IsEmpty()) FFileExt = Ext;
 }
 
@@ -139,7 +147,7 @@ void TZqFileAppender::SetFileExt(const UnicodeString& AValue) {
   if (AValue == FFileExt) return;
   Close();
   FFileExt = AValue.View().starts_with(u'.') ? AValue : u"." + AValue;
-  FFileName = ChangeFileExt(FFileName, FFileExt);
+  if (!IsBlank(FFileName)) FFileName = ChangeFileExt(FFileName, FFileExt);
 }
 
 void TZqFileAppender::SetAppendExisting(bool AValue) {
@@ -163,13 +171,12 @@ void TZqFileAppender::Initialize() {
   const TScope Scope(FLock);
   const TInitializing Initializing(*this);
   FFileStream.reset();
-  if (Trim(FFileName).IsEmpty()) return;
+  if (IsBlank(FFileName)) return;
   if (!FAppendExisting && FileExists(FFileName)) DeleteFile(FFileName);
   FFileStream = std::make_unique<TZqTextFile>(FFileName);
-  FSimpleLayout = ExactlySimple(FLayout);
-  if (FLayout) {
-    const UnicodeString Header = FLayout->GetHeader();
-    if (!Header.IsEmpty()) FFileStream->WriteLn(Header);
+  if (const auto Layout = FLayout) {
+    const UnicodeString Header = Layout->GetHeader();
+    if (!Header.IsEmpty() && FFileStream) FFileStream->WriteLn(Header);
   }
   TZqBaseAppender::Initialize();
 }
@@ -183,7 +190,8 @@ ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeSt
   TZqBaseAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
   if (!FLayout || !FFileStream) return;
   if (FSimpleLayout == nullptr) {
-    const UnicodeString Line = FLayout->FormatLine(ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+    const auto Layout = FLayout;
+    const UnicodeString Line = Layout->FormatLine(ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
     if (!Line.IsEmpty() && FFileStream) FFileStream->WriteLn(Line);
     return;
   }
@@ -198,14 +206,19 @@ ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeSt
 }
 
 void TZqFileAppender::EndFile() {
-  const std::unique_ptr<TZqTextFile> Ended = std::move(FFileStream);
-  if (!Ended || !FLayout) return;
-  const UnicodeString Footer = FLayout->GetFooter();
-  if (!Footer.IsEmpty()) Ended->Write(Footer);
+  struct TEnd {
+    ~TEnd() { Stream.reset(); }
+    std::unique_ptr<TZqTextFile>& Stream;
+  } const End{FFileStream};
+  const TInitializing Ending(*this);
+  const auto Layout = FFileStream ? FLayout : nullptr;
+  const UnicodeString Footer = Layout ? Layout->GetFooter() : u"";
+  if (!Footer.IsEmpty() && FFileStream) FFileStream->Write(Footer);
 }
 
 void TZqFileAppender::Close() {
   const TScope Scope(FLock);
+  if (FInitializing != 0) return;
   FInitialized = false;
   EndFile();
 }
@@ -264,9 +277,9 @@ std::vector<TZqRollingFileAppender::TEntry> TZqRollingFileAppender::ScanSeries()
 }
 
 void TZqRollingFileAppender::Renumber(const TEntry& AEntry, std::size_t APosition) {
-  const UnicodeString Path = Folder();
+  const UnicodeString Path = Folder(), Ext = ExtractFileExt(FFileName);  // FileExt may hold a dot of its own
   const UnicodeString Name =
-      Base() + u"." + IntToStr(static_cast<Int64>(APosition) + 1) + AEntry.Info->FileNameRight + FFileExt;
+      Base() + u"." + IntToStr(static_cast<Int64>(APosition) + 1) + AEntry.Info->FileNameRight + Ext;
   if (Name == AEntry.Name) return;
   if (FileExists(Path + Name)) DeleteFile(Path + Name);
   RenameFile(Path + AEntry.Name, Path + Name);
@@ -300,7 +313,7 @@ void TZqRollingFileAppender::CheckBackupCount() {
 
 ZQ_HOT void TZqRollingFileAppender::CheckRollover() {
   const TScope Scope(FLock);
-  if (FFileStream && FMaxFileSize != 0 && FFileStream->Size() >= FMaxFileSize) RollOver();
+  if (FFileStream && FMaxFileSize != 0 && FFileStream->Size() >= FMaxFileSize && FInitializing == 0) RollOver();
 }
 
 ZQ_HOT bool TZqRollingFileAppender::PrepareWrite() {
@@ -339,7 +352,10 @@ void TZqRollingFileAppender::SetMaxFileSize(Cardinal AValue) {
 void TZqRollingFileAppender::SetMaxBackupCount(Word AValue) {
   const TScope Scope(FLock);
   FMaxBackupCount = AValue;
-  if (AValue == 0) FFileStream.reset();
+  if (AValue == 0) {
+    FFileStream.reset();
+    FInitialized = false;
+  }
   CheckBackupCount();
 }
 

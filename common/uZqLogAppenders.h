@@ -1,6 +1,5 @@
 #pragma once
 
-#include <atomic>
 #include <memory>
 
 #include "common/uZqLogLayouts.h"
@@ -18,8 +17,9 @@ namespace zq {
 class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZqLogAppenderEx> {
  public:
   using Implements::Implements;
-  [[nodiscard]] IntfRef<IZqLogLayout> Layout() const { return FLayout; }
+  [[nodiscard]] IntfRef<IZqLogLayout> Layout() const;
 
+  /// Opens what the appender writes to; the first Write does so too. Raises what the opening raises.
   virtual void Initialize();
   /// Reads the appender's settings under its name.
   virtual void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig);
@@ -27,10 +27,12 @@ class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZq
   void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
   void Close() override;
+  /// An empty reference takes the layout away.
   void SetLayout(const IntfRef<IZqLogLayout>& ALayout) override;
   void SetLayout(TZqLogBaseClass ALayout) override;
   void SetLayout(const ShortString& ALayout) override;
 
+  /// Several operations as one; other threads' messages wait meanwhile. May be nested.
   void Lock() const noexcept { FLock.Enter(); }
   void Unlock() const noexcept { FLock.Leave(); }
 
@@ -39,7 +41,8 @@ class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZq
   void AfterConstruction() override;
   void BeforeDestruction() override;
 
-  // For descendants: Initialize runs in this scope, and who rolls a file sees it and doesn't start another one.
+  // For descendants: Initialize and the end of a file run in this scope. A message from within, of a layout that logs,
+  // goes into the file that is there; nothing is opened, rolled or closed for it.
   class TInitializing {
    public:
     explicit TInitializing(TZqBaseAppender& AAppender) noexcept : FAppender(AAppender) { ++FAppender.FInitializing; }
@@ -52,9 +55,10 @@ class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZq
   };
   using TScope = TLockScope<TCriticalSection>;
 
-  IntfRef<IZqLogLayout> FLayout;
+  IntfRef<IZqLogLayout> FLayout;  // changed by SetLayout alone
   bool FInitialized = false;
-  Integer FInitializing = 0;
+  Integer FInitializing = 0;                 // depth of TInitializing
+  TZqSimpleLayout* FSimpleLayout = nullptr;  // FLayout, if it is of just that class
   mutable TCriticalSection FLock;
 };
 
@@ -93,11 +97,12 @@ struct ZQ_API IZqFileAppender : Extends<IZqLogAppender> {
   virtual bool GetAppendExisting() const = 0;
   virtual UnicodeString GetFileExt() const = 0;
   /// Closes the present file. A name without extension gets FileExt, one with an extension changes it. With an empty
-  /// name nothing is written.
+  /// name, or one of blanks, nothing is written. What Close raises leaves the name as it was.
   virtual void SetFileName(const TFileName& AValue) = 0;
   /// False: an existing file is not continued when it is opened.
   virtual void SetAppendExisting(bool AValue) = 0;
-  /// Closes the present file and changes the extension of its name. The dot may be left out.
+  /// Closes the present file and changes the extension of its name. The dot may be left out. What Close raises leaves
+  /// both as they were.
   virtual void SetFileExt(const UnicodeString& AValue) = 0;
 
  protected:
@@ -111,14 +116,17 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
  public:
   TZqFileAppender(TZqLogger* ALogger, const UnicodeString& AName);
 
+  /// Raises EInOutError when the file can't be opened; the next Write tries again.
   void Initialize() override;
   void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) override;
+  /// Raises EInOutError when the line can't be written.
   void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
   /// Raises EInOutError when the footer can't be written; the file is closed all the same.
   void Close() override;
   using TZqBaseAppender::SetLayout;
-  /// Closes the present file; a layout that has an extension of its own changes the file's.
+  /// Closes the present file; a layout that has an extension of its own changes the file's. What Close raises leaves the
+  /// layout as it was.
   void SetLayout(const IntfRef<IZqLogLayout>& ALayout) override;
 
   TFileName GetFileName() const override;
@@ -141,8 +149,7 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
   UnicodeString FFileExt = u".log";
 
  private:
-  TZqSimpleLayout* FSimpleLayout = nullptr;  // the layout of the open file, if it is of just that class
-  utf8::TBuffer FSpareLine;                  // room of the last line, for the next one
+  utf8::TBuffer FSpareLine;  // room of the last line, for the next one
 };
 
 struct ZQ_API IZqRollingFileAppender : Extends<IZqFileAppender> {
@@ -152,9 +159,10 @@ struct ZQ_API IZqRollingFileAppender : Extends<IZqFileAppender> {
   /// Files of the series, the log file among them. 0: nothing is written.
   virtual Word GetMaxBackupCount() const = 0;
   virtual void SetMaxFileSize(Cardinal AValue) = 0;
-  /// Deletes what the series has beyond it at once; 0 deletes the log file too.
+  /// Deletes what the series has beyond it at once; 0 ends the file without a footer and deletes it too.
   virtual void SetMaxBackupCount(Word AValue) = 0;
-  /// Ends the file, renumbers the series and begins a new file.
+  /// Ends the file, renumbers the series and begins a new file. Raises EInOutError when that can't be opened; messages
+  /// go nowhere then until Close.
   virtual void RollOver() = 0;
 
  protected:
@@ -188,7 +196,9 @@ class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRoll
   Word GetMaxBackupCount() const override;
   void SetMaxFileSize(Cardinal AValue) override;
   void SetMaxBackupCount(Word AValue) override;
+  /// Deletes what the series has beyond MaxBackupCount.
   virtual void CheckBackupCount();
+  /// Rolls if the file has reached MaxFileSize.
   virtual void CheckRollover();
   void RollOver() override;
 

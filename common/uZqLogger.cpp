@@ -1,6 +1,7 @@
 #include "common/uZqLogger.h"
 
 #include <algorithm>
+#include <set>
 #include <utility>
 
 #include "common/uZqLogAppenders.h"
@@ -18,7 +19,7 @@ namespace zq {
 namespace {
 
 constexpr Cardinal cLockTries = 5001;  // one millisecond each
-constexpr Integer cMaxNesting = 32;    // an appender that logs into its own logger is cut off here
+constexpr Integer cMaxNesting = 4;     // of an appender that logs into its own logger, perhaps several lines for one
 constexpr char16_t cAppenderListRequest[] = u".AppenderList.Remove";
 constexpr char16_t cLoggerListRequest[] = u".LoggerList.Remove";
 
@@ -141,7 +142,7 @@ TZqLogger* TZqLoggerList::FindLogger(const UnicodeString& AName) {
 TZqLogAppenderList::TZqLogAppenderList(TZqLogger* ALogger) : TComponent(nullptr), FLogger(ALogger) {}
 
 void TZqLogAppenderList::BeforeDestruction() {
-  TakeItems([](const auto&) { return true; });  // an appender that ends here writes its footer: with no lock held
+  TakeAll();  // an appender that ends here writes its footer: with no lock held
   const TLockScope Ending(EndLock);
   TComponent::BeforeDestruction();
 }
@@ -149,15 +150,14 @@ void TZqLogAppenderList::BeforeDestruction() {
 void TZqLogAppenderList::Add(const IntfRef<IZqLogAppender>& AAppender) {
   Assert(static_cast<bool>(AAppender));
   const TLogLockScope Scope(FLock, FLogger->FFullName, cAppenderListRequest);
+  const auto Added = std::make_shared<const TEntry>(TEntry{AAppender, AAppender->Component()});
   {
     const TLockScope Guard(FItemsLock);
-    TComponent* const Added = AAppender->Component();
-    for (const auto& Item : FList)
-      if (*Item == AAppender || (Added != nullptr && (*Item)->Component() == Added)) return;
-    FList.push_back(std::make_shared<const IntfRef<IZqLogAppender>>(AAppender));
+    if (std::any_of(FList.begin(), FList.end(), [&](const TItem& AItem) { return AItem->IsSame(*Added); })) return;
+    FList.push_back(Added);
     FCount = static_cast<Integer>(FList.size());
   }
-  if (TComponent* const Component = AAppender->Component()) Component->FreeNotification(this);
+  if (Added->Component != nullptr) Added->Component->FreeNotification(this);
 }
 
 IntfRef<IZqLogAppender> TZqLogAppenderList::Add(TZqLogBaseClass AAppender) {
@@ -189,27 +189,34 @@ template <class TLeaves>
 TZqLogAppenderList::TItems TZqLogAppenderList::TakeItems(TLeaves ALeaves) {
   const TLockScope Guard(FItemsLock);
   const auto Kept =
-      std::stable_partition(FList.begin(), FList.end(), [&](const auto& AItem) { return !ALeaves(*AItem); });
+      std::stable_partition(FList.begin(), FList.end(), [&](const TItem& AItem) { return !ALeaves(*AItem); });
   TItems Result(std::make_move_iterator(Kept), std::make_move_iterator(FList.end()));
   FList.erase(Kept, FList.end());
   FCount = static_cast<Integer>(FList.size());
   return Result;
 }
 
+// Nobody tells this list any more of an appender that may end as soon as its count is dropped.
+TZqLogAppenderList::TItems TZqLogAppenderList::TakeAll() {
+  TItems Result = TakeItems([](const TEntry&) { return true; });
+  for (const TItem& Item : Result)
+    if (Item->Component != nullptr) Item->Component->RemoveFreeNotification(this);
+  return Result;
+}
+
 void TZqLogAppenderList::Remove(const IntfRef<IZqLogAppender>& AAppender) {
+  Assert(static_cast<bool>(AAppender));
   TItems Dropped;
   const TLogLockScope Scope(FLock, FLogger->FFullName, cAppenderListRequest);
-  TComponent* const Component = AAppender->Component();
-  Dropped = TakeItems([&](const auto& AItem) {
-    return AItem == AAppender || (Component != nullptr && AItem->Component() == Component);
-  });
-  if (Component != nullptr) Component->RemoveFreeNotification(this);
+  const TEntry Removed{AAppender, AAppender->Component()};
+  Dropped = TakeItems([&](const TEntry& AEntry) { return AEntry.IsSame(Removed); });
+  if (Removed.Component != nullptr) Removed.Component->RemoveFreeNotification(this);
 }
 
 void TZqLogAppenderList::Clear() {
   TItems Dropped;
   const TLogLockScope Scope(FLock, FLogger->FFullName, cAppenderListRequest);
-  Dropped = TakeItems([](const auto&) { return true; });
+  Dropped = TakeAll();
 }
 
 ZQ_HOT TZqLogAppenderList::TItem TZqLogAppenderList::ItemOrNone(std::size_t AIndex) const {
@@ -220,13 +227,13 @@ ZQ_HOT TZqLogAppenderList::TItem TZqLogAppenderList::ItemOrNone(std::size_t AInd
 IntfRef<IZqLogAppender> TZqLogAppenderList::GetAppender(Integer AIndex) const {
   const TItem Item = AIndex < 0 ? nullptr : ItemOrNone(static_cast<std::size_t>(AIndex));
   if (!Item) throw EListError(u"List index out of bounds (%d)", {AIndex});
-  return *Item;
+  return Item->Appender;
 }
 
 void TZqLogAppenderList::Notification(TComponent* AComponent, TOperation AOperation) {
   TComponent::Notification(AComponent, AOperation);
   if (AOperation == opRemove && AComponent != this)
-    TakeItems([&](const auto& AItem) { return AItem->Component() == AComponent; });
+    TakeItems([&](const TEntry& AEntry) { return AEntry.Component == AComponent; });
 }
 
 // ---------------------------------------------------------------------------------------- TZqLogger
@@ -245,13 +252,30 @@ void TZqLogger::AfterConstruction() {
   if (TZqLogger* const Above = FParent) Above->FChildLoggers.AddLogger(this);
 }
 
+namespace {
+
+// A count that no _Release takes part in.
+class THold {
+ public:
+  explicit THold(std::atomic<Integer>& ACount) noexcept : FCount(ACount) { ++FCount; }
+  THold(const THold&) = delete;
+  THold& operator=(const THold&) = delete;
+  ~THold() { --FCount; }
+
+ private:
+  std::atomic<Integer>& FCount;
+};
+
+}  // namespace
+
 void TZqLogger::BeforeDestruction() {
   {
+    const THold Hold(FRefCount);  // the children's counts may be the last ones
     const TLogLockScope Scope(FLock, FFullName, u".BeforeDestruction");
     if (TZqLogger* const Above = FParent) Above->FChildLoggers.RemoveLogger(this);
     ClearChildLoggers();
   }
-  FConfigurator.Reset();
+  SetConfigurator(nullptr);
   try {
     if (RefCount() != 0) AssertionFailed(Format(u"The refcount of \"%s\" is not equal to 0!", {FFullName}));
   } catch (const Exception&) {  // for a debugger to see: the destruction goes on
@@ -287,10 +311,13 @@ Integer TZqLogger::_Release() {
     if (FRefCount.compare_exchange_weak(Count, Count - 1, std::memory_order_acq_rel)) return Count - 1;
   TZqLogger* const Above = FParent;
   if (Above == nullptr) return FRefCount.fetch_sub(1, std::memory_order_acq_rel) - 1;
-  {
+  try {
     const TLogLockScope Scope(Above->FChildLoggers.FLock, Above->FFullName, cLoggerListRequest);
     Count = FRefCount.fetch_sub(1, std::memory_order_acq_rel) - 1;
     if (Count == 0) Above->FChildLoggers.RemoveLogger(this);
+  } catch (const Exception&) {  // listed still, it goes with the next reference that somebody takes and drops
+    FRefCount.fetch_sub(1, std::memory_order_acq_rel);
+    throw;
   }
   if (Count == 0) Free();
   return Count;
@@ -313,12 +340,28 @@ void TZqLogger::SetLevel(TZqLogLevel AValue) {
   FParentLevel.store(false, std::memory_order_relaxed);
 }
 
+IntfRef<IZqLogConfigurator> TZqLogger::Configurator() const {
+  const TLockScope Guard(FConfigLock);
+  return FConfigurator;
+}
+
+IntfRef<IZqLogConfigurator> TZqLogger::SetConfigurator(IntfRef<IZqLogConfigurator> AConfig) {
+  const TLockScope Guard(FConfigLock);
+  return std::exchange(FConfigurator, std::move(AConfig));
+}
+
+// What goes here is dropped with no lock held: a configurator may hold loggers.
 void TZqLogger::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
+  std::vector<IntfRef<TZqLogger>> Children;
+  IntfRef<IZqLogConfigurator> Former;
   const TLogLockScope Scope(FLock, FFullName, u".SetConfig");
-  FConfigurator = AConfig;
+  Former = SetConfigurator(AConfig);
   if (AConfig) return;
-  const TLogLockScope Children(FChildLoggers.FLock, FFullName, u".SetConfig");
-  for (TZqLogger* const Child : FChildLoggers.FList) Child->SetConfig(nullptr);
+  {
+    const TLogLockScope Listed(FChildLoggers.FLock, FFullName, u".SetConfig");
+    Children.assign(FChildLoggers.FList.begin(), FChildLoggers.FList.end());
+  }
+  for (const auto& Child : Children) Child->SetConfig(nullptr);
 }
 
 IntfRef<TZqLogger> TZqLogger::FindOrMakeChild(const UnicodeString& AName, bool& AMade) {
@@ -337,7 +380,7 @@ IntfRef<IZqLogger> TZqLogger::GetLogger(const UnicodeString& AName) {
     bool Made = false;
     Current = Current->FindOrMakeChild(Path.Strings(i), Made);
     const TZqLogger* const Root = RootLogger;
-    if (Made) Current->SetConfig(Root == nullptr ? nullptr : Root->FConfigurator);
+    if (Made) Current->SetConfig(Root == nullptr ? nullptr : Root->Configurator());
   }
   return Current;
 }
@@ -366,8 +409,8 @@ inline void TZqLogger::WriteToAppenders(const UnicodeString& ASender, TZqLogLeve
   if (List.FNesting > cMaxNesting) return;
   const auto AtStart = static_cast<std::size_t>(List.Count());
   for (std::size_t i = 0; i < AtStart; ++i)
-    if (const auto Appender = List.ItemOrNone(i))
-      (*Appender)->Write(ASender, FFullName, ALogLevel, ALogMessage, AValue, ALogIndent);
+    if (const auto Item = List.ItemOrNone(i))
+      Item->Appender->Write(ASender, FFullName, ALogLevel, ALogMessage, AValue, ALogIndent);
 }
 
 // Level and count are tested first, so that a message that nobody writes takes no lock. Each lock is left before the
@@ -457,6 +500,7 @@ void TZqLogger::Log(
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
 void TZqLogger::Log(const IntfRef<IZqLogData>& ALogData) {
+  Assert(static_cast<bool>(ALogData));
   const TZqLogData& Event = *ALogData->Data();
   Log(Event.LogLevel, Event.LogMessage, Event.Indent);
 }
@@ -477,6 +521,15 @@ TZqLogBase::TZqLogBase(TZqLogger* ALogger, const UnicodeString& AName) : Impleme
   if (!AName.IsEmpty() && (AName[1] < u'0' || AName[1] > u'9')) SetName(AName);
 }
 
+namespace {
+
+void ForgetAppender(const TZqLogBase* AObject) {
+  const std::lock_guard Guard(AppendersLock);
+  if (Appenders != nullptr) std::erase(*Appenders, AObject);
+}
+
+}  // namespace
+
 void TZqLogBase::AfterConstruction() {
   Implements::AfterConstruction();
   if (dynamic_cast<TZqBaseAppender*>(this) == nullptr) return;
@@ -485,11 +538,11 @@ void TZqLogBase::AfterConstruction() {
   Appenders->push_back(this);
 }
 
+// An appender whose AfterConstruction raised, further down, is listed still.
+TZqLogBase::~TZqLogBase() { ForgetAppender(this); }
+
 void TZqLogBase::BeforeDestruction() {
-  if (dynamic_cast<TZqBaseAppender*>(this) != nullptr) {
-    const std::lock_guard Guard(AppendersLock);
-    if (Appenders != nullptr) std::erase(*Appenders, this);
-  }
+  ForgetAppender(this);
   const TLockScope Ending(EndLock);
   if (RefCount() != 0) LeaveLists();
   Implements::BeforeDestruction();
@@ -589,18 +642,17 @@ TZqLogData::TZqLogData(TZqLogLevel ALogLevel, UnicodeString ALogMessage)
 
 namespace {
 
-// Dumps an object and the persistent objects that it publishes. An object that is being dumped further up gets its head
-// line only: objects may lead back to each other.
+// Dumps an object and the persistent objects that it publishes. An object met again gets its head line only, and so does
+// what lies too deep: objects may lead to each other in circles, and getters may make a new one at each call.
 class TDumper {
  public:
   void Dump(TObject* AObject, const UnicodeString& AIndent) {
     const auto* const Component = dynamic_cast<const TComponent*>(AObject);
     Text += AIndent + u"object " + (Component == nullptr ? UnicodeString() : Component->Name()) + u": " +
             AObject->ClassName() + u"\r\n";
-    if (std::find(FOpen.begin(), FOpen.end(), AObject) != FOpen.end()) return;
-    FOpen.push_back(AObject);
+    constexpr std::size_t MaxIndent = 64, MaxObjects = 10000;
+    if (AIndent.size() > MaxIndent || FMet.size() >= MaxObjects || !FMet.insert(AObject).second) return;
     for (const PPropInfo Property : GetPropList(AObject)) DumpProperty(AObject, Property, AIndent + u"  ");
-    FOpen.pop_back();
   }
   UnicodeString Text;
 
@@ -634,7 +686,7 @@ class TDumper {
     }
   }
 
-  std::vector<const TObject*> FOpen;
+  std::set<const TObject*> FMet;
 };
 
 UnicodeString DumpObject(const TObject* AObject) {

@@ -103,12 +103,14 @@ struct ZQ_API IZqLogBase : Extends<IInterface> {
 };
 
 /// Takes messages from loggers. Called on the thread that logs, under the lock of the logger's appender list; what it
-/// raises ends the message's way there and reaches nobody.
+/// raises ends the message's way there and reaches nobody. One that logs into its own logger gets those messages too,
+/// but only a few levels deep; further ones are dropped there.
 struct ZQ_API IZqLogAppender : Extends<IZqLogBase> {
   static constexpr TGUID IID = "{D10CACCF-3B7D-4CBB-96D3-7C22BEF8FE7E}"_guid;
   /// ASender is the full name of the logger that was called, ALoggerName that of the logger whose appender this is.
   virtual void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) = 0;
+  /// Ends what is open; the next Write opens it again. Raises what the last bytes raise; it is closed all the same.
   virtual void Close() = 0;
 
  protected:
@@ -118,9 +120,11 @@ struct ZQ_API IZqLogAppender : Extends<IZqLogBase> {
 /// Turns messages into text, for one appender and under its lock.
 struct ZQ_API IZqLogLayout : Extends<IZqLogBase> {
   static constexpr TGUID IID = "{5008EFF8-569C-4FD3-8C1D-FCCEF0DF632E}"_guid;
+  /// The last text of a file, without a line end; empty for none.
   virtual UnicodeString GetFooter() = 0;
+  /// The first line of a file, without a line end; empty for none.
   virtual UnicodeString GetHeader() = 0;
-  /// Without a line end.
+  /// Without a line end; empty for no line at all.
   virtual UnicodeString FormatLine(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) = 0;
 
@@ -152,6 +156,7 @@ struct ZQ_API IZqLogLayoutEx : Extends<IZqLogLayout> {
 /// A layout that is told which appender it now serves.
 struct ZQ_API _IZqLogLayout : Extends<IInterface> {
   static constexpr TGUID IID = "{D47392EB-1BA9-4A9E-B586-0F8FCFF87448}"_guid;
+  /// By SetLayout of the appender, under its lock.
   virtual void Initialize(TZqLogBase* ALogBase) = 0;
 
  protected:
@@ -176,6 +181,7 @@ struct ZQ_API IZqLogConfigurator : Extends<IInterface> {
 
 struct ZQ_API IZqLogConfiguratorEx : Extends<IZqLogConfigurator> {
   static constexpr TGUID IID = "{A57D0CA9-7632-4A0E-8333-DAF4BDA6CF3E}"_guid;
+  /// Sets up a logger that is given this configurator, before its settings are read.
   virtual void ConfigureLogger(TZqLogger* ALogger) = 0;
 
  protected:
@@ -186,6 +192,7 @@ struct ZQ_API IZqLogConfiguratorEx : Extends<IZqLogConfigurator> {
 
 struct ZQ_API IZqLogData : Extends<IInterface> {
   static constexpr TGUID IID = "{63196C58-37A5-47C3-9217-D04A6FDEE05F}"_guid;
+  /// The event itself, as long as it is referenced.
   virtual TZqLogData* Data() = 0;
 
  protected:
@@ -196,6 +203,7 @@ struct ZQ_API IZqLogData : Extends<IInterface> {
 /// are for who reads the event itself.
 class ZQ_API TZqLogData : public Implements<TInterfacedObject, IZqLogData> {
  public:
+  /// Fills in the computer, the user, the system and the time of now.
   TZqLogData(TZqLogLevel ALogLevel, UnicodeString ALogMessage);
   TZqLogData* Data() override { return this; }
 
@@ -219,14 +227,19 @@ class ZQ_API TZqLogData : public Implements<TInterfacedObject, IZqLogData> {
 };
 
 /// The value as text. Objects are dumped with their published read-write properties, one line each; an object that
-/// leads back to itself is shown once. Raises what a conversion raises.
+/// is met again, or lies very deep, is told by its head line alone. Raises what a conversion raises.
 [[nodiscard]] ZQ_API UnicodeString ZqDataRecToString(PZqDataRec AValue);
 
 // ---------------------------------------------------------------------------------------- loggers
 
-/// A named logger of the tree. Any thread may call any operation. Logging never raises, apart from a format text that
-/// doesn't fit its arguments; operations on the tree and on the appenders raise Exception when a lock stays busy for
-/// some five seconds.
+namespace detail {
+template <class T>
+concept TNumber = std::is_arithmetic_v<T> && std::constructible_from<Variant, T>;
+}
+
+/// A named logger of the tree. Any thread may call any operation. Logging lets no Exception out, apart from the
+/// EConvertError of a format text that doesn't fit its arguments; what an appender raises beside Exception is let out.
+/// Operations on the tree and on the appenders raise Exception when a lock stays busy for some five seconds.
 struct ZQ_API IZqLogger : Extends<IInterface> {
   static constexpr TGUID IID = "{C9719FC7-DE99-4B3B-A008-A480D810D29E}"_guid;
   /// Empty at the root.
@@ -234,8 +247,10 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   virtual bool GetParentLevel() const = 0;
   /// That of the nearest ancestor that has one of its own, unless this logger has.
   virtual TZqLogLevel GetLevel() const = 0;
+  /// The logger's own lists, valid as long as it lives.
   virtual TZqLogAppenderList* GetAppenders() = 0;
   virtual TZqLoggerList* GetChildLoggers() = 0;
+  /// Whether messages go on to the parent.
   virtual bool GetAdditive() const = 0;
   /// The dotted path, "root.a.b".
   virtual UnicodeString GetName() const = 0;
@@ -245,6 +260,7 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   virtual void SetParentLevel(bool AValue) = 0;
   /// Also ends taking the level from the parent.
   virtual void SetLevel(TZqLogLevel AValue) = 0;
+  /// Keeps a count on AConfig; new children get the root's. An empty one is handed down to all children.
   virtual void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) = 0;
   /// Finds or makes the logger at a dotted path below this one; this logger itself for an empty path.
   virtual IntfRef<IZqLogger> GetLogger(const UnicodeString& AName) = 0;
@@ -266,6 +282,11 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   virtual void Debug(const UnicodeString& AMessage, const Variant& AValue) = 0;
   virtual void Debug(const UnicodeString& AMessage, const TObject* AValue) = 0;
   virtual void Debug(const UnicodeString& AMessage, const Exception& AValue) = 0;
+  /// A number goes as a Variant, and a literal 0 is none but a number.
+  template <detail::TNumber T>
+  void Debug(const UnicodeString& AMessage, T AValue) {
+    Debug(AMessage, Variant(AValue));
+  }
   virtual void Info(const UnicodeString& ALogMessage) = 0;
   virtual void Warn(const UnicodeString& ALogMessage) = 0;
   virtual void Error(const UnicodeString& ALogMessage) = 0;
@@ -274,6 +295,7 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   virtual void Fatal(const Exception& AException) = 0;
   virtual void Fatal(const UnicodeString& ALogMessage, const Exception& AException) = 0;
   virtual void Count(const UnicodeString& ACounter, Integer AValue) = 0;
+  /// Does nothing.
   virtual void ClearLog() = 0;
   virtual void EnterMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
   virtual void EnterMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
@@ -293,6 +315,11 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   virtual void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Exception& AValue,
       TZqLogIndent ALogIndent = liIndentNone) = 0;
   virtual void Log(const IntfRef<IZqLogData>& ALogData) = 0;
+  template <detail::TNumber T>
+  void Log(
+      TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, T AValue, TZqLogIndent ALogIndent = liIndentNone) {
+    Log(ALogLevel, ALogMessage, Variant(AValue), ALogIndent);
+  }
 
   /// The logger holds a count on AAppender until it is removed.
   virtual void AddAppender(const IntfRef<IZqLogAppender>& AAppender) = 0;
@@ -300,7 +327,7 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   virtual void AddAppender(TZqLogBaseClass AAppender) = 0;
   virtual void RemoveAppender(const IntfRef<IZqLogAppender>& AAppender) = 0;
   virtual void ClearAppenders() = 0;
-  /// The list, locked for a walk until UnLockAppenders.
+  /// The list, locked for a walk until this thread calls UnLockAppenders.
   virtual TZqLogAppenderList* LockAppenders() = 0;
   virtual void UnLockAppenders() = 0;
 
@@ -338,11 +365,12 @@ class ZQ_API TZqLoggerList : public TObject {
   explicit TZqLoggerList(TZqLogger* ALogger) noexcept : FLogger(ALogger) {}
   ~TZqLoggerList() override;
 
+  /// False, or Exception if ARaise, where the lock stays busy for some five seconds. Unlock is the same thread's.
   bool Lock(const UnicodeString& ALockRequestedBy, bool ARaise) { return FLock.Enter(ALockRequestedBy, ARaise); }
   void Unlock() noexcept { FLock.Leave(); }
   void AddLogger(TZqLogger* ALogger);
   void RemoveLogger(TZqLogger* ALogger);
-  /// Count and GetLogger take no lock: who walks the list holds it.
+  /// Count and GetLogger take no lock: who walks the list holds it. GetLogger raises EListError.
   [[nodiscard]] Integer Count() const noexcept { return static_cast<Integer>(FList.size()); }
   [[nodiscard]] IntfRef<IZqLogger> GetLogger(Integer AIndex) const;
   /// By the last component, exactly; nullptr if there is none. Not counted: safe to use only under the list's lock.
@@ -361,7 +389,7 @@ class ZQ_API TZqLogAppenderList : public TComponent {
  public:
   explicit TZqLogAppenderList(TZqLogger* ALogger);
 
-  /// Adds an appender once, however often it is called.
+  /// Adds an appender once, however often it is called. Raises EAssertionFailed for an empty reference.
   void Add(const IntfRef<IZqLogAppender>& AAppender);
   /// Makes an appender of that class, with the class name as its name.
   IntfRef<IZqLogAppender> Add(TZqLogBaseClass AAppender);
@@ -372,9 +400,10 @@ class ZQ_API TZqLogAppenderList : public TComponent {
   IntfRef<IZqLogAppender> Add(const ShortString& AAppender, const ShortString& ALayout);
   void Remove(const IntfRef<IZqLogAppender>& AAppender);
   void Clear();
-  /// Count and GetAppender take no lock: who walks the list holds it.
+  /// Count and GetAppender take no lock: who walks the list holds it. GetAppender raises EListError.
   [[nodiscard]] Integer Count() const noexcept { return FCount.load(std::memory_order_relaxed); }
   [[nodiscard]] IntfRef<IZqLogAppender> GetAppender(Integer AIndex) const;
+  /// As those of TZqLoggerList.
   bool Lock(const UnicodeString& ALockRequestedBy, bool ARaise) { return FLock.Enter(ALockRequestedBy, ARaise); }
   void Unlock() noexcept { FLock.Leave(); }
 
@@ -386,12 +415,20 @@ class ZQ_API TZqLogAppenderList : public TComponent {
  private:
   friend class TZqLogger;
   // A step of a walk shares the entry instead of counting the appender once more, which spares two calls to it.
-  using TItem = std::shared_ptr<const IntfRef<IZqLogAppender>>;
+  struct TEntry {
+    IntfRef<IZqLogAppender> Appender;
+    TComponent* Component;  // of the appender, asked for once: that is host code
+    [[nodiscard]] bool IsSame(const TEntry& AOther) const noexcept {
+      return Appender == AOther.Appender || (Component != nullptr && Component == AOther.Component);
+    }
+  };
+  using TItem = std::shared_ptr<const TEntry>;
   using TItems = std::vector<TItem>;
 
   TItem ItemOrNone(std::size_t AIndex) const;
   template <class TLeaves>
   TItems TakeItems(TLeaves ALeaves);
+  TItems TakeAll();
 
   TZqLogger* FLogger;
   std::atomic<Integer> FCount = 0;      // FList's size
@@ -408,10 +445,11 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   TZqLogger(TZqLogger* AParentLogger, UnicodeString AName);
 
   [[nodiscard]] Integer RefCount() const noexcept { return FRefCount.load(std::memory_order_relaxed); }
-  [[nodiscard]] IntfRef<IZqLogConfigurator> Configurator() const { return FConfigurator; }
+  [[nodiscard]] IntfRef<IZqLogConfigurator> Configurator() const;
   /// Also hands nullptr down to the children.
   void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) override;
 
+  /// Raises EAssertionFailed at the root.
   HRESULT QueryInterface(const TGUID& AIID, void** AObj) override;
   Integer _AddRef() override;
   Integer _Release() override;
@@ -436,6 +474,8 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   bool IsWarnEnabled() const override { return IsEnabledFor(llWarn); }
   bool IsEnabledFor(TZqLogLevel ALogLevel) const override { return GetLevel() <= ALogLevel; }
 
+  using IZqLogger::Debug;
+  using IZqLogger::Log;
   void Trace(const UnicodeString& ALogMessage) override;
   void Trace(const TObject* AObject, const UnicodeString& AMethodName) override;
   void Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) override;
@@ -495,7 +535,7 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
       PZqDataRec AValue, TZqLogIndent ALogIndent);
   IntfRef<TZqLogger> FindOrMakeChild(const UnicodeString& AName, bool& AMade);
   void ClearChildLoggers();
-  bool LeaveParent();
+  IntfRef<IZqLogConfigurator> SetConfigurator(IntfRef<IZqLogConfigurator> AConfig);
 
   // In this order, so that the children's list goes first at the end and the count on the parent last.
   UnicodeString FName;
@@ -506,6 +546,7 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   std::atomic<bool> FParentLevel = true;
   std::atomic<TZqLogLevel> FLevel = llDebug;
   std::atomic<bool> FAdditive = true;
+  mutable TCriticalSection FConfigLock;  // innermost, for one copy of FConfigurator
   IntfRef<IZqLogConfigurator> FConfigurator;
   TZqLogLock FLock;
   TOwned<TZqLogAppenderList> FAppenders;
@@ -527,7 +568,7 @@ class ZQ_API TZqLogBase : public Implements<TZqComponent, IZqLogBase> {
   TComponent* Component() override { return this; }
 
  protected:
-  ~TZqLogBase() override = default;
+  ~TZqLogBase() override;
   void AfterConstruction() override;
   /// Freed by hand, the object first leaves the lists that hold it.
   void BeforeDestruction() override;

@@ -155,7 +155,7 @@ Word CurrentYear() {
 }  // namespace
 
 AnsiString ZqCharCase(const AnsiString& AText, TZqCharCase ACase, const AnsiString& ADelimiters) {
-  return Narrow(CharCase(Widen(AText), ACase, Widen(ADelimiters)));
+  return ACase == rcNormal ? AText : Narrow(CharCase(Widen(AText), ACase, Widen(ADelimiters)));
 }
 
 WideString ZqCharCase(const WideString& AText, TZqCharCase ACase, const WideString& ADelimiters) {
@@ -175,7 +175,7 @@ UnicodeString ZqStringIncrement(const UnicodeString& AValue, Integer AIncrement)
 
 void ZqTokenize(
     const UnicodeString& AText, TStringList* AList, const UnicodeString& ADelimiters, TStrings* ADelimiterList) {
-  static constexpr const char16_t* cDefaultDelimiters = u" ~!@#$%^&*()-=+\\|]}[{'\";:/?.>,<`";
+  static constexpr const char16_t* cDefaultDelimiters = u" ~!@#$%^&*()-=+\\|]}[{'\";:/?.>,<";
   const UnicodeString Delimiters = ADelimiters.IsEmpty() ? cDefaultDelimiters : ADelimiters;
   UnicodeString Token;
   const auto AddToken = [&] {

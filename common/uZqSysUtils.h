@@ -13,6 +13,7 @@
 #include "runtime/io/streams.h"
 #include "runtime/text/format.h"
 
+/// Texts, exceptions with codes and small utilities. All but the registry of exception classes may run on any thread.
 namespace zq {
 
 class TObjectList;
@@ -141,7 +142,7 @@ class TZqStringArgs : public std::span<const UnicodeString> {
 };
 
 /// Adds the pieces between characters of ADelimiters to AList, empty ones left out, and each such character to
-/// ADelimiterList. No ADelimiters means the blank and ASCII's punctuation but "_". Clears neither list.
+/// ADelimiterList. No ADelimiters means the blank and ASCII's punctuation but "_" and "`". Clears neither list.
 ZQ_API void ZqTokenize(const UnicodeString& AText, TStringList* AList, const UnicodeString& ADelimiters = {},
     TStrings* ADelimiterList = nullptr);
 /// Adds the pieces between ADelimiter, empty ones too: one more than there are delimiters. Doesn't clear AList.
@@ -191,6 +192,7 @@ ZQ_API void ZqStringToList(const UnicodeString& AText, const UnicodeString& ADel
 /// Whether AText, the second argument, contains ASub; the case of ASCII letters doesn't count.
 [[nodiscard]] ZQ_API Boolean ZqContainsText(const AnsiString& ASub, const AnsiString& AText);
 [[nodiscard]] ZQ_API Boolean ZqContainsText(const WideString& ASub, const WideString& AText);
+/// Equal, but for the case of ASCII letters; the last form compares without the blanks at both ends.
 [[nodiscard]] ZQ_API Boolean ZqSameText(const UnicodeString& A, const UnicodeString& B) noexcept;
 [[nodiscard]] ZQ_API Boolean ZqSameText(const AnsiString& A, const AnsiString& B);
 [[nodiscard]] ZQ_API Boolean ZqSameTrimmedText(const UnicodeString& A, const UnicodeString& B);

@@ -138,7 +138,8 @@ RawByteString TZqEncoding::ConvertB(const void* ABuffer, NativeUInt ABufSize, Wo
   if (ABufCodePage == AResultCodePage) {
     Result.Str().assign(static_cast<const char*>(ABuffer), ABufSize);
   } else if (ABufCodePage == cUtf16LE) {
-    Result = FromUtf16(ConvertB(ABuffer, ABufSize, ABufCodePage), AResultCodePage);
+    if (ABufSize / 2 <= static_cast<NativeUInt>(std::numeric_limits<Integer>::max()))
+      Result = FromUtf16(ConvertB(ABuffer, ABufSize, ABufCodePage), AResultCodePage);
   } else {
     Result = ConvertA(static_cast<const Byte*>(ABuffer), BufferCount(ABufSize), ABufCodePage, AResultCodePage);
   }
@@ -147,10 +148,10 @@ RawByteString TZqEncoding::ConvertB(const void* ABuffer, NativeUInt ABufSize, Wo
 }
 
 UnicodeString TZqEncoding::ConvertB(const void* ABuffer, NativeUInt ABufSize, Word ABufCodePage) {
-  const Integer Count = BufferCount(ABufSize);
-  if (ABufCodePage != cUtf16LE) return ConvertA(static_cast<const Byte*>(ABuffer), Count, ABufCodePage);
+  if (ABufCodePage != cUtf16LE)
+    return ConvertA(static_cast<const Byte*>(ABuffer), BufferCount(ABufSize), ABufCodePage);
   UnicodeString Result;
-  Result.SetLength(Count / 2);
+  Result.SetLength(BufferCount(ABufSize / 2));
   if (!Result.IsEmpty()) std::memcpy(Result.data(), ABuffer, Result.size() * 2);  // the buffer needn't be aligned
   return Result;
 }
@@ -663,8 +664,8 @@ UnicodeString ArrayText(const Variant& AArray, const UnicodeString& ADefValue, b
   }
   UnicodeString Result;
   const Integer High = VarArrayHighBound(AArray, 1);
-  for (Integer i = VarArrayLowBound(AArray, 1); i <= High; ++i)
-    Result += ZqVarToStr(AArray[i], ADefValue, ARaiseError) + u"\r\n";
+  for (Int64 i = VarArrayLowBound(AArray, 1); i <= High; ++i)
+    Result += ZqVarToStr(AArray[static_cast<Integer>(i)], ADefValue, ARaiseError) + u"\r\n";
   return Result;
 }
 
@@ -769,7 +770,11 @@ Boolean ZqVarIsEmpty(const Variant& AValue) {
   }
 }
 
-Integer ZqVarArrayCount(const Variant& AValue) { return VarIsArray(AValue) ? VarArrayHighBound(AValue, 1) + 1 : 0; }
+Integer ZqVarArrayCount(const Variant& AValue) {
+  if (!VarIsArray(AValue)) return 0;
+  const Integer High = VarArrayHighBound(AValue, 1);
+  return High == std::numeric_limits<Integer>::max() ? High : High + 1;
+}
 
 TZqNullableBool ZqNullableBool(const Variant& AValue) {
   if (ZqMainTypeKind(VarType(AValue)) != mtkBoolean) return nbNull;

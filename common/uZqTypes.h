@@ -36,7 +36,7 @@ inline constexpr std::array<Byte, 4> cZqUTF32LE{0xFF, 0xFE, 0x00, 0x00};
 /// Conversions between bytes of a code page and UTF-16, for any number of threads.
 ///
 /// Those that give a string raise EOSError where the source is no text of the code page or the code page has no
-/// converter; 65001 replaces malformed pieces by U+FFFD instead. Those into a caller's buffer never raise.
+/// converter; 65001, and 0 where it stands for that, replaces malformed pieces by U+FFFD instead. Those into a caller's buffer never raise.
 class ZQ_API TZqEncoding : public TEncoding {
  public:
   TZqEncoding() = delete;
@@ -63,11 +63,13 @@ class ZQ_API TZqEncoding : public TEncoding {
   static Integer ConvertW(
       const WideChar* ASource, Integer ASourceCharCnt, Byte* ADest, Integer ADestByteCnt, Word ADestCodePage);
 
-  /// From one code page to another; equal ones copy the bytes unchecked. AResultCodePage is none of UTF-16 and UTF-32.
-  /// From 1200 nothing raises: what can't be converted gives an empty result.
+  /// From one code page to another; equal ones copy the bytes unchecked. AResultCodePage is none of UTF-16 and UTF-32, and from
+  /// other pages than 1200 ABufSize fits an Integer (EAssertionFailed). From 1200 nothing raises: what can't be converted
+  /// gives an empty result.
   [[nodiscard]] static RawByteString ConvertB(
       const void* ABuffer, NativeUInt ABufSize, Word ABufCodePage, Word AResultCodePage);
-  /// From 1200 the units are copied unchecked; an odd last byte is dropped.
+  /// From 1200 the units are copied unchecked; an odd last byte is dropped. Bytes, or units of 1200, that an Integer
+  /// can't count raise EAssertionFailed.
   [[nodiscard]] static UnicodeString ConvertB(const void* ABuffer, NativeUInt ABufSize, Word ABufCodePage);
 };
 
@@ -86,7 +88,7 @@ class ZQ_API TZqEncoding : public TEncoding {
 enum class TNorm_Form : Byte { nfOther = 0, nfC = 1, nfD = 2, nfKC = 5, nfKD = 6 };
 using enum TNorm_Form;
 
-/// Raises Exception (_SNormalizeFailure) where the value can't be normalised. In form nfD a character beyond ASCII that
+/// Raises Exception (_SNormalizeFailure) where the value can't be normalised, or is empty. In form nfD a character beyond ASCII that
 /// has a byte in code page 0 comes back as the value of that byte.
 [[nodiscard]] ZQ_API WideString ZqNormalizeString(const WideString& AValue, TNorm_Form AForm);
 /// Without accents: of each UTF-16 unit the first character of its decomposition.
@@ -231,7 +233,8 @@ using TZqVariantTypeKind = TSubrange<rtkUnknown, rtkInterface>;
 
 // ---- Variants, strictly ---------------------------------------------------------------------------------------------
 // ADefValue for Null, Empty and a type that is not known, the value for a compatible type; any other raises
-// EConvertError. What doesn't fit the result is cut to its width.
+// EConvertError. The members of up to 32 bits read an Integer, the others an Int64: what doesn't fit that raises
+// EVariantOverflow, what doesn't fit the result is cut to its width.
 
 [[nodiscard]] ZQ_API ShortInt ZqVarShortint(const Variant& AValue, Integer ADefValue);
 [[nodiscard]] ZQ_API SmallInt ZqVarSmallint(const Variant& AValue, Integer ADefValue);
@@ -254,7 +257,8 @@ using TZqVariantTypeKind = TSubrange<rtkUnknown, rtkInterface>;
 
 // ---- Variants, converted --------------------------------------------------------------------------------------------
 // ADefValue for Null, Empty and a type that is not known. Text is parsed. What can't be converted raises with
-// ARaiseError and gives ADefValue without it; nothing raises then. What doesn't fit the result is cut to its width.
+// ARaiseError and gives ADefValue without it; nothing raises then. Neither can an integer be converted that doesn't fit
+// the Integer, or the Int64, that is read; what doesn't fit the result is cut to its width.
 
 [[nodiscard]] ZQ_API ShortInt ZqVarToShortint(const Variant& AValue, Integer ADefValue, Boolean ARaiseError);
 [[nodiscard]] ZQ_API SmallInt ZqVarToSmallint(const Variant& AValue, Integer ADefValue, Boolean ARaiseError);
@@ -280,7 +284,8 @@ using TZqVariantTypeKind = TSubrange<rtkUnknown, rtkInterface>;
 [[nodiscard]] ZQ_API AnsiString ZqVarToAStr(const Variant& AValue, const AnsiString& ADefValue, Boolean ARaiseError);
 [[nodiscard]] ZQ_API WideString ZqVarToWStr(const Variant& AValue, const WideString& ADefValue, Boolean ARaiseError);
 
-/// True for Null, Empty, a number or date of 0, a text of blanks and an array without elements; never for a Boolean.
+/// True for Null, Empty, a number or date of 0, a text of blanks and an array whose first dimension ends at -1;
+/// never for a Boolean.
 [[nodiscard]] ZQ_API Boolean ZqVarIsEmpty(const Variant& AValue);
 /// Elements of the first dimension, which is taken to start at 0; 0 for what is no array.
 [[nodiscard]] ZQ_API Integer ZqVarArrayCount(const Variant& AValue);

@@ -1,5 +1,8 @@
 #include "common/uZqWindows.h"
 
+#include <filesystem>
+#include <map>
+
 #include "runtime/com/registry.h"
 #include "runtime/core/exceptions.h"
 #include "runtime/io/files.h"
@@ -23,17 +26,18 @@ UnicodeString ZqGetEnvironmentVar(const UnicodeString& AName) {
 }
 
 UnicodeString ZqExpandEnvVarsAndStrings(const UnicodeString& AText) {
-  constexpr Integer MaxRounds = 1000;      // values that hold "$(" are expanded in turn: those that
-  constexpr Integer MaxLength = 0x100000;  // refer to each other in a circle must come to an end
+  // Values that hold "$(" are expanded in turn: those that refer to each other in a circle must come to an end.
+  constexpr Integer MaxRounds = 100;  // of one name
+  constexpr Integer MaxGrowth = 0x4000000;
   UnicodeString Result = AText;
-  Integer Rounds = 0;
+  std::map<UnicodeString, Integer> Rounds;
   for (Integer Start = Result.Pos(u"$("); Start > 0; Start = Result.Pos(u"$(")) {
     const std::size_t End = Result.View().find(u')', static_cast<std::size_t>(Start));
     const auto Length = End == std::u16string_view::npos ? 0 : static_cast<Integer>(End) + 2 - Start;
     const UnicodeString Part = Result.Copy(Start, Length);
     const UnicodeString Value = ZqGetEnvironmentVar(Part.Copy(3, Length - 3));
     Result = StringReplace(Result, Part, Value, {rfReplaceAll, rfIgnoreCase});
-    if (++Rounds > MaxRounds || Result.Length() > MaxLength)
+    if (++Rounds[Part] > MaxRounds || Result.Length() - AText.Length() > MaxGrowth)
       throw Exception(u"The Environment Variable %s refers to itself", {Part});
   }
   return Result.Pos(u"%") == 0 ? Result : Platform().Environment().ExpandEnvironmentStrings(Result);
@@ -106,9 +110,10 @@ namespace {
 
 // The moment as the local date of a file, cut to its 2 seconds; 0 for one outside of its years.
 TDateTime ThroughFileDate(Int64 AUtcMicroseconds) {
-  const TSystemTime Local =
-      DateTimeToSystemTime(TTimeZone::Local().ToLocalTime(UnixMillisecondsToDateTime(AUtcMicroseconds / 1000)));
-  if (Local.Year < 1980 || Local.Year > 2107) return 0;
+  constexpr double First = 29221, Last = 75971;  // the days 1980-01-01 and 2107-12-31
+  const TDateTime Moment = TTimeZone::Local().ToLocalTime(UnixMillisecondsToDateTime(AUtcMicroseconds / 1000));
+  if (Moment < First || Moment >= Last + 1) return 0;
+  const TSystemTime Local = DateTimeToSystemTime(Moment);
   const Cardinal Day = (Local.Year - 1980U) << 9U | static_cast<Cardinal>(Local.Month) << 5U | Local.Day;
   const Cardinal Time =
       static_cast<Cardinal>(Local.Hour) << 11U | static_cast<Cardinal>(Local.Minute) << 5U | Local.Second / 2U;
@@ -117,7 +122,7 @@ TDateTime ThroughFileDate(Int64 AUtcMicroseconds) {
 
 TDateTime FileMoment(const UnicodeString& AName, Int64 TSearchRec::*AField) {
   TSearchRec Found;
-  if (FindFirst(AName, faAnyFile, Found) != 0 || (Found.Attr & faDirectory) != 0) return 0;
+  if (FindFirst(AName, faAnyFile, Found) != 0 || DirectoryExists(AName)) return 0;
   return ThroughFileDate(Found.*AField);
 }
 
@@ -137,11 +142,13 @@ Integer ZqGetFileSize(const UnicodeString& AName) {
 
 TDateTime ZqFileTimeToDateTime(const FILETIME& AValue) {
   const UInt64 Steps = UInt64{AValue.dwHighDateTime} << 32U | AValue.dwLowDateTime;
-  return UnixMillisecondsToDateTime(static_cast<Int64>(Steps / cFileTimeSteps) - cUnixEpochInFileTime);
+  const Int64 Milliseconds = static_cast<Int64>(Steps / cFileTimeSteps) - cUnixEpochInFileTime;
+  return SystemTimeToDateTime(DateTimeToSystemTime(UnixMillisecondsToDateTime(Milliseconds)));
 }
 
 FILETIME ZqDateTimeToFileTime(TDateTime AValue) {
-  const Int64 Milliseconds = DateTimeToUnixMilliseconds(AValue) + cUnixEpochInFileTime;
+  const TDateTime Moment = SystemTimeToDateTime(DateTimeToSystemTime(AValue));
+  const Int64 Milliseconds = DateTimeToUnixMilliseconds(Moment) + cUnixEpochInFileTime;
   const UInt64 Steps = Milliseconds < 0 ? 0 : static_cast<UInt64>(Milliseconds) * cFileTimeSteps;
   return {static_cast<Cardinal>(Steps & 0xFFFFFFFFU), static_cast<Cardinal>(Steps >> 32U)};
 }
@@ -153,7 +160,16 @@ namespace {
 // The shell takes lists of paths, each ended by a zero character, the last by two.
 UnicodeString ShellList(const UnicodeString& APath) { return APath + std::u16string_view(u"\0\0", 2); }
 
+// The path of a folder by a name of its own: empty for the root, and for one that is called "." or "..".
+UnicodeString NamedFolder(UnicodeString APath) {
+  while (EndsInSeparator(APath)) APath.SetLength(APath.Length() - 1);
+  const UnicodeString Name = ExtractFileName(APath);
+  return Name == u"." || Name == u".." ? UnicodeString() : APath;
+}
+
 bool RemoveByHand(const UnicodeString& ADir) {
+  std::error_code Ignored;
+  if (std::filesystem::is_symlink(ToSystemPath(ADir), Ignored)) return DeleteFile(ADir);
   TSearchRec Found;
   bool Going = true;
   for (Integer Code = FindFirst(ADir + u"/*.*", faAnyFile, Found); Code == 0 && Going; Code = FindNext(Found)) {
@@ -174,15 +190,16 @@ bool ZqRenameFolder(const UnicodeString& AOld, const UnicodeString& ANew) {
 
 bool ZqRemoveDir(const UnicodeString& ADir, bool AUseRecycleBin) {
   const UnicodeString Dir = ZqCheckDirSlash(ADir, false);
-  if (Dir.IsEmpty()) return false;  // by hand it would be the root
+  const UnicodeString Named = NamedFolder(Dir);
+  if (Named.IsEmpty()) return false;
   Word Flags = FOF_SILENT | FOF_NOCONFIRMATION | FOF_NOERRORUI;
   if (AUseRecycleBin) Flags |= FOF_ALLOWUNDO;
-  return Platform().Shell().SHFileOperation(FO_DELETE, ShellList(Dir), {}, Flags) == 0 || RemoveByHand(Dir);
+  return Platform().Shell().SHFileOperation(FO_DELETE, ShellList(Dir), {}, Flags) == 0 || RemoveByHand(Named);
 }
 
 UnicodeString ZqGetTempDirectory() {
   UnicodeString Result = Platform().Files().GetTempPath();
-  if (Result.IsEmpty()) throw Exception(u"Can't determine name temp directory");
+  if (Result.IsEmpty() || Result.Length() > 260) throw Exception(u"Can't determine name temp directory");
   return Result;
 }
 

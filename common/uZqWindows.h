@@ -16,7 +16,8 @@ struct FILETIME {
 
 /// The whole value. Raises Exception if the variable is missing or empty.
 [[nodiscard]] ZQ_API UnicodeString ZqGetEnvironmentVar(const UnicodeString& AName);
-/// Expands "$(NAME)", where NAME must exist (Exception), then "%NAME%", where an unknown one stays.
+/// Expands "$(NAME)", where NAME must exist (Exception), then "%NAME%", where an unknown one stays. Values may hold
+/// "$(NAME)" themselves; those that refer to each other in a circle raise Exception.
 [[nodiscard]] ZQ_API UnicodeString ZqExpandEnvVarsAndStrings(const UnicodeString& AText);
 /// The same, made absolute: a relative path is taken from the program's folder.
 [[nodiscard]] ZQ_API UnicodeString ZqExpandFileName(const UnicodeString& AName);
@@ -36,29 +37,34 @@ struct FILETIME {
 
 // ----------------------------------------------------------------------------------------------------- File facts
 
-/// Raises Exception.
+/// The file under a name that every program can use; on Linux the absolute path, there is no shorter form. Raises
+/// Exception where there is no such file.
 [[nodiscard]] ZQ_API UnicodeString ZqGetShortFileName(const UnicodeString& AName);
+/// Whether its permissions let nobody write; False where there is no such file.
 [[nodiscard]] ZQ_API bool ZqFileIsReadOnly(const UnicodeString& AName);
+/// Whether this process can't have the file for itself now, to read and write: somebody has it open, or it may not be
+/// written. False where there is no such file.
 [[nodiscard]] ZQ_API bool ZqFileIsInUse(const UnicodeString& AName);
-/// Local, to 2 seconds; 0 for a folder and where there is no such file. Linux file systems that keep no time of birth
-/// give the last change.
+/// Local, to 2 seconds; 0 for a folder, where there is no such file, and outside of the years 1980 to 2107. Linux file
+/// systems that keep no time of birth give the last change.
 [[nodiscard]] ZQ_API TDateTime ZqGetFileCreated(const UnicodeString& AName);
 [[nodiscard]] ZQ_API TDateTime ZqGetFileLastModified(const UnicodeString& AName);
 /// The low 32 bits; -1 where there is no such file.
 [[nodiscard]] ZQ_API Integer ZqGetFileSize(const UnicodeString& AName);
-/// These two leave the time zone as it is.
+/// These two leave the time zone as it is. They raise EConvertError outside of the years 1 to 9999.
 [[nodiscard]] ZQ_API TDateTime ZqFileTimeToDateTime(const FILETIME& AValue);
 [[nodiscard]] ZQ_API FILETIME ZqDateTimeToFileTime(TDateTime AValue);
 
 // -------------------------------------------------------------------------------------------------------- Folders
 
+/// False where ANew exists, or lies on another file system.
 ZQ_API bool ZqRenameFolder(const UnicodeString& AOld, const UnicodeString& ANew);
 /// Removes the folder and all that it holds; into the trash with AUseRecycleBin, if that can be done. Links are
-/// removed, not followed. False where it is still there, or never was.
+/// removed, not followed. False where it is still there, or never was, and for "/", "." and "..".
 ZQ_API bool ZqRemoveDir(const UnicodeString& ADir, bool AUseRecycleBin);
-/// With a separator at the end. Raises Exception.
+/// With a separator at the end. Raises Exception where it is longer than 260 characters.
 [[nodiscard]] ZQ_API UnicodeString ZqGetTempDirectory();
-/// Makes a new folder, the caller's; without a separator at the end. Raises Exception.
+/// Makes a new folder, the caller's; without a separator at the end. Raises Exception where that can't be done.
 [[nodiscard]] ZQ_API UnicodeString ZqCreateTempDirectory();
 
 // ------------------------------------------------------------------------------------------------------ Shortcuts
@@ -76,6 +82,7 @@ ZQ_API void ZqCreateShortcut(const UnicodeString& ATarget, const UnicodeString& 
 [[nodiscard]] ZQ_API Word ZqGetWindowsVersion();
 /// Path of the shell folder with that number, made if it isn't there. Raises Exception ("Invalid pidl").
 [[nodiscard]] ZQ_API UnicodeString ZqGetShellFolder(Integer ACsidl);
+/// The user's folder for documents, made if it isn't there.
 [[nodiscard]] ZQ_API UnicodeString ZqGetMyDocumentsFolder();
 
 }  // namespace zq

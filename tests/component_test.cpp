@@ -74,8 +74,7 @@ TEST(Component, AnEndIsToldOfWholeObjectsAndARefusedOneLeavesTheOwnerAlive) {
   EXPECT_EQ(std::exchange(Log, ""), "o!s ~s o!a ~a w!o ~o ");
 }
 
-// ---- Bindings
-// --------------------------------------------------------------------------------------------------------
+// ---- Bindings ------------------------------------------------------------------------------------------------------
 
 struct TNode : TComponent {
   TNode() : TComponent(nullptr) {}

@@ -16,8 +16,7 @@ namespace {
 
 constexpr Cardinal cLong = 30'000;  // ms that no passing test waits for
 
-// ---- Events
-// ----------------------------------------------------------------------------------------------------------
+// ---- Events --------------------------------------------------------------------------------------------------------
 
 TEST(Event, AWaitEndsAtTheSignalOrWhenItsTimeIsOver) {
   TSimpleEvent Event;
@@ -65,8 +64,7 @@ TEST(Event, WaitForAnyTakesTheForemostAndWakesForEach) {
   }
 }
 
-// ---- Native threads
-// --------------------------------------------------------------------------------------------------
+// ---- Native threads ------------------------------------------------------------------------------------------------
 
 TEST(ThreadNative, ExitCodeComesFromTheResultFromEndThreadOrFromARaise) {
   const std::pair<Integer, std::function<Integer()>> Cases[] = {
@@ -79,8 +77,7 @@ TEST(ThreadNative, ExitCodeComesFromTheResultFromEndThreadOrFromARaise) {
   EXPECT_THROW(EndThread(1), EAssertionFailed) << "the main thread is nobody's to end";
 }
 
-// ---- Threads and the main thread's queue
-// -----------------------------------------------------------------------------
+// ---- Threads and the main thread's queue ---------------------------------------------------------------------------
 
 struct TLambdaThread : TThread {
   using TBody = std::function<void(TLambdaThread&)>;
@@ -161,8 +158,7 @@ TEST(SyncQueue, QueuedCallsRunInOrderAndARaiseLeavesTheRest) {
   EXPECT_FALSE(CheckSynchronize(5));
 }
 
-// ---- Interlocked numbers and monitors
-// --------------------------------------------------------------------------------
+// ---- Interlocked numbers and monitors ------------------------------------------------------------------------------
 
 TEST(LockMonitor, KeepsThreadsApartAndNests) {
   const TSimpleEvent Object, Other;

@@ -61,8 +61,7 @@ TEST(LockFreeCount, ReferencesOfManyThreadsEndTheObjectOnce) {
   EXPECT_EQ(Ends, 1);
 }
 
-// ---- Linked objects
-// --------------------------------------------------------------------------------------------------
+// ---- Linked objects ------------------------------------------------------------------------------------------------
 
 struct TLinked : TZqObjectEx {
   TLinked(std::string& ALog, const char* AName) : Log(ALog), Name(AName) {}
@@ -124,8 +123,7 @@ TEST(ObjectAdapter, AnswersWithItsObjectAndEndsItOnlyWhenItOwnsIt) {
   }
 }
 
-// ---- Components
-// ------------------------------------------------------------------------------------------------------
+// ---- Components ----------------------------------------------------------------------------------------------------
 
 struct TPart : TZqComponent {
   using TZqComponent::TZqComponent;

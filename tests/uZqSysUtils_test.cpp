@@ -108,10 +108,10 @@ TEST(StringIncrement, CountsTheDigitsAtTheEnd) {
 TEST(Lists, TokensSplitOnceAtARunOfDelimiters) {
   TStringList List, Delimiters;
   ZqTokenize(u"  ", &List, u"", &Delimiters);
-  ZqTokenize(u"a b-_c~!@#$%^&*()-=+\\|]}[{'\";:/?.>,<`d", &List);
-  EXPECT_EQ(List.Text(), u"a\r\nb\r\n_c\r\nd\r\n");
+  ZqTokenize(u"a b-_c~!@#$%^&*()-=+\\|]}[{'\";:/?.>,<d`", &List);
+  EXPECT_EQ(List.Text(), u"a\r\nb\r\n_c\r\nd`\r\n");
   ZqTokenize(u"-e,-f", &List, u",-", &Delimiters);
-  EXPECT_EQ(List.Text(), u"a\r\nb\r\n_c\r\nd\r\ne\r\nf\r\n") << "it is not cleared";
+  EXPECT_EQ(List.Text(), u"a\r\nb\r\n_c\r\nd`\r\ne\r\nf\r\n") << "it is not cleared";
   EXPECT_EQ(Delimiters.Text(), u" \r\n \r\n-\r\n,\r\n-\r\n");
 }
 

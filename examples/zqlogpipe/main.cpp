@@ -32,12 +32,13 @@ constexpr char cHelp[] =
     "\n"
     "Logs each line of the INPUT files, or of standard input, into FILE. INPUT may be - for standard input.\n"
     "\n"
-    "  --file FILE       log file; missing folders are made. May be given again for a further log file\n"
+    "  --file FILE       log file, .log is added to a name without extension; missing folders are made. May be given\n"
+    "                    again for a further log file\n"
     "  --max-size BYTES  a file that has reached this size is rolled, 0 for never (10485760)\n"
     "  --backups COUNT   files of the series, FILE among them, 1 to 65535 (5)\n"
     "  --no-append       begin a new FILE; one that exists becomes a backup\n"
     "  --logger NAME     dotted path of the logger below the root (zqlogpipe)\n"
-    "  --level LEVEL     level of the lines: trace, debug, info, warn, error, fatal (info)\n"
+    "  --level LEVEL     level of the lines: trace, debug, info, warn or warning, error, fatal (info)\n"
     "  --detect-level    the first such word in a line decides its level, whatever its case; --level where there is "
     "none\n"
     "  --help            this text\n"
@@ -130,6 +131,8 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
     else if (Word.size() > 1 && Word.front() == '-') throw TUsageError("unknown option '" + std::string(Word) + "'");
     else Result.Inputs.emplace_back(Word);
   }
+  const auto IsBlank = [](const std::string& AName) { return AName.find_first_not_of(' ') == std::string::npos; };
+  if (std::any_of(Result.Files.begin(), Result.Files.end(), IsBlank)) throw TUsageError("--file needs a name");
   if (Result.Files.empty() && !Result.Help) throw TUsageError("--file is needed");
   return Result;
 }
@@ -149,6 +152,7 @@ class TPipeAppender : public TZqRollingFileAppender {
       ++Written;
     } catch (const Exception& e) {
       if (Failed++ == 0) Failure = e.Message();
+      if (!FFileStream) Close();  // a roll that couldn't open its new file: the next line tries again
       throw;
     }
   }
@@ -164,8 +168,10 @@ class TPipeAppender : public TZqRollingFileAppender {
 /// The text of a line: UTF-8, with each byte that is none taken as the character of its code.
 UnicodeString TextOf(std::string_view ALine) {
   std::u16string Result = utf8::Decode(ALine, utf8::TMalformed::Escape);
-  for (Char& c : Result)
-    if (c >= 0xDC80 && c <= 0xDCFF) c &= 0xFF;
+  for (std::size_t i = 0; i < Result.size(); ++i) {
+    const bool OfAPair = i != 0 && Result[i - 1] >= 0xD800 && Result[i - 1] < 0xDC00;
+    if (!OfAPair && Result[i] >= 0xDC80 && Result[i] <= 0xDCFF) Result[i] &= 0xFF;
+  }
   return Result;
 }
 

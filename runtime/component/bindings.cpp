@@ -41,8 +41,7 @@ TBindingManager& Resolve(TBindingManager* AManager) {
 
 }  // namespace
 
-// ---- TBindingPath
-// ----------------------------------------------------------------------------------------------------
+// ---- TBindingPath --------------------------------------------------------------------------------------------------
 
 TBindingPath::TBindingPath(const UnicodeString& AExpression, const TArray<IntfRef<IScope>>& AScopes)
     : FExpression(AExpression), FNames(SplitAtDots(AExpression)) {
@@ -94,8 +93,7 @@ bool TBindingPath::LeadsOver(const TObject* AObject, const UnicodeString& APrope
   return false;
 }
 
-// ---- TBindingExpression
-// ----------------------------------------------------------------------------------------------
+// ---- TBindingExpression --------------------------------------------------------------------------------------------
 
 TBindingExpression::TBindingExpression(TBindingPath AInput, TBindingPath AOutput, TValueConverter AConverter,
     TBindingManager& AManager, const TCreateOptions& AOptions)
@@ -130,8 +128,7 @@ void TBindingExpression::Evaluate() {
     FManager.Notify(FOutput.Holder(), FOutput.Property());
 }
 
-// ---- TBindingManager
-// -------------------------------------------------------------------------------------------------
+// ---- TBindingManager -----------------------------------------------------------------------------------------------
 
 TBindingManager& TBindingManager::Default() {
   static TBindingManager& Result = *new TBindingManager;
@@ -162,8 +159,7 @@ void TBindingManager::Notify(const TObject* AObject, const UnicodeString& APrope
     if (Expression->DependsOn(AObject, AProperty)) Expression->Evaluate();
 }
 
-// ---- TBindings
-// -------------------------------------------------------------------------------------------------------
+// ---- TBindings -----------------------------------------------------------------------------------------------------
 
 IntfRef<IScope> TBindings::CreateAssociationScope(TArray<TBindingAssociation> AAssociations) {
   return New<TAssociationScope>(std::move(AAssociations));
@@ -191,8 +187,7 @@ void TBindings::Notify(const TObject* AObject, const UnicodeString& AProperty, T
   Resolve(AManager).Notify(AObject, AProperty);
 }
 
-// ---- TLinkControlToProperty
-// ------------------------------------------------------------------------------------------
+// ---- TLinkControlToProperty ----------------------------------------------------------------------------------------
 
 void TLinkControlToProperty::SetPart(TComponent*& APart, TComponent* AValue) {
   SetActive(false);

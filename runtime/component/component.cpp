@@ -7,8 +7,7 @@
 
 namespace zq {
 
-// ---- TObservers
-// ------------------------------------------------------------------------------------------------------
+// ---- TObservers ----------------------------------------------------------------------------------------------------
 
 void TObservers::Offer(Integer AID, const UnicodeString& AMember) { FOffers[AID].Member = AMember; }
 
@@ -37,8 +36,7 @@ void TObservers::Changed(Integer AID, bool ACommitted) {
     if (std::find(Present.begin(), Present.end(), Observer) != Present.end()) Observer(ACommitted);
 }
 
-// ---- TComponent
-// ------------------------------------------------------------------------------------------------------
+// ---- TComponent ----------------------------------------------------------------------------------------------------
 
 namespace {
 

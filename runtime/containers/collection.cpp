@@ -6,8 +6,7 @@
 
 namespace zq {
 
-// ---- TCollectionItem
-// -------------------------------------------------------------------------------------------------
+// ---- TCollectionItem -----------------------------------------------------------------------------------------------
 
 TCollectionItem::~TCollectionItem() {
   if (FCollection != nullptr) FCollection->Forget(this);  // only where the construction failed behind AfterConstruction
@@ -21,9 +20,15 @@ void TCollectionItem::AfterConstruction() {
 void TCollectionItem::BeforeDestruction() {
   if (TCollection* const Left = FCollection) {
     Left->Deleting(this);
+    const Integer Place = Index();
     Left->Forget(this);
+    try {
+      Left->Changed(nullptr);
+    } catch (...) {
+      Left->FItems.insert(Left->FItems.begin() + std::min(Place, Left->Count()), this);
+      throw;
+    }
     FCollection = nullptr;
-    Left->Changed(nullptr);
   }
   TPersistent::BeforeDestruction();
 }
@@ -48,8 +53,7 @@ void TCollectionItem::Changed(bool AAllItems) {
   if (FCollection != nullptr) FCollection->Changed(AAllItems ? nullptr : this);
 }
 
-// ---- TCollection
-// -----------------------------------------------------------------------------------------------------
+// ---- TCollection ---------------------------------------------------------------------------------------------------
 
 namespace {
 
@@ -74,7 +78,7 @@ TCollection::~TCollection() {
     try {
       Item->Free();
     } catch (...) {  // one that refuses its end lives on without a collection
-      FItems.pop_back();
+      Forget(Item);
       Item->FCollection = nullptr;
     }
   }

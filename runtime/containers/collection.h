@@ -41,7 +41,7 @@ using TCollectionItemClass = TClassRef<TCollectionItem(TCollection*)>;
 
 /// Owned, ordered items of one class.
 ///
-/// An item whose end is refused (its BeforeDestruction raises) stays where it is. The collection's own end can't reach
+/// An item whose end is refused (its BeforeDestruction, Deleting or Update raises) stays where it is. The collection's own end can't reach
 /// an override of Deleting or Update: a class that needs one there calls Clear in its destructor. One thread at a time.
 class ZQ_API TCollection : public TPersistent {
  public:
@@ -58,7 +58,9 @@ class ZQ_API TCollection : public TPersistent {
 
   /// Makes an item at the end.
   TCollectionItem* Add();
+  /// AIndex may be Count. Raises EListError.
   TCollectionItem* Insert(Integer AIndex);
+  /// Ends the item. Raises EListError.
   void Delete(Integer AIndex);
   /// From the last item to the first.
   void Clear();

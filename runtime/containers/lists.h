@@ -53,6 +53,7 @@ class ZQ_API TListOf : public TObject {
   }
   void SetItems(Integer AIndex, T AItem) {
     const T Old = std::exchange(FItems[Slot(AIndex, Count())], AItem);
+    if (Old == AItem) return;
     Notify(Old, lnDeleted);
     Notify(AItem, lnAdded);
   }

@@ -61,8 +61,7 @@ void WriteBytes(TStream& AStream, const TBytes& ABytes) {
 
 }  // namespace
 
-// ---- TStrings
-// --------------------------------------------------------------------------------------------------------
+// ---- TStrings ------------------------------------------------------------------------------------------------------
 
 Integer TStrings::AddObject(const UnicodeString& AText, TObject* AObject) {
   InsertObject(Count(), AText, AObject);
@@ -76,8 +75,12 @@ Integer TStrings::IndexOf(const UnicodeString& AText) const {
 }
 
 void TStrings::AddStrings(const TStrings& AStrings) {
-  const Integer Added = AStrings.Count();  // read once: a list may be added to itself
-  for (Integer i = 0; i < Added; ++i) AddObject(UnicodeString(AStrings.Strings(i)), AStrings.Objects(i));
+  if (&AStrings == this) {
+    TStringList Copy;
+    Copy.AddStrings(AStrings);
+    return AddStrings(Copy);
+  }
+  for (Integer i = 0; i < AStrings.Count(); ++i) AddObject(UnicodeString(AStrings.Strings(i)), AStrings.Objects(i));
 }
 
 void TStrings::Assign(const TPersistent* ASource) {
@@ -174,8 +177,7 @@ void TStrings::SaveToStream(TStream& AStream, const TEncoding& AEncoding) const 
   WriteBytes(AStream, AEncoding.GetBytes(Text()));
 }
 
-// ---- TStringList
-// -----------------------------------------------------------------------------------------------------
+// ---- TStringList ---------------------------------------------------------------------------------------------------
 
 std::size_t TStringList::Slot(Integer AIndex) const {
   if (AIndex < 0 || AIndex >= Count()) ListIndexError(AIndex);

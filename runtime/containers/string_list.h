@@ -30,7 +30,7 @@ class ZQ_API TStrings : public TPersistent {
   virtual void Clear() = 0;
   /// Returns the index.
   virtual Integer AddObject(const UnicodeString& AText, TObject* AObject);
-  /// The first equal string, without regard to case; -1 if absent.
+  /// The first equal string, by the list's own comparison, mostly without regard to case; -1 if absent.
   [[nodiscard]] virtual Integer IndexOf(const UnicodeString& AText) const;
 
   [[nodiscard]] const UnicodeString& operator[](Integer AIndex) const { return Strings(AIndex); }
@@ -42,7 +42,7 @@ class ZQ_API TStrings : public TPersistent {
   void Assign(const TPersistent* ASource) override;
 
   // Strings of the form Name=Value.
-  /// The first string of that name, without regard to case; -1 if absent.
+  /// The first string of that name, by the same comparison; -1 if absent.
   [[nodiscard]] Integer IndexOfName(const UnicodeString& AName) const;
   /// What stands before the first "="; empty where there is none.
   [[nodiscard]] UnicodeString Names(Integer AIndex) const;
@@ -59,8 +59,8 @@ class ZQ_API TStrings : public TPersistent {
   [[nodiscard]] Char Delimiter() const noexcept { return FDelimiter; }
   void SetDelimiter(Char AValue) noexcept { FDelimiter = AValue; }
 
-  // Text in a file or from a stream's position to its end. Without an encoding a load goes by the byte order mark and
-  // takes the default encoding where there is none; with one it skips that encoding's mark. A save without an encoding
+  // Text in a file or from a stream's position to its end. Without an encoding a load goes by the byte order mark of
+  // UTF-8 or UTF-16 and takes the default encoding where there is none; with one it skips that encoding's mark. A save without an encoding
   // takes the default one and writes no mark; with one it writes that encoding's mark. Errors are those of the stream.
   void LoadFromFile(const UnicodeString& AFileName);
   void LoadFromFile(const UnicodeString& AFileName, const TEncoding& AEncoding);

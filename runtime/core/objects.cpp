@@ -73,6 +73,8 @@ NativeInt TObject::GetHashCode() const { return reinterpret_cast<NativeInt>(this
 
 HRESULT TObject::SafeCallException() { return E_UNEXPECTED; }
 
+void detail::RaiseNoClass() { throw EInvalidOperation(u"There is no class to make an object of"); }
+
 void* GetMem(std::size_t ASize) {
   void* const Result = std::malloc(ASize == 0 ? 1 : ASize);
   if (Result == nullptr) throw std::bad_alloc();

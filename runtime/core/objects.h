@@ -109,10 +109,15 @@ struct TFreer {
 template <class T>
 using TOwned = std::unique_ptr<T, TFreer>;
 
+namespace detail {
+[[noreturn]] ZQ_API void RaiseNoClass();
+}
+
 template <class TSignature>
 class TClassRef;
 
-/// Names a class derived from TBase and makes objects of it through its constructor. The empty one makes nothing.
+/// Names a class derived from TBase and makes objects of it through its constructor. The empty one names none, and raises
+/// EInvalidOperation where it is to make one.
 template <class TBase, class... TArgs>
 class TClassRef<TBase(TArgs...)> {
  public:
@@ -122,7 +127,10 @@ class TClassRef<TBase(TArgs...)> {
     return {ClassOf<T>(), [](TArgs... AArgs) -> TBase* { return New<T>(std::forward<TArgs>(AArgs)...); }};
   }
   explicit operator bool() const noexcept { return FCreate != nullptr; }
-  [[nodiscard]] TBase* Create(TArgs... AArgs) const { return FCreate(std::forward<TArgs>(AArgs)...); }
+  [[nodiscard]] TBase* Create(TArgs... AArgs) const {
+    if (FCreate == nullptr) detail::RaiseNoClass();
+    return FCreate(std::forward<TArgs>(AArgs)...);
+  }
   [[nodiscard]] TClass ClassType() const noexcept { return FClass; }
   [[nodiscard]] UnicodeString ClassName() const { return FClass.ClassName(); }
   [[nodiscard]] bool InheritsFrom(TClass AClass) const noexcept { return FClass.InheritsFrom(AClass); }

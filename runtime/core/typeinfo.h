@@ -203,6 +203,12 @@ template <class T>
 
 /// AValue as a whole number from AMin to AMax. Raises as VarToInt64 does.
 [[nodiscard]] ZQ_API Int64 VarToOrdinal(const Variant& AValue, Int64 AMin, Int64 AMax);
+/// Raises EVariantOverflow for a number that isn't infinite and would become so. Single, Double, Extended.
+template <class T>
+[[nodiscard]] ZQ_API T VarToFloat(const Variant& AValue);
+extern template Single VarToFloat(const Variant&);
+extern template Double VarToFloat(const Variant&);
+extern template Extended VarToFloat(const Variant&);
 /// The one character of the text; raises EVariantTypeCast for more or fewer.
 [[nodiscard]] ZQ_API char16_t VarToWChar(const Variant& AValue);
 [[nodiscard]] ZQ_API char VarToAChar(const Variant& AValue);
@@ -217,7 +223,10 @@ concept TVariantValue = KindOf<S>()
 template <class S>
 Variant StorageToVariant(const void* AStorage) {
   const S& Value = *static_cast<const S*>(AStorage);
-  if constexpr (std::is_enum_v<S>) return static_cast<std::conditional_t<sizeof(S) == 8, Int64, Integer>>(Value);
+  if constexpr (std::is_enum_v<S>) {
+    constexpr bool Wide = std::cmp_greater(std::numeric_limits<std::underlying_type_t<S>>::max(), 0x7FFFFFFF);
+    return static_cast<std::conditional_t<Wide, Int64, Integer>>(Value);
+  }
   else if constexpr (KindOf<S>() == tkSet) return Value.ToInteger();
   else if constexpr (std::same_as<S, ShortString>) return UTF8String(Value.View());
   else if constexpr (std::convertible_to<S, Variant>) return Value;
@@ -253,7 +262,7 @@ void VariantToStorage(void* AStorage, const Variant& ASource) {
     std::memcpy(AStorage, &Bits, sizeof Bits);
   } else if constexpr (TMoment<S>) Value = VarToDateTime(ASource).Value;
   else if constexpr (std::same_as<S, Currency>) Value = VarToCurrency(ASource);
-  else if constexpr (std::floating_point<S>) Value = static_cast<S>(VarToReal(ASource));
+  else if constexpr (std::floating_point<S>) Value = VarToFloat<S>(ASource);
   else if constexpr (std::same_as<S, Variant>) Value = ASource;
   else if constexpr (std::same_as<S, TObject*>) Value = VarToObject(ASource);
   else if constexpr (std::same_as<S, IntfRef<IInterface>>) Value = VarToIntf(ASource);
@@ -380,8 +389,11 @@ class TTypeDescription {
   template <class TData, class TSet>
   static auto Writer(TSet ASet) {
     return [ASet](TObject* AObject, const void* ASource) {
-      std::invoke(
-          ASet, Self(AObject), detail::FromStorage<TData>(*static_cast<const detail::StorageOf<TData>*>(ASource)));
+      const auto& Storage = *static_cast<const detail::StorageOf<TData>*>(ASource);
+      auto Value = detail::FromStorage<TData>(Storage);
+      if constexpr (detail::TIntfType<detail::TypeKeyOf<TData>>)
+        if (Storage && !Value) detail::RaiseForeignObject(TypeInfo<TData>());
+      std::invoke(ASet, Self(AObject), std::move(Value));
     };
   }
   template <class TData>

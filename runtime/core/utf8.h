@@ -56,6 +56,7 @@ class TBuffer {
   }
   /// Bytes as they are.
   void AppendBytes(std::string_view ABytes) {
+    if (ABytes.empty()) return;
     if (FRoom - FSize < ABytes.size()) Grow(ABytes.size());
     std::memcpy(FBytes.get() + FSize, ABytes.data(), ABytes.size());
     FSize += ABytes.size();

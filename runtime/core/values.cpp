@@ -79,7 +79,9 @@ PTypeInfo TypeForContent(TVarType AType) {
 
 void CheckBounds(PTypeInfo AType, Int64 AOrdinal) {
   const TTypeData& Data = AType->Data;
-  if (AOrdinal < Data.MinValue || (AOrdinal > 0 && static_cast<UInt64>(AOrdinal) > Data.MaxValue))
+  const auto Place = static_cast<std::size_t>(AOrdinal);
+  const bool IsHole = Place < Data.EnumNames.size() && Data.EnumNames[Place].IsEmpty();
+  if (AOrdinal < Data.MinValue || (AOrdinal > 0 && static_cast<UInt64>(AOrdinal) > Data.MaxValue) || IsHole)
     throw EVariantOverflow(IntToStr(AOrdinal) + u" is no value of " + AType->Name);
 }
 
@@ -201,7 +203,8 @@ Int64 TValue::AsInt64() const {
 
 Integer TValue::AsInteger() const {
   const Int64 Result = AsInt64();
-  if (Result != static_cast<Integer>(Result)) RaiseCast(TypeInfo<Integer>());
+  const bool IsBits = Result < 0 && OrdinalSize(FType) == sizeof Result && !FType->Data.IsSigned;
+  if (IsBits || Result != static_cast<Integer>(Result)) RaiseCast(TypeInfo<Integer>());
   return static_cast<Integer>(Result);
 }
 

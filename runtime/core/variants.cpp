@@ -68,8 +68,18 @@ UnicodeString TextOf(const Variant& AValue) {
   return TEncoding(Data.Bytes->CodePage()).GetString(Data.Bytes->data(), Data.Bytes->size());
 }
 
+// None where there is no character data for the code page of the bytes.
+std::optional<UnicodeString> ReadableText(const Variant& AValue) {
+  try {
+    if (VarIsStr(AValue)) return TextOf(AValue);
+  } catch (const EEncodingError&) {  // the answer is none
+  }
+  return std::nullopt;
+}
+
 UnicodeString Described(const Variant& AValue) {
-  return VarIsStr(AValue) ? u"\"" + TextOf(AValue) + u"\"" : u"A variant of type " + IntToStr(AValue.Type());
+  const auto Text = ReadableText(AValue);
+  return Text ? u"\"" + *Text + u"\"" : u"A variant of type " + IntToStr(AValue.Type());
 }
 [[noreturn]] void RaiseTypeCast(const Variant& AValue, std::u16string_view AWanted) {
   throw EVariantTypeCast(Described(AValue) + u" can't be read as " + AWanted);
@@ -95,7 +105,10 @@ std::optional<Extended> NumberOf(const Variant& AValue) {
   switch (HoldsOf(AValue)) {
     case THolds::Real: return static_cast<Extended>(Data.Real);
     case THolds::Text:
-    case THolds::Bytes: return NumberIn(TextOf(AValue));
+    case THolds::Bytes: {
+      const auto Text = ReadableText(AValue);
+      return Text ? NumberIn(*Text) : std::nullopt;
+    }
     case THolds::Int: break;
     default: return std::nullopt;
   }
@@ -120,6 +133,8 @@ T ToWhole(const Variant& AValue, Extended ANumber, std::u16string_view AWanted) 
   if (!Fits) RaiseOverflow(AValue, AWanted);
   return static_cast<T>(Whole);
 }
+bool IsWhole(Extended ANumber) noexcept { return std::rint(ANumber) == ANumber; }
+
 template <std::integral T>
 T ToWhole(const Variant& AValue, std::u16string_view AWanted) {
   return ToWhole<T>(AValue, ToNumber(AValue, AWanted), AWanted);
@@ -159,7 +174,11 @@ std::partial_ordering operator<=>(const Variant& A, const Variant& B) {
   };
   const auto& DataA = TVarAccess::Data(A);
   const auto& DataB = TVarAccess::Data(B);
-  if (VarIsStr(A) && VarIsStr(B)) return TextOf(A) <=> TextOf(B);
+  if (VarIsStr(A) && VarIsStr(B)) {
+    const auto TextA = ReadableText(A), TextB = ReadableText(B);
+    if (TextA && TextB) return *TextA <=> *TextB;
+    return Equal(!TextA && !TextB && DataA.Bytes->CodePage() == DataB.Bytes->CodePage() && *DataA.Bytes == *DataB.Bytes);
+  }
   if (A.Type() == varError && B.Type() == varError) return Equal(DataA.Int == DataB.Int);
   if (HoldsOf(A) == HoldsOf(B)) switch (HoldsOf(A)) {
       case THolds::Nothing: return Equal(A.Type() == B.Type());
@@ -171,7 +190,12 @@ std::partial_ordering operator<=>(const Variant& A, const Variant& B) {
     }
   const auto NumberA = NumberOf(A);
   const auto NumberB = NumberOf(B);
-  return NumberA && NumberB ? *NumberA <=> *NumberB : std::partial_ordering::unordered;
+  if (!NumberA || !NumberB) return std::partial_ordering::unordered;
+  // A fraction in text or of a Currency is the Double nearest to it, where it meets a Double.
+  const bool WithReal = HoldsOf(A) == THolds::Real || HoldsOf(B) == THolds::Real;
+  if (WithReal && !(IsWhole(*NumberA) && IsWhole(*NumberB)))
+    return static_cast<double>(*NumberA) <=> static_cast<double>(*NumberB);
+  return *NumberA <=> *NumberB;
 }
 
 Variant Null() noexcept { return TVarAccess::Make(varNull, TVarAccess::TData{.Int = 0}); }
@@ -273,8 +297,8 @@ Variant VarAsType(const Variant& AValue, TVarType AType) {
     case varLongWord: return ToWhole<Cardinal>(AValue, u"Cardinal");
     case varInt64: return VarToInt64(AValue);
     case varUInt64: return VarToUInt64(AValue);
-    case varSingle: return static_cast<Single>(VarToReal(AValue));
-    case varDouble: return VarToReal(AValue);
+    case varSingle: return detail::VarToFloat<Single>(AValue);
+    case varDouble: return detail::VarToFloat<Double>(AValue);
     case varCurrency: return VarToCurrency(AValue);
     case varDate: return VarToDateTime(AValue);
     case varBoolean: return VarToBool(AValue);
@@ -295,6 +319,16 @@ Int64 VarToOrdinal(const Variant& AValue, Int64 AMin, Int64 AMax) {
   if (Result < AMin || Result > AMax) RaiseOverflow(AValue, IntToStr(AMin) + u" to " + IntToStr(AMax));
   return Result;
 }
+
+template <class T>
+T VarToFloat(const Variant& AValue) {
+  const Extended Number = VarToReal(AValue);
+  if (std::isfinite(Number) && !std::isfinite(static_cast<T>(Number))) RaiseOverflow(AValue, TypeInfo<T>()->Name);
+  return static_cast<T>(Number);
+}
+template Single VarToFloat(const Variant&);
+template Double VarToFloat(const Variant&);
+template Extended VarToFloat(const Variant&);
 
 char16_t VarToWChar(const Variant& AValue) {
   const UnicodeString Text = VarToUStr(AValue);
@@ -354,13 +388,15 @@ Variant VarArrayOf(TArray<Variant> AItems) {
 
 Variant VarArrayCreate(std::span<const Integer> ABounds, TVarType AElementType) {
   if (ABounds.empty() || ABounds.size() % 2 != 0) throw EVariantBadIndex(u"A dimension has a low and a high bound");
+  if (AElementType == varEmpty || AElementType == varNull) RaiseTypeCast({}, u"elements of a type that holds nothing");
   auto Data = std::make_unique<TVarArrayData>();
   std::size_t Count = 1;
   for (std::size_t i = 0; i < ABounds.size(); i += 2) {
     if (static_cast<Int64>(ABounds[i + 1]) < static_cast<Int64>(ABounds[i]) - 1)
       throw EVariantBadIndex(u"A high bound lies below its low bound");
     Data->Bounds.push_back({ABounds[i], ABounds[i + 1]});
-    Count *= CountOf(ABounds[i], ABounds[i + 1]);
+    if (__builtin_mul_overflow(Count, CountOf(ABounds[i], ABounds[i + 1]), &Count) || Count > Data->Items.max_size())
+      throw EVariantBadIndex(u"The array would have too many elements");
   }
   Data->Items.assign(Count, VarAsType({}, AElementType));
   return TVarAccess::Make(varArray | AElementType, TVarAccess::TData{.Array = Data.release()});

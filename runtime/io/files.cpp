@@ -103,7 +103,9 @@ bool ForceDirectories(const UnicodeString& ADirectory) {
 UnicodeString ExpandFileName(const UnicodeString& AFileName) {
   if (AFileName.IsEmpty()) return {};
   const bool Absolute = IsPathSeparator(AFileName[1]);
-  const std::u16string Full = Absolute ? AFileName.Str() : GetCurrentDir().Str() + u'/' + AFileName.Str();
+  const UnicodeString Current = Absolute ? UnicodeString() : GetCurrentDir();
+  if (!Absolute && Current.IsEmpty()) return AFileName;
+  const std::u16string Full = Absolute ? AFileName.Str() : Current.Str() + u'/' + AFileName.Str();
   std::u16string Result = Normalize(Full);
   if (Result.empty() || IsPathSeparator(Full.back())) Result += u'/';
   return UnicodeString(std::move(Result));

@@ -31,7 +31,8 @@ ZQ_API bool CreateDir(const UnicodeString& ADirectory);
 ZQ_API bool RemoveDir(const UnicodeString& ADirectory);
 /// Makes the whole path. True if it is there now; an empty one always is.
 ZQ_API bool ForceDirectories(const UnicodeString& ADirectory);
-/// Absolute, with "/" and without "." and ".."; taken by the text alone. The empty name stays empty.
+/// Absolute, with "/" and without "." and ".."; taken by the text alone. The empty name stays empty, and a
+/// relative one as it is where the current folder is gone.
 [[nodiscard]] ZQ_API UnicodeString ExpandFileName(const UnicodeString& AFileName);
 /// Empty where the folder is gone.
 [[nodiscard]] ZQ_API UnicodeString GetCurrentDir();
@@ -48,7 +49,7 @@ class TFolderScan;
 /// One entry of a folder and the scan that found it; the scan ends with the record at the latest.
 ///
 /// Of a link, Attr has faSymLink and never faDirectory, so that no walk leaves its folder; size and times are its
-/// target's.
+/// target's, or its own where that is a folder or missing.
 struct ZQ_API TSearchRec {
   TSearchRec() noexcept;
   TSearchRec(TSearchRec&&) noexcept;

@@ -62,7 +62,7 @@ UnicodeString ExtractFilePath(const UnicodeString& AFileName) {
 
 UnicodeString ExtractFileDir(const UnicodeString& AFileName) {
   std::size_t Length = NameStart(AFileName);
-  if (Length > 1 && !IsPathSeparator(AFileName.View()[Length - 2])) --Length;
+  while (Length > 1 && IsPathSeparator(AFileName.View()[Length - 1])) --Length;
   return AFileName.View().substr(0, Length);
 }
 

@@ -9,6 +9,8 @@
 #include <cerrno>
 #include <cstring>
 #include <limits>
+#include <new>
+#include <stdexcept>
 #include <utility>
 
 #include "runtime/io/files.h"
@@ -57,11 +59,12 @@ void TStream::WriteBuffer(const void* ABuffer, Int64 ACount) {
 }
 
 Int64 TStream::CopyFrom(TStream& ASource, Int64 ACount, Integer ABufferSize) {
-  const bool Exact = ACount >= 0;
   if (ACount == 0) {
     ASource.SetPosition(0);
     ACount = ASource.Size();
   }
+  ABufferSize = std::max(ABufferSize, 1);
+  const bool Exact = ACount >= 0;
   TBytes Buffer(static_cast<std::size_t>(Exact ? std::clamp<Int64>(ACount, 0, ABufferSize) : ABufferSize));
   Int64 Copied = 0;
   while (!Exact || Copied < ACount) {
@@ -161,7 +164,8 @@ Integer TCustomMemoryStream::Read(void* ABuffer, Integer ACount) {
 
 Int64 TCustomMemoryStream::Seek(Int64 AOffset, TSeekOrigin AOrigin) {
   const Int64 Base = AOrigin == soBeginning ? 0 : AOrigin == soCurrent ? FPosition : FSize;
-  return FPosition = std::max<Int64>(Base + AOffset, 0);
+  constexpr Int64 cFarthest = std::numeric_limits<Int64>::max();
+  return FPosition = AOffset > cFarthest - Base ? cFarthest : std::max<Int64>(Base + AOffset, 0);
 }
 
 void TCustomMemoryStream::SaveToStream(TStream& ADest) const { ADest.WriteBuffer(FMemory, FSize); }
@@ -176,22 +180,29 @@ void TCustomMemoryStream::SetPointer(void* AMemory, Int64 ASize) noexcept {
   FSize = ASize;
 }
 
+void TMemoryStream::Resize(UInt64 ASize) {
+  try {
+    FBytes.resize(ASize);
+  } catch (const std::bad_alloc&) {
+    throw EStreamError(u"There is no memory for the stream");
+  } catch (const std::length_error&) {
+    throw EStreamError(u"There is no memory for the stream");
+  }
+  SetPointer(FBytes.data(), static_cast<Int64>(ASize));
+}
+
 Integer TMemoryStream::Write(const void* ABuffer, Integer ACount) {
   if (ACount <= 0) return 0;
-  const Int64 End = FPosition + ACount;
-  if (End > FSize) {
-    FBytes.resize(static_cast<std::size_t>(End));
-    SetPointer(FBytes.data(), End);
-  }
+  const UInt64 End = static_cast<UInt64>(FPosition) + static_cast<UInt64>(ACount);
+  if (End > static_cast<UInt64>(FSize)) Resize(End);
   std::memcpy(FBytes.data() + FPosition, ABuffer, static_cast<std::size_t>(ACount));
-  FPosition = End;
+  FPosition += ACount;
   return ACount;
 }
 
 void TMemoryStream::SetSize(Int64 ASize) {
-  FBytes.resize(static_cast<std::size_t>(std::max<Int64>(ASize, 0)));
-  if (FBytes.empty()) FBytes = {};
-  SetPointer(FBytes.data(), static_cast<Int64>(FBytes.size()));
+  if (ASize <= 0) FBytes = {};
+  Resize(static_cast<UInt64>(std::max<Int64>(ASize, 0)));
   FPosition = std::min(FPosition, FSize);
 }
 
@@ -199,6 +210,7 @@ void TMemoryStream::LoadFromStream(TStream& ASource) {
   const Int64 Count = ASource.Size();
   ASource.SetPosition(0);
   SetSize(Count);
+  if (Count < 0) CopyFrom(ASource, -1);
   ASource.ReadBuffer(FMemory, Count);
 }
 

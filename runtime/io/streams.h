@@ -45,7 +45,7 @@ class ZQ_API TStream : public TObject {
   /// All ACount bytes, or EWriteError.
   void WriteBuffer(const void* ABuffer, Int64 ACount);
   /// Copies ACount bytes from ASource's position on, which must be there (EReadError); 0: all of ASource from its
-  /// start; negative: whatever is left of it. Returns the number. ABufferSize is the size of the steps.
+  /// start, if it can seek; negative: whatever is left of it. Returns the number. ABufferSize is the size of the steps.
   Int64 CopyFrom(TStream& ASource, Int64 ACount = 0, Integer ABufferSize = 0x100000);
 };
 
@@ -114,18 +114,20 @@ class ZQ_API TCustomMemoryStream : public TStream {
   Int64 FPosition = 0;
 };
 
-/// Memory that grows with what is written.
+/// Memory that grows with what is written. Raises EStreamError where there is no memory for it.
 class ZQ_API TMemoryStream : public TCustomMemoryStream {
  public:
   Integer Write(const void* ABuffer, Integer ACount) override;
   /// New bytes are zero; the position is clipped.
   void SetSize(Int64 ASize) override;
   void Clear() { SetSize(0); }
-  /// Replaces the content with all of ASource, from its start.
+  /// Replaces the content with all of ASource, from its start, or with what is left in one that can't seek.
   void LoadFromStream(TStream& ASource);
   void LoadFromFile(const UnicodeString& AFileName);
 
  private:
+  void Resize(UInt64 ASize);
+
   TBytes FBytes;
 };
 

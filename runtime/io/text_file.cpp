@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <limits>
 #include <utility>
 
 #include "runtime/core/exceptions.h"
@@ -22,8 +23,8 @@ constexpr std::string_view cLineEnd = "\r\n";
 constexpr std::size_t cOnStack = 2048;
 constexpr std::size_t cKeptRoom = 1 << 20;
 
-// At most this many bytes for one unit; the stateful code pages put an escape sequence around it.
-constexpr std::size_t MaxBytesPerUnit(Word ACodePage) noexcept { return ACodePage == cUTF8 ? 3 : 8; }
+// At most this many bytes for one unit; the stateful code pages put an escape sequence on either side of it.
+constexpr std::size_t MaxBytesPerUnit(Word ACodePage) noexcept { return ACodePage == cUTF8 ? 3 : 10; }
 
 // Bytes written to ADest, which has ARoom; 0 for a text that the code page's converter refuses.
 std::size_t EncodeTo(char* ADest, std::size_t ARoom, std::u16string_view AText, Word ACodePage) {
@@ -70,6 +71,7 @@ void TTextFile::WriteText(std::u16string_view AText, std::string_view ALineEnd) 
   RequireOpen();
   char OnStack[cOnStack];
   const std::size_t Room = MaxBytesPerUnit(FCodePage) * AText.size();
+  if (FCodePage != cUTF8 && Room > std::numeric_limits<int>::max()) Fail(u"write", EFBIG);
   if (Room + 2 * cLineEnd.size() > cOnStack && FLong.size() < Room + 2 * cLineEnd.size())
     FLong.resize(Room + 2 * cLineEnd.size());
   char* const Start = Room + 2 * cLineEnd.size() <= cOnStack ? OnStack : FLong.data();

@@ -18,7 +18,7 @@ constexpr Int64 FloorDiv(Int64 AValue, Int64 ABy) noexcept { return AValue / ABy
 
 // Rises when the zone may have changed.
 constinit std::atomic<unsigned> ZoneGeneration{0};
-constinit std::mutex ZoneLock;  // the system's own lock about its zone is none that a race detector sees
+constinit std::mutex ZoneLock;  // localtime_r reads what tzset writes
 
 Integer SystemOffset(Int64 AUtcSeconds) noexcept {
   const auto Moment = static_cast<std::time_t>(AUtcSeconds);
@@ -93,8 +93,10 @@ TDateTime UnixMillisecondsToDateTime(Int64 AMilliseconds) noexcept {
 }
 
 Int64 DateTimeToUnixMilliseconds(TDateTime AValue) noexcept {
-  const double Day = std::trunc(AValue.Value);
-  const double Fraction = std::fabs(AValue.Value - Day);
+  constexpr double MaxDay = 1e9;  // what doesn't fit is cut; no calendar goes so far
+  const double Value = std::isnan(AValue.Value) ? 0 : std::clamp(AValue.Value, -MaxDay, MaxDay);
+  const double Day = std::trunc(Value);
+  const double Fraction = std::fabs(Value - Day);
   return (static_cast<Int64>(Day) - cUnixEpoch) * cMillisecondsPerDay +
          std::llround(Fraction * static_cast<double>(cMillisecondsPerDay));
 }

@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <csignal>
+#include <filesystem>
 #include <string_view>
 
 #include "runtime/io/files.h"
@@ -28,8 +29,8 @@ bool IsSoleOpener(int AHandle) noexcept {
 class TLinuxFiles final : public TFileService {
  public:
   UnicodeString GetShortPathName(const UnicodeString& AName) override {
-    const UnicodeString Full = ExpandFileName(AName);
-    return FileGetAttr(Full) < 0 ? UnicodeString() : Full;
+    if (FileGetAttr(AName) < 0) return {};
+    return FromSystemPath(std::filesystem::absolute(ToSystemPath(AName)).string());  // ".." may lie behind a link
   }
 
   UnicodeString GetTempPath() override {
@@ -51,6 +52,7 @@ class TLinuxFiles final : public TFileService {
   }
 
   UnicodeString SearchPath(const UnicodeString& AName) override {
+    if (!AName.IsEmpty() && IsPathSeparator(AName[1])) return {};
     const std::string Folders = ToSystemPath(ExtractFileDir(ParamStr(0))) + ':' + EnvironmentText("PATH");
     for (std::string_view Rest = Folders; !Rest.empty();) {
       const std::string_view Folder = Rest.substr(0, Rest.find(':'));

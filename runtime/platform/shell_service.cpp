@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <charconv>
 #include <filesystem>
@@ -226,14 +227,20 @@ std::string ProgramOf(std::string_view AExec) {
   return Result;
 }
 
+std::string_view WithoutBlanks(std::string_view AText) {
+  const std::size_t First = std::min(AText.find_first_not_of(" \t\r"), AText.size());
+  return AText.substr(First, AText.find_last_not_of(" \t\r") + 1 - First);
+}
+
 // The value of AKey in the group "Desktop Entry"; empty if there is none.
 std::string EntryValue(std::string_view AContent, std::string_view AKey) {
   bool InGroup = false;
   while (!AContent.empty()) {
     const std::string_view Line = TakeLine(AContent);
     if (Line.starts_with('[')) InGroup = Line == "[Desktop Entry]";
-    if (InGroup && Line.starts_with(AKey) && Line.substr(AKey.size()).starts_with('='))
-      return UnescapedValue(Line.substr(AKey.size() + 1));
+    const std::size_t Equals = Line.find('=');
+    if (InGroup && Equals != Line.npos && WithoutBlanks(Line.substr(0, Equals)) == AKey)
+      return UnescapedValue(WithoutBlanks(Line.substr(Equals + 1)));
   }
   return {};
 }
@@ -271,17 +278,22 @@ class TDesktopEntry : public TShellLink {
   }
 
   HRESULT Load(const UnicodeString& AFile, Cardinal) override {
-    constexpr std::string_view FileUrl = "file://";
     const std::string Content = ReadSystemFile(ToSystemPath(AFile));
     const std::string Url = EntryValue(Content, "URL");
     FDescription = FromUTF8(EntryValue(Content, "Comment"));
     if (EntryValue(Content, "Type") == "Application") FTarget = FromSystemPath(ProgramOf(EntryValue(Content, "Exec")));
-    else
-      FTarget = Url.starts_with(FileUrl) ? FromSystemPath(PercentDecoded(Url.substr(FileUrl.size()))) : FromUTF8(Url);
+    else FTarget = TargetOf(Url);
     return FTarget.IsEmpty() ? E_FAIL : S_OK;
   }
 
  private:
+  // A file's URL may name this computer before the path.
+  static UnicodeString TargetOf(std::string_view AUrl) {
+    constexpr std::string_view FileUrl = "file://";
+    if (!AUrl.starts_with(FileUrl)) return FromUTF8(AUrl);
+    const std::size_t Path = AUrl.find('/', FileUrl.size());
+    return FromSystemPath(PercentDecoded(AUrl.substr(std::min(Path, AUrl.size()))));
+  }
   static HRESULT Keep(UnicodeString& AField, const UnicodeString& AValue) {
     AField = AValue;
     return S_OK;

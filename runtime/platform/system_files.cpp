@@ -13,12 +13,18 @@ namespace zq {
 
 namespace {
 
-// A word of the shell, as far as such files use it: quotes go, a backslash keeps the next character.
+// A word of the shell, as far as such files use it: the quotes around a part go, a backslash keeps the next character,
+// but between single quotes, where it is one of the text.
 std::string Unquoted(std::string_view AText) {
   std::string Result;
+  char Quote = 0;
   for (std::size_t i = 0; i < AText.size(); ++i) {
-    if (AText[i] == '"' || AText[i] == '\'') continue;
-    if (AText[i] == '\\' && i + 1 < AText.size()) ++i;
+    const bool IsQuote = AText[i] == '"' || AText[i] == '\'';
+    if (IsQuote && (Quote == 0 || Quote == AText[i])) {
+      Quote = Quote == 0 ? AText[i] : '\0';
+      continue;
+    }
+    if (AText[i] == '\\' && Quote != '\'' && i + 1 < AText.size()) ++i;
     Result += AText[i];
   }
   return Result;

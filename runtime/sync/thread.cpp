@@ -22,8 +22,7 @@ void Sleep(Cardinal AMilliseconds) {
 
 bool IsMainThread() noexcept { return GetCurrentThreadId() == GetCurrentProcessId(); }
 
-// ---- Native threads
-// --------------------------------------------------------------------------------------------------
+// ---- Native threads ------------------------------------------------------------------------------------------------
 
 namespace {
 
@@ -82,8 +81,7 @@ void EndThread(Integer AExitCode) {
   throw TThreadExit{AExitCode};
 }
 
-// ---- The main thread's queue
-// -----------------------------------------------------------------------------------------
+// ---- The main thread's queue ---------------------------------------------------------------------------------------
 
 namespace {
 
@@ -182,8 +180,7 @@ void TThread::ForceQueue(const TThread* AThread, TThreadProcedure AProcedure) {
 
 void TThread::RemoveQueuedEvents(const TThread* AThread) { TMainQueue::Get().Remove(AThread); }
 
-// ---- TThread
-// ---------------------------------------------------------------------------------------------------------
+// ---- TThread -------------------------------------------------------------------------------------------------------
 
 TThread::~TThread() { RemoveQueuedEvents(this); }
 
@@ -243,8 +240,7 @@ Integer TThread::Run() {
   return Result;
 }
 
-// ---- TMonitor
-// --------------------------------------------------------------------------------------------------------
+// ---- TMonitor ------------------------------------------------------------------------------------------------------
 
 namespace {
 

@@ -58,7 +58,7 @@ ZQ_API void DecodeDate(TDateTime AValue, Word& AYear, Word& AMonth, Word& ADay) 
 /// To the nearest millisecond. One that would be midnight is 00:00, and DecodeDate of the same value gives the next
 /// day.
 ZQ_API void DecodeTime(TDateTime AValue, Word& AHour, Word& AMinute, Word& ASecond, Word& AMilliseconds) noexcept;
-/// 1 is Sunday, 7 Saturday.
+/// 1 is Sunday, 7 Saturday. 1 for a moment before year 1 or behind 9999.
 [[nodiscard]] ZQ_API Word DayOfWeek(TDateTime AValue) noexcept;
 
 /// Raises EConvertError for a moment outside of the years 1 to 9999.
@@ -82,7 +82,8 @@ ZQ_API void DecodeTime(TDateTime AValue, Word& AHour, Word& AMinute, Word& ASeco
 ///   t tt c ddddd dddddd  short time, long time, date with the time if there is one, short date, long date
 ///   "text" 'text'        as it is
 ///
-/// Every other character is copied, ":" and "/" too. Without settings these go by FormatSettings().
+/// Every other character is copied, ":" and "/" too. Without settings these go by FormatSettings(). They and the next
+/// ones raise EConvertError for a moment before year 1 or behind 9999.
 [[nodiscard]] ZQ_API UnicodeString FormatDateTime(const UnicodeString& APattern, TDateTime AValue);
 [[nodiscard]] ZQ_API UnicodeString FormatDateTime(
     const UnicodeString& APattern, TDateTime AValue, const TFormatSettings& ASettings);

@@ -173,6 +173,15 @@ bool TakesNoFlags(Word ANumber) noexcept {
   return std::ranges::find(cNone, ANumber) != std::end(cNone) || (ANumber >= 57002 && ANumber <= 57011);
 }
 
+UConverter* OpenConverter(const TPage& APage) {
+  UErrorCode Error = U_ZERO_ERROR;
+  UConverter* const Result = ucnv_open(APage.Converter, &Error);
+  return U_FAILURE(Error) ? nullptr : Result;
+}
+
+// Set when the thread's converters have ended: objects that end after them may convert still.
+constinit thread_local bool ConvertersEnded = false;
+
 // The threads' converters: opening one costs more than most conversions.
 class TConverters {
  public:
@@ -181,6 +190,7 @@ class TConverters {
   TConverters& operator=(const TConverters&) = delete;
   ~TConverters() {
     for (const TSlot& Slot : FSlots) ucnv_close(Slot.Converter);
+    ConvertersEnded = true;
   }
   UConverter* Get(const TPage& APage) {
     for (const TSlot& Slot : FSlots)
@@ -188,9 +198,8 @@ class TConverters {
         ucnv_reset(Slot.Converter);
         return Slot.Converter;
       }
-    UErrorCode Error = U_ZERO_ERROR;
-    UConverter* const Result = ucnv_open(APage.Converter, &Error);
-    if (U_FAILURE(Error)) return nullptr;
+    UConverter* const Result = OpenConverter(APage);
+    if (Result == nullptr) return nullptr;
     TSlot& Slot = FSlots[FNext++ % FSlots.size()];
     ucnv_close(Slot.Converter);
     Slot = {&APage, Result};
@@ -206,9 +215,17 @@ class TConverters {
   std::size_t FNext = 0;
 };
 
-UConverter* ConverterOf(const TPage& APage) {
+struct TGiveBack {
+  bool Close;
+  void operator()(UConverter* AConverter) const noexcept {
+    if (Close) ucnv_close(AConverter);
+  }
+};
+
+std::unique_ptr<UConverter, TGiveBack> ConverterOf(const TPage& APage) {
+  if (ConvertersEnded) return {OpenConverter(APage), {.Close = true}};
   thread_local TConverters Converters;
-  return Converters.Get(APage);
+  return {Converters.Get(APage), {.Close = false}};
 }
 
 // --------------------------------------------------------------------------------------------- conversion, both ways
@@ -276,6 +293,7 @@ int AfterPlainRun(const TPage& APage, const TFrom* ASource, int ACount, TTo* ADe
   }
   if (Run == ACount) return Run;
   const int Rest = ARest(ASource + Run, ACount - Run, ADest, ACapacity - Run);
+  if (Rest > std::numeric_limits<int>::max() - Run) return Refuse(ERROR_INSUFFICIENT_BUFFER);
   return Rest == cFailed ? cFailed : Run + Rest;
 }
 
@@ -313,13 +331,13 @@ void U_CALLCONV DecodeMalformed(const void* AStrict, UConverterToUnicodeArgs* AA
 }
 
 int DecodeByTable(const TPage& APage, bool AStrict, const char* ASource, int ABytes, char16_t* ADest, int ADestChars) {
-  UConverter* const Converter = ConverterOf(APage);
+  const auto Converter = ConverterOf(APage);
   if (Converter == nullptr) return Refuse(ERROR_INVALID_PARAMETER);
   UErrorCode Error = U_ZERO_ERROR;
-  ucnv_setToUCallBack(Converter, DecodeMalformed, &AStrict, nullptr, nullptr, &Error);
+  ucnv_setToUCallBack(Converter.get(), DecodeMalformed, &AStrict, nullptr, nullptr, &Error);
   const char* const End = ASource + ABytes;
   const auto Step = [&](char16_t** AAt, const char16_t* ALimit, UErrorCode* AError) {
-    ucnv_toUnicode(Converter, AAt, ALimit, &ASource, End, nullptr, true, AError);
+    ucnv_toUnicode(Converter.get(), AAt, ALimit, &ASource, End, nullptr, true, AError);
   };
   const int Result = Pump(ADest, ADestChars, Step);
   if (APage.Shape == AsciiRotated && ADest != nullptr && Result > 0)
@@ -388,6 +406,7 @@ struct TSubstitute {
   char16_t Char = u'?';
   bool Strict = false;  // fail instead
   bool Used = false;
+  bool Rotated = false;  // what the converter gives has three bytes exchanged, which are put right behind it
 };
 
 void U_CALLCONV EncodeMissing(const void* AContext, UConverterFromUnicodeArgs* AArgs, const UChar*, int32_t, UChar32,
@@ -398,8 +417,10 @@ void U_CALLCONV EncodeMissing(const void* AContext, UConverterFromUnicodeArgs* A
   Substitute.Used = true;
   *AError = U_ZERO_ERROR;
   if (Substitute.Bytes != nullptr) {
-    const auto Count = std::max<std::size_t>(std::strlen(Substitute.Bytes), 1);  // an empty one is a byte 0
-    ucnv_cbFromUWriteBytes(AArgs, Substitute.Bytes, static_cast<int32_t>(Count), 0, AError);
+    const auto Count = static_cast<int32_t>(std::max<std::size_t>(std::strlen(Substitute.Bytes), 1));
+    std::string Bytes(Substitute.Bytes, static_cast<std::size_t>(Count));  // an empty one is a byte 0
+    if (Substitute.Rotated) Unrotate(Bytes.data(), Count, "\x1A\x1C\x7F", "\x7F\x1A\x1C");
+    ucnv_cbFromUWriteBytes(AArgs, Bytes.data(), Count, 0, AError);
   } else {
     const UChar* At = &Substitute.Char;
     ucnv_cbFromUWriteUChars(AArgs, &At, At + 1, 0, AError);
@@ -408,18 +429,18 @@ void U_CALLCONV EncodeMissing(const void* AContext, UConverterFromUnicodeArgs* A
 
 int EncodeByTable(const TPage& APage, bool ABestFit, TSubstitute& ASubstitute, const char16_t* ASource, int AChars,
     char* ADest, int ADestBytes) {
-  UConverter* const Converter = ConverterOf(APage);
+  const auto Converter = ConverterOf(APage);
   if (Converter == nullptr) return Refuse(ERROR_INVALID_PARAMETER);
   UErrorCode Error = U_ZERO_ERROR;
-  ucnv_setFallback(Converter, ABestFit);
-  ucnv_setFromUCallBack(Converter, EncodeMissing, &ASubstitute, nullptr, nullptr, &Error);
+  ASubstitute.Rotated = APage.Shape == AsciiRotated;
+  ucnv_setFallback(Converter.get(), ABestFit);
+  ucnv_setFromUCallBack(Converter.get(), EncodeMissing, &ASubstitute, nullptr, nullptr, &Error);
   const char16_t* const End = ASource + AChars;
   const auto Step = [&](char** AAt, const char* ALimit, UErrorCode* AError) {
-    ucnv_fromUnicode(Converter, AAt, ALimit, &ASource, End, nullptr, true, AError);
+    ucnv_fromUnicode(Converter.get(), AAt, ALimit, &ASource, End, nullptr, true, AError);
   };
   const int Result = Pump(ADest, ADestBytes, Step);
-  if (APage.Shape == AsciiRotated && ADest != nullptr && Result > 0)
-    Unrotate(ADest, Result, "\x7F\x1A\x1C", "\x1A\x1C\x7F");
+  if (ASubstitute.Rotated && ADest != nullptr && Result > 0) Unrotate(ADest, Result, "\x7F\x1A\x1C", "\x1A\x1C\x7F");
   return Result;
 }
 
@@ -597,7 +618,10 @@ template <class TResult, class TConvert>
 TResult SizedAndFilled(std::size_t ACount, TConvert AConvert) {
   TResult Result;
   if (ACount == 0) return Result;
-  const int Size = AConvert(nullptr, 0);
+  const bool Countable = ACount <= static_cast<std::size_t>(std::numeric_limits<int>::max());
+  const int Size = Countable ? AConvert(nullptr, 0) : 0;
+  if (!Countable || (Size == 0 && GetLastError() == ERROR_INSUFFICIENT_BUFFER))
+    throw EEncodingError(u"The text is too long to be converted");
   Result.resize(static_cast<std::size_t>(Size));
   if (Size > 0) AConvert(Result.data(), Size);
   return Result;

@@ -53,7 +53,7 @@ ZQ_API int NormalizeString(int AForm, const char16_t* ASource, int AChars, char1
 /// The code page of a charset that the system names; 65001 for ASCII and for one without character data.
 [[nodiscard]] ZQ_API Word CodePageOfCharset(const char* ACharset) noexcept;
 
-/// Sets the process's ANSI code page, for all threads, until the end of its scope. For hosts and tests; scopes nest.
+/// Sets the process's ANSI code page, for all threads, until the end of its scope. Scopes nest.
 class ZQ_API TAnsiCodePageScope {
  public:
   explicit TAnsiCodePageScope(Word ACodePage) noexcept;
@@ -65,11 +65,12 @@ class ZQ_API TAnsiCodePageScope {
   Word FSaved;
 };
 
-/// Names AString's code page; with AConvert its bytes are converted first, which raises EOSError on failure.
+/// Names AString's code page; with AConvert its bytes are converted first, which raises EOSError on failure,
+/// or EEncodingError where 2 GiB aren't enough for the text.
 ZQ_API void SetCodePage(RawByteString& AString, Word ACodePage, bool AConvert = true);
 
 /// Text encoding of one code page. Conversions replace what they can't convert; they raise EEncodingError only where
-/// there is no character data for the page. Any thread.
+/// there is no character data for the page, or 2 GiB aren't enough for the text. Any thread.
 class ZQ_API TEncoding : public TObject {
  public:
   explicit TEncoding(Word ACodePage) noexcept : FCodePage(ACodePage) {}

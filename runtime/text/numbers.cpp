@@ -1,9 +1,12 @@
 #include "runtime/text/numbers.h"
 
+#include <locale.h>
+
 #include <algorithm>
 #include <array>
 #include <charconv>
 #include <cmath>
+#include <cstdlib>
 #include <limits>
 #include <string>
 
@@ -131,12 +134,20 @@ class TFloatReader {
     SkipBlanks(FRest);
     if (!FRest.empty()) return false;
     Extended Result = 0;
-    if (std::from_chars(FPlain.data(), FPlain.data() + FPlain.size(), Result).ec != std::errc()) return false;
+    const auto Failure = std::from_chars(FPlain.data(), FPlain.data() + FPlain.size(), Result).ec;
+    if (Failure == std::errc::result_out_of_range && !ReadNearZero(Result)) return false;
+    if (Failure != std::errc() && Failure != std::errc::result_out_of_range) return false;
     AValue = Result;
     return true;
   }
 
  private:
+  // A number too small for a normal float is one still, which from_chars doesn't tell from one that is too large.
+  bool ReadNearZero(Extended& AValue) const {
+    static const locale_t Plain = ::newlocale(LC_ALL_MASK, "C", nullptr);
+    AValue = ::strtold_l(FPlain.c_str(), nullptr, Plain);
+    return std::fabs(AValue) < 1;
+  }
   std::size_t ReadDigits() {
     std::size_t Count = 0;
     for (; !FRest.empty() && DigitOf(FRest.front()) < 10; ++Count) {
