@@ -13,8 +13,8 @@ namespace {
 
 constexpr TPackageUnit cUnits[] = {
     {u"uZqSysUtils", uZqSysUtils::Start, uZqSysUtils::Stop},
-    {u"uZqTypes", nullptr, nullptr},
-    {u"uZqClasses", nullptr, nullptr},
+    {u"uZqTypes", uZqTypes::Start, nullptr},
+    {u"uZqClasses", uZqClasses::Start, nullptr},
     {u"uZqWindows", nullptr, nullptr},
     {u"uZqLogLayouts", uZqLogLayouts::Start, nullptr},
     {u"uZqLogger", uZqLogger::Start, uZqLogger::Stop},

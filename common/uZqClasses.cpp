@@ -1,5 +1,7 @@
 #include "common/uZqClasses.h"
 
+#include "runtime/core/typeinfo.h"
+
 namespace zq {
 
 using namespace uZqClasses;
@@ -41,9 +43,15 @@ void TZqObject::BeforeDestruction() {
 // ---- Linked objects ------------------------------------------------------------------------------------------------
 
 TZqObjectEx::~TZqObjectEx() {  // finds partners only where the construction failed or a destructor made new ones
-  try {
-    TellPartners();
-  } catch (...) {  // a destructor has nobody to tell
+  while (FFreeNotifies != nullptr) {
+    TObject* const Partner = FFreeNotifies->Last();
+    try {
+      TellPartner(Partner);
+    } catch (...) {  // a destructor has nobody to tell, but the link must go
+      const TNeutral Kept(dynamic_cast<TZqObject*>(Partner));
+      if (const auto Other = Supports<IZqObjectEx>(Partner)) Other->RemoveNotification(this);
+      RemoveNotification(Partner);
+    }
   }
 }
 
@@ -132,11 +140,19 @@ void TZqFreeNotifies::BeforeDestruction() {
   while (List->Count() > 0) {
     TZqFreeNotifies* const Partner = List->Last();
     Partner->Remove(this);
-    Partner->FOnObjectDestroyedProc(FOwner);
+    try {
+      Partner->FOnObjectDestroyedProc(FOwner);
+    } catch (...) {  // this one lives on, and the partner, which has forgotten it, may go
+      List->Remove(Partner);
+      throw;
+    }
     List->Remove(Partner);
   }
   TObject::BeforeDestruction();
 }
+
+// Finds an object only where the construction failed.
+TZqObjectAdapter::~TZqObjectAdapter() { const TOwned<TObject> Left(FOwnership == ooOwned ? FObject : nullptr); }
 
 void TZqObjectAdapter::BeforeDestruction() {
   Implements::BeforeDestruction();
@@ -164,8 +180,8 @@ void TZqComponent::AfterConstruction() {
 
 void TZqComponent::BeforeDestruction() {
   if (RefCount() != 0) throw Exception(_SCompRefCountNotZero, {ClassName(), Name()});
+  ClearBindings();  // first: nothing of what ends now is to reach a setter
   Implements::BeforeDestruction();
-  ClearBindings();  // while the getters and setters of the final class still work
 }
 
 void TZqComponent::BindOneWay(TObject* ASource, const UnicodeString& ASourceProperty, TObject* ADest,
@@ -199,6 +215,11 @@ void TZqComponent::ClearBindings() {
 
 void TZqComponent::NotifyBindings(const UnicodeString& APropertyName) {
   TBindings::Notify(this, APropertyName, nullptr);
+}
+
+void uZqClasses::Start() {
+  DescribeType<TZqAutoDestroy>(u"uZqClasses").EnumNames({u"radComputed", u"radFalse", u"radTrue"});
+  DescribeType<TZqObjectOwnership>(u"uZqClasses").EnumNames({u"ooReference", u"ooOwned"});
 }
 
 }  // namespace zq

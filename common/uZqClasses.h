@@ -17,6 +17,8 @@ inline constexpr TResStringRec _SObjRefCountNotZero{
 inline constexpr TResStringRec _SCompRefCountNotZero{
     65508, u"An instance of %s with the name %s is destroyed while it's refcount is not 0!"};
 inline constexpr TResStringRec _SEncodingNotSupported{65510, u"The specified encoding is not supported!"};
+
+void Start();
 }  // namespace uZqClasses
 
 // ---- Interfaces ----------------------------------------------------------------------------------------------------
@@ -37,7 +39,9 @@ struct IZqObjectEx : Extends<IZqObject> {
   static constexpr TGUID IID = "{66D757F3-6274-47EC-95A9-39B144271EA9}"_guid;
   /// One-sided: only this object forgets AObject.
   virtual void RemoveNotification(const TObject* AObject) = 0;
+  /// Links both ways, as far as AObject can; it must not be empty.
   virtual void FreeNotificationEx(const IntfRef<IZqObjectFreeNotificationEvent>& AObject) = 0;
+  /// Undoes that on both sides.
   virtual void RemoveFreeNotificationEx(const IntfRef<IZqObject>& AObject) = 0;
 };
 
@@ -46,6 +50,7 @@ using enum TZqObjectOwnership;
 
 struct IZqObjectAdapter : Extends<IInterface> {
   static constexpr TGUID IID = "{6C25403A-FB3F-4F23-87AC-8DD56330109B}"_guid;
+  /// The object behind the adapter, which stays its owner's or the adapter's by GetOwnership.
   virtual TObject* GetObject() = 0;
   virtual TZqObjectOwnership GetOwnership() = 0;
 };
@@ -87,6 +92,7 @@ class ZQ_API TZqObject : public Implements<TObject, IZqObject> {
   [[nodiscard]] Integer RefCount() const noexcept { return FCount.Value(); }
   [[nodiscard]] virtual bool GetAutoDestroy() const { return FCount.State() == radTrue; }
   [[nodiscard]] bool AutoDestroy() const { return GetAutoDestroy(); }
+  /// Decides; there is no way back to undecided.
   void SetAutoDestroy(bool AValue) noexcept { FCount.SetState(AValue ? radTrue : radFalse); }
 
   HRESULT QueryInterface(const TGUID& AIID, void** AObj) override;
@@ -99,23 +105,27 @@ class ZQ_API TZqObject : public Implements<TObject, IZqObject> {
   void AfterConstruction() override;
   void BeforeDestruction() override;
 
-  /// Keeps references that come and go within a scope from deciding over AObject or ending it.
+  /// Keeps references that come and go within a scope from deciding over AObject or ending it. One that stays decides.
   class TNeutral {
    public:
     /// AObject may be nullptr.
     explicit TNeutral(TZqObject* AObject) noexcept : FObject(AObject) {
       if (FObject == nullptr) return;
       FKept = FObject->FCount.State();
+      FCount = FObject->RefCount();
       FObject->FCount.SetState(radFalse);
     }
     TNeutral(const TNeutral&) = delete;
     TNeutral& operator=(const TNeutral&) = delete;
     ~TNeutral() {
-      if (FObject != nullptr) FObject->FCount.SetState(FKept);
+      if (FObject == nullptr) return;
+      const bool Claimed = FKept == radComputed && FObject->RefCount() > FCount;
+      FObject->FCount.SetState(Claimed ? radTrue : FKept);
     }
 
    private:
     TZqObject* FObject;
+    Integer FCount = 0;
     TZqAutoDestroy FKept = radComputed;
   };
 
@@ -138,7 +148,8 @@ class ZQ_API TZqObjectEx : public Implements<TZqObject, IZqObjectFreeNotificatio
   void FreeNotification(TZqObjectEx* AObject);
   void RemoveFreeNotification(TZqObjectEx* AObject);
   void RemoveNotification(const TObject* AObject) override;
-  // A reference claims an object that was undecided so far: one that its owner frees needs SetAutoDestroy(false) first.
+  /// A reference claims an object that was undecided so far: one that its owner frees needs SetAutoDestroy(false)
+  /// first.
   void FreeNotificationEx(const IntfRef<IZqObjectFreeNotificationEvent>& AObject) override;
   void RemoveFreeNotificationEx(const IntfRef<IZqObject>& AObject) override;
 
@@ -215,7 +226,7 @@ class ZQ_API TZqObjectAdapter : public Implements<TInterfacedObject, IZqObjectAd
   TObject* Implementor() override { return FObject; }
 
  protected:
-  ~TZqObjectAdapter() override = default;
+  ~TZqObjectAdapter() override;
   void BeforeDestruction() override;
 
  private:
@@ -240,7 +251,7 @@ class ZQ_API TZqComponent : public Implements<TComponent, IZqObject> {
   void SetAutoDestroy(bool AValue) noexcept { FCount.SetState(AValue ? radTrue : radFalse); }
 
   /// Two-way: AProperty follows ABindToProperty of ABindToObj and leads it. Raises what the engine raises; what was
-  /// bound before that stays.
+  /// bound before that stays. An ABindToObj that is no component must outlive the binding.
   void Bind(const UnicodeString& AProperty, TObject* ABindToObj, const UnicodeString& ABindToProperty,
       const TCreateOptions& ACreateOptions = cDefaultCreateOptions);
   /// The same with the value of a control, which must be observable for TObservers::ControlValueID.

@@ -125,8 +125,8 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
   /// Raises EInOutError when the footer can't be written; the file is closed all the same.
   void Close() override;
   using TZqBaseAppender::SetLayout;
-  /// Closes the present file; a layout that has an extension of its own changes the file's. What Close raises leaves the
-  /// layout as it was.
+  /// Closes the present file; a layout that has an extension of its own changes the file's. What Close raises leaves
+  /// the layout as it was.
   void SetLayout(const IntfRef<IZqLogLayout>& ALayout) override;
 
   TFileName GetFileName() const override;

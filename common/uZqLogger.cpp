@@ -642,8 +642,8 @@ TZqLogData::TZqLogData(TZqLogLevel ALogLevel, UnicodeString ALogMessage)
 
 namespace {
 
-// Dumps an object and the persistent objects that it publishes. An object met again gets its head line only, and so does
-// what lies too deep: objects may lead to each other in circles, and getters may make a new one at each call.
+// Dumps an object and the persistent objects that it publishes. An object met again gets its head line only, and so
+// does what lies too deep: objects may lead to each other in circles, and getters may make a new one at each call.
 class TDumper {
  public:
   void Dump(TObject* AObject, const UnicodeString& AIndent) {

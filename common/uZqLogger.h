@@ -316,8 +316,7 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
       TZqLogIndent ALogIndent = liIndentNone) = 0;
   virtual void Log(const IntfRef<IZqLogData>& ALogData) = 0;
   template <detail::TNumber T>
-  void Log(
-      TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, T AValue, TZqLogIndent ALogIndent = liIndentNone) {
+  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, T AValue, TZqLogIndent ALogIndent = liIndentNone) {
     Log(ALogLevel, ALogMessage, Variant(AValue), ALogIndent);
   }
 

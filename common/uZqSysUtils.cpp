@@ -9,6 +9,7 @@
 #include "runtime/com/registry.h"
 #include "runtime/containers/lists.h"
 #include "runtime/containers/string_list.h"
+#include "runtime/core/typeinfo.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
 #include "runtime/platform/clock.h"
@@ -28,7 +29,13 @@ namespace uZqSysUtils {
 
 TObjectList* ExceptionClassList = nullptr;
 
-void Start() { ExceptionClassList = nullptr; }
+void Start() {
+  ExceptionClassList = nullptr;
+  DescribeType<TZqCharCase>(u"uZqSysUtils")
+      .EnumNames({u"rcNormal", u"rcUpperCase", u"rcLowerCase", u"rcTitleCase", u"rcUpperCamelCase", u"rcLowerCamelCase",
+          u"rcUpperCaseFirstLetter", u"rcLowerCaseFirstLetter"});
+  DescribeType<TZqBitness>(u"uZqSysUtils").EnumNames({u"bit32", u"bit64"});
+}
 
 void Stop() { FreeAndNil(ExceptionClassList); }
 

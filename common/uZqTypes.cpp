@@ -7,6 +7,7 @@
 #include <span>
 #include <string>
 
+#include "runtime/core/typeinfo.h"
 #include "runtime/core/utf8.h"
 #include "runtime/io/streams.h"
 #include "runtime/text/datetime.h"
@@ -148,8 +149,7 @@ RawByteString TZqEncoding::ConvertB(const void* ABuffer, NativeUInt ABufSize, Wo
 }
 
 UnicodeString TZqEncoding::ConvertB(const void* ABuffer, NativeUInt ABufSize, Word ABufCodePage) {
-  if (ABufCodePage != cUtf16LE)
-    return ConvertA(static_cast<const Byte*>(ABuffer), BufferCount(ABufSize), ABufCodePage);
+  if (ABufCodePage != cUtf16LE) return ConvertA(static_cast<const Byte*>(ABuffer), BufferCount(ABufSize), ABufCodePage);
   UnicodeString Result;
   Result.SetLength(BufferCount(ABufSize / 2));
   if (!Result.IsEmpty()) std::memcpy(Result.data(), ABuffer, Result.size() * 2);  // the buffer needn't be aligned
@@ -813,6 +813,19 @@ Extended ZqStrToFloatDef(const UnicodeString& AValue, Extended ADefValue) {
   Extended Result = 0;
   if (TryStrToFloat(AValue, Result) || TryStrToFloat(AValue, Result, SwappedSettings())) return Result;
   return ADefValue;
+}
+
+void uZqTypes::Start() {
+  DescribeType<TZqMainTypeKind>(u"uZqTypes")
+      .EnumNames({u"mtkUnknown", u"mtkInteger", u"mtkFloat", u"mtkString", u"mtkBoolean", u"mtkDateTime", u"mtkArray",
+          u"mtkStructure", u"mtkOther"});
+  DescribeType<TZqTypeKind>(u"uZqTypes")
+      .EnumNames({u"rtkUnknown", u"rtkByte", u"rtkWord", u"rtkLongWord", u"rtkUInt64", u"rtkShortInt", u"rtkSmallInt",
+          u"rtkLongInt", u"rtkInt64", u"rtkSingle", u"rtkDouble", u"rtkExtended", u"rtkChar", u"rtkAChar", u"rtkWChar",
+          u"rtkString", u"rtkAString", u"rtkWString", u"rtkBoolean", u"rtkEnumeration", u"rtkSet", u"rtkDate",
+          u"rtkTime", u"rtkDatetime", u"rtkVariant", u"rtkArray", u"rtkDynArray", u"rtkRecord", u"rtkObject",
+          u"rtkInterface", u"rtkPointer", u"rtkMethod", u"rtkProcedure", u"rtkException", u"rtkClass", u"rtkClassRef"});
+  DescribeType<TZqNullableBool>(u"uZqTypes").EnumNames({u"nbNull", u"nbYes", u"nbNo"});
 }
 
 }  // namespace zq

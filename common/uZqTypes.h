@@ -22,6 +22,8 @@ inline constexpr TResStringRec _SCantLoadNormalizDll{65527, u"Failed to load nor
 inline constexpr TResStringRec _SCantFindNormalizeString{65528, u"Failed to find the \"NormalizeString\" function!"};
 inline constexpr TResStringRec _SNormalizeFailure{65529, u"Failed to normalize the given value"};
 inline constexpr TResStringRec _SEncodingNotSupported{65530, u"The specified encoding is not supported!"};
+
+void Start();
 }  // namespace uZqTypes
 
 // ---- Encodings and code pages ---------------------------------------------------------------------------------------
@@ -36,7 +38,8 @@ inline constexpr std::array<Byte, 4> cZqUTF32LE{0xFF, 0xFE, 0x00, 0x00};
 /// Conversions between bytes of a code page and UTF-16, for any number of threads.
 ///
 /// Those that give a string raise EOSError where the source is no text of the code page or the code page has no
-/// converter; 65001, and 0 where it stands for that, replaces malformed pieces by U+FFFD instead. Those into a caller's buffer never raise.
+/// converter; 65001, and 0 where it stands for that, replaces malformed pieces by U+FFFD instead. Those into a caller's
+/// buffer never raise.
 class ZQ_API TZqEncoding : public TEncoding {
  public:
   TZqEncoding() = delete;
@@ -63,9 +66,9 @@ class ZQ_API TZqEncoding : public TEncoding {
   static Integer ConvertW(
       const WideChar* ASource, Integer ASourceCharCnt, Byte* ADest, Integer ADestByteCnt, Word ADestCodePage);
 
-  /// From one code page to another; equal ones copy the bytes unchecked. AResultCodePage is none of UTF-16 and UTF-32, and from
-  /// other pages than 1200 ABufSize fits an Integer (EAssertionFailed). From 1200 nothing raises: what can't be converted
-  /// gives an empty result.
+  /// From one code page to another; equal ones copy the bytes unchecked. AResultCodePage is none of UTF-16 and UTF-32,
+  /// and from other pages than 1200 ABufSize fits an Integer (EAssertionFailed). From 1200 nothing raises: what can't
+  /// be converted gives an empty result.
   [[nodiscard]] static RawByteString ConvertB(
       const void* ABuffer, NativeUInt ABufSize, Word ABufCodePage, Word AResultCodePage);
   /// From 1200 the units are copied unchecked; an odd last byte is dropped. Bytes, or units of 1200, that an Integer
@@ -88,8 +91,8 @@ class ZQ_API TZqEncoding : public TEncoding {
 enum class TNorm_Form : Byte { nfOther = 0, nfC = 1, nfD = 2, nfKC = 5, nfKD = 6 };
 using enum TNorm_Form;
 
-/// Raises Exception (_SNormalizeFailure) where the value can't be normalised, or is empty. In form nfD a character beyond ASCII that
-/// has a byte in code page 0 comes back as the value of that byte.
+/// Raises Exception (_SNormalizeFailure) where the value can't be normalised, or is empty. In form nfD a character
+/// beyond ASCII that has a byte in code page 0 comes back as the value of that byte.
 [[nodiscard]] ZQ_API WideString ZqNormalizeString(const WideString& AValue, TNorm_Form AForm);
 /// Without accents: of each UTF-16 unit the first character of its decomposition.
 [[nodiscard]] ZQ_API WideString ZqSimplifyString(const WideString& AValue);

@@ -1,6 +1,7 @@
 #include "runtime/component/bindings.h"
 
 #include <algorithm>
+#include <iterator>
 
 #include "runtime/core/typeinfo.h"
 
@@ -122,8 +123,12 @@ void TBindingExpression::Evaluate() {
     ~TDone() { Flag.store(false); }
     std::atomic<bool>& Flag;
   } const Done{FEvaluating};
-  const Variant Value = FInput.Read();
-  FOutput.Write(FConverter ? FConverter(Value) : Value);
+  // Getters and converters are the host's: one of them may end what is bound here.
+  const auto IsActive = [this] { return FActive.load(std::memory_order_acquire); };
+  Variant Value = FInput.Read();
+  if (IsActive() && FConverter) Value = FConverter(Value);
+  if (!IsActive()) return;
+  FOutput.Write(Value);
   if (FOptions.Contains(coNotifyOutput) && FActive.load(std::memory_order_acquire))
     FManager.Notify(FOutput.Holder(), FOutput.Property());
 }
@@ -152,8 +157,11 @@ void TBindingManager::Remove(const TBindingExpression* AExpression) {
 }
 
 void TBindingManager::Notify(const TObject* AObject, const UnicodeString& AProperty) {
+  // The expressions of other threads stay out of it: their objects are not to be touched, nor kept from their end.
+  std::vector<std::shared_ptr<TBindingExpression>> Expressions;
   std::unique_lock Guard(FLock);
-  const auto Expressions = FExpressions;
+  std::copy_if(FExpressions.begin(), FExpressions.end(), std::back_inserter(Expressions),
+      [](const auto& AExpression) { return AExpression->IsOfThisThread(); });
   Guard.unlock();
   for (const auto& Expression : Expressions)
     if (Expression->DependsOn(AObject, AProperty)) Expression->Evaluate();

@@ -3,6 +3,7 @@
 #include <atomic>
 #include <memory>
 #include <mutex>
+#include <thread>
 #include <vector>
 
 #include "runtime/component/component.h"
@@ -71,7 +72,8 @@ class ZQ_API TBindingPath {
   std::vector<UnicodeString> FNames;  // of the properties
 };
 
-/// Carries the value of an input path to an output path when it is notified. Its manager owns it.
+/// Carries the value of an input path to an output path when it is notified. Its manager owns it. It belongs, with the
+/// objects that it binds, to the thread that made it.
 ///
 /// Where a component at the root of either path goes, the expression ends its work; it is not disposed of by that.
 class ZQ_API TBindingExpression : public TComponent {
@@ -82,6 +84,7 @@ class ZQ_API TBindingExpression : public TComponent {
   /// A call that comes while it is evaluating is ignored: two-way bindings come to rest.
   void Evaluate();
   [[nodiscard]] bool DependsOn(const TObject* AObject, const UnicodeString& AProperty) const;
+  [[nodiscard]] bool IsOfThisThread() const noexcept { return FThread == std::this_thread::get_id(); }
   void Deactivate() noexcept { FActive.store(false, std::memory_order_release); }
 
  protected:
@@ -94,11 +97,12 @@ class ZQ_API TBindingExpression : public TComponent {
   TValueConverter FConverter;
   TBindingManager& FManager;
   TCreateOptions FOptions;
+  std::thread::id FThread = std::this_thread::get_id();
   std::atomic<bool> FActive = true;
   std::atomic<bool> FEvaluating = false;
 };
 
-/// Owns expressions. Any thread may use the manager; an expression and the objects that it binds belong to one.
+/// Owns expressions. Any thread may use the manager, each for its own expressions.
 class ZQ_API TBindingManager {
  public:
   TBindingManager() = default;
@@ -109,7 +113,9 @@ class ZQ_API TBindingManager {
   [[nodiscard]] static TBindingManager& Default();
 
   void Add(std::shared_ptr<TBindingExpression> AExpression);
+  /// Ends AExpression, whose pointer is dead then; nothing where it isn't here.
   void Remove(const TBindingExpression* AExpression);
+  /// Evaluates those of this thread that depend on that property; an empty name stands for any.
   void Notify(const TObject* AObject, const UnicodeString& AProperty);
 
  private:
@@ -126,6 +132,7 @@ struct ZQ_API TBindings {
       const UnicodeString& AInputExpression, const TArray<IntfRef<IScope>>& AOutputScopes,
       const UnicodeString& AOutputExpression, const TValueConverter& AConverter, TBindingManager* AManager,
       const TCreateOptions& AOptions = cDefaultCreateOptions);
+  /// AExpression is dead then; nothing where the manager doesn't have it.
   static void RemoveBinding(TBindingExpression* AExpression, TBindingManager* AManager);
   /// Evaluates every expression that depends on that property of AObject; an empty name stands for all of them.
   static void Notify(const TObject* AObject, const UnicodeString& AProperty, TBindingManager* AManager);

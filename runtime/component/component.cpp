@@ -68,6 +68,11 @@ TComponent::~TComponent() {  // finds something to undo only where the construct
       Detach(Component);
     }
   }
+  try {
+    TellWatchers();
+    if (FOwner != nullptr) FOwner->RemoveComponent(this);
+  } catch (...) {  // a destructor has nobody to tell
+  }
   if (FOwner != nullptr) FOwner->Detach(this);
   Unlink();
 }
@@ -162,7 +167,7 @@ void TComponent::Detach(TComponent* AComponent) noexcept {
 
 void TComponent::FreeNotification(TComponent* AComponent) {
   const std::lock_guard Guard(LinkLock);
-  if (std::find(FWatchers.begin(), FWatchers.end(), AComponent) != FWatchers.end()) return;
+  if (FTelling || std::find(FWatchers.begin(), FWatchers.end(), AComponent) != FWatchers.end()) return;
   AComponent->FWatched.push_back(this);
   FWatchers.push_back(AComponent);
 }
@@ -174,6 +179,15 @@ void TComponent::RemoveFreeNotification(TComponent* AComponent) {
 }
 
 void TComponent::TellWatchers() {
+  struct TTelling {
+    explicit TTelling(bool& AFlag) : Flag(AFlag) { Set(true); }
+    ~TTelling() { Set(false); }
+    void Set(bool AValue) const {
+      const std::lock_guard Guard(LinkLock);
+      Flag = AValue;
+    }
+    bool& Flag;
+  } const Telling(FTelling);
   for (;;) {
     std::unique_lock Guard(LinkLock);
     if (FWatchers.empty()) return;

@@ -82,11 +82,13 @@ class ZQ_API TComponent : public Implements<TPersistent, IInterface> {
   void InsertComponent(TComponent* AComponent);
   /// Lets go of AComponent, which then has no owner.
   void RemoveComponent(TComponent* AComponent);
-  /// AComponent gets Notification(this, opRemove) when this component goes, once however often it asked.
+  /// AComponent gets Notification(this, opRemove) when this component goes, once however often it asked, and also out
+  /// of that Notification.
   void FreeNotification(TComponent* AComponent);
   void RemoveFreeNotification(TComponent* AComponent);
   /// Made on first use; lives as long as the component.
   [[nodiscard]] TObservers& GetObservers();
+  /// For descendants that are COM classes: enters or removes what the registry has to know of one. Nothing here.
   virtual void UpdateRegistry(bool ARegister, const UnicodeString& AClassID, const UnicodeString& AProgID);
 
   HRESULT QueryInterface(const TGUID& AIID, void** AObj) override;
@@ -99,7 +101,9 @@ class ZQ_API TComponent : public Implements<TPersistent, IInterface> {
   void BeforeDestruction() override;
   /// AComponent came to this owner, or one that this component owns or asked about is going. Must not raise.
   virtual void Notification(TComponent*, TOperation) {}
+  /// The component has been read from a stream: clears csLoading.
   virtual void Loaded();
+  /// Read and write the component's own part of a stream. Nothing here.
   virtual void ReadState(TReader* AReader);
   virtual void WriteState(TWriter* AWriter);
   void SetStateFlag(TComponentStateFlag AFlag, bool AOn) noexcept;
@@ -117,6 +121,7 @@ class ZQ_API TComponent : public Implements<TPersistent, IInterface> {
   std::vector<TComponent*> FComponents;
   std::vector<TComponent*> FWatchers;  // told of this component's end
   std::vector<TComponent*> FWatched;   // those whose FWatchers hold this component
+  bool FTelling = false;               // the watchers are being told
   std::atomic<Byte> FState = 0;        // a bit for each TComponentStateFlag
   std::unique_ptr<TObservers> FObservers;
 };

@@ -41,8 +41,9 @@ using TCollectionItemClass = TClassRef<TCollectionItem(TCollection*)>;
 
 /// Owned, ordered items of one class.
 ///
-/// An item whose end is refused (its BeforeDestruction, Deleting or Update raises) stays where it is. The collection's own end can't reach
-/// an override of Deleting or Update: a class that needs one there calls Clear in its destructor. One thread at a time.
+/// An item whose end is refused (its BeforeDestruction, Deleting or Update raises) stays where it is. The collection's
+/// own end can't reach an override of Deleting or Update: a class that needs one there calls Clear in its destructor.
+/// One thread at a time.
 class ZQ_API TCollection : public TPersistent {
  public:
   explicit TCollection(TCollectionItemClass AItemClass) noexcept : FItemClass(AItemClass) {}

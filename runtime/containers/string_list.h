@@ -60,8 +60,9 @@ class ZQ_API TStrings : public TPersistent {
   void SetDelimiter(Char AValue) noexcept { FDelimiter = AValue; }
 
   // Text in a file or from a stream's position to its end. Without an encoding a load goes by the byte order mark of
-  // UTF-8 or UTF-16 and takes the default encoding where there is none; with one it skips that encoding's mark. A save without an encoding
-  // takes the default one and writes no mark; with one it writes that encoding's mark. Errors are those of the stream.
+  // UTF-8 or UTF-16 and takes the default encoding where there is none; with one it skips that encoding's mark. A save
+  // without an encoding takes the default one and writes no mark; with one it writes that encoding's mark. Errors are
+  // those of the stream.
   void LoadFromFile(const UnicodeString& AFileName);
   void LoadFromFile(const UnicodeString& AFileName, const TEncoding& AEncoding);
   void LoadFromStream(TStream& AStream);

@@ -81,6 +81,11 @@ UnicodeString ExceptionRef::Message() const {
   }
 }
 
+void ExceptionRef::Raise() const {
+  if (FHeld == nullptr) throw EInvalidOperation(u"There is no exception to raise");
+  std::rethrow_exception(FHeld);
+}
+
 ExceptionRef ExceptionClass::Create(const UnicodeString& AMessage) const {
   if (FCreate == nullptr) throw EInvalidOperation(ClassName() + u" can't be made from a message alone");
   return FCreate(AMessage);

@@ -161,8 +161,8 @@ class ZQ_API ExceptionRef {
   Exception* operator->() const noexcept { return FObject; }
   /// The message, also of one that is not of the family.
   [[nodiscard]] UnicodeString Message() const;
-  /// Raises that same object again.
-  [[noreturn]] void Raise() const { std::rethrow_exception(FHeld); }
+  /// Raises that same object again; EInvalidOperation where there is none.
+  [[noreturn]] void Raise() const;
   [[nodiscard]] const std::exception_ptr& Held() const noexcept { return FHeld; }
   friend bool operator==(const ExceptionRef& A, const ExceptionRef& B) noexcept { return A.FHeld == B.FHeld; }
 

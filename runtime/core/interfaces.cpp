@@ -24,7 +24,13 @@ Integer TInterfacedObject::_AddRef() { return FRefCount.fetch_add(1, std::memory
 
 Integer TInterfacedObject::_Release() {
   const Integer Result = FRefCount.fetch_sub(1, std::memory_order_acq_rel) - 1;
-  if (Result == 0) Free();
+  if (Result != 0 || FEnding.exchange(true, std::memory_order_acq_rel)) return Result;
+  try {
+    Free();
+  } catch (...) {  // refused: it lives on, and the next last reference tries again
+    FEnding.store(false, std::memory_order_release);
+    throw;
+  }
   return Result;
 }
 

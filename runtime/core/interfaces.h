@@ -149,7 +149,8 @@ template <class J>
   else return IntfRef<J>(dynamic_cast<J*>(Bearer.Get()));
 }
 
-/// Lives by its count alone: the last reference destroys it. Refuses to be freed while it is counted.
+/// Lives by its count alone: the last reference destroys it. Refuses to be freed while it is counted. References that
+/// come and go while it is being destroyed are no further end.
 class ZQ_API TInterfacedObject : public TObject, public virtual IInterface {
  public:
   [[nodiscard]] Integer RefCount() const noexcept { return FRefCount.load(std::memory_order_relaxed); }
@@ -166,6 +167,7 @@ class ZQ_API TInterfacedObject : public TObject, public virtual IInterface {
 
  private:
   std::atomic<Integer> FRefCount = 1;  // the construction's own count, so that a reference in a constructor is no end
+  std::atomic<bool> FEnding = false;
 };
 
 /// Implements an interface for a controlling object, to which it forwards all three operations. Does not hold a count

@@ -48,6 +48,7 @@ UnicodeString TClass::ClassName() const {
 }
 
 TClass TClass::ClassParent() const noexcept {
+  constexpr std::string_view Implements = "N2zq10ImplementsI";  // a class only in C++: it gives one its interfaces
   TClass Result;
   if (FInfo == nullptr) return Result;
   AnyBase(*FInfo, [&](const std::type_info& AParent) {
@@ -55,7 +56,7 @@ TClass TClass::ClassParent() const noexcept {
     Result = TClass(AParent);
     return true;
   });
-  return Result;
+  return std::string_view(Result.Info().name()).starts_with(Implements) ? Result.ClassParent() : Result;
 }
 
 bool TClass::InheritsFrom(TClass AClass) const noexcept {

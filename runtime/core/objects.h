@@ -102,9 +102,14 @@ void FreeAndNil(T*& AObject) {
   Free(std::exchange(AObject, nullptr));
 }
 
-/// Owns an object of a family with a protocol.
+/// Owns an object of a family with a protocol. What its end raises goes no further and leaves it alive.
 struct TFreer {
-  void operator()(TObject* AObject) const { AObject->Free(); }
+  void operator()(TObject* AObject) const noexcept {
+    try {
+      AObject->Free();
+    } catch (...) {  // told above
+    }
+  }
 };
 template <class T>
 using TOwned = std::unique_ptr<T, TFreer>;
@@ -116,8 +121,8 @@ namespace detail {
 template <class TSignature>
 class TClassRef;
 
-/// Names a class derived from TBase and makes objects of it through its constructor. The empty one names none, and raises
-/// EInvalidOperation where it is to make one.
+/// Names a class derived from TBase and makes objects of it through its constructor. The empty one names none, and
+/// raises EInvalidOperation where it is to make one.
 template <class TBase, class... TArgs>
 class TClassRef<TBase(TArgs...)> {
  public:

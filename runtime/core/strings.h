@@ -158,7 +158,11 @@ class ZQ_API AnsiString : public RawByteString {
     Str() += AText;
     return *this;
   }
+  AnsiString& operator+=(const RawByteString& AText) = delete;  // its bytes may be in another code page
+  AnsiString& operator+=(const AnsiString& AText) { return *this += AText.View(); }
   friend AnsiString operator+(AnsiString A, std::string_view B) { return std::move(A += B); }
+  friend AnsiString operator+(AnsiString A, const AnsiString& B) { return std::move(A += B); }
+  friend AnsiString operator+(AnsiString A, const RawByteString& B) = delete;
 };
 
 /// Bytes in UTF-8.

@@ -226,8 +226,7 @@ Variant StorageToVariant(const void* AStorage) {
   if constexpr (std::is_enum_v<S>) {
     constexpr bool Wide = std::cmp_greater(std::numeric_limits<std::underlying_type_t<S>>::max(), 0x7FFFFFFF);
     return static_cast<std::conditional_t<Wide, Int64, Integer>>(Value);
-  }
-  else if constexpr (KindOf<S>() == tkSet) return Value.ToInteger();
+  } else if constexpr (KindOf<S>() == tkSet) return Value.ToInteger();
   else if constexpr (std::same_as<S, ShortString>) return UTF8String(Value.View());
   else if constexpr (std::convertible_to<S, Variant>) return Value;
   else return static_cast<Int64>(Value);

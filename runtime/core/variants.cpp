@@ -177,7 +177,8 @@ std::partial_ordering operator<=>(const Variant& A, const Variant& B) {
   if (VarIsStr(A) && VarIsStr(B)) {
     const auto TextA = ReadableText(A), TextB = ReadableText(B);
     if (TextA && TextB) return *TextA <=> *TextB;
-    return Equal(!TextA && !TextB && DataA.Bytes->CodePage() == DataB.Bytes->CodePage() && *DataA.Bytes == *DataB.Bytes);
+    return Equal(
+        !TextA && !TextB && DataA.Bytes->CodePage() == DataB.Bytes->CodePage() && *DataA.Bytes == *DataB.Bytes);
   }
   if (A.Type() == varError && B.Type() == varError) return Equal(DataA.Int == DataB.Int);
   if (HoldsOf(A) == HoldsOf(B)) switch (HoldsOf(A)) {

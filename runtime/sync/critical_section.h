@@ -31,7 +31,9 @@ class ZQ_API TCriticalSection {
   /// Never waits.
   [[nodiscard]] bool TryEnter() noexcept;
   /// Waits for at most that many milliseconds; 0xFFFFFFFF is for ever.
-  [[nodiscard]] bool TryEnterFor(Cardinal AMilliseconds) noexcept { return TryEnter() || Wait(AMilliseconds); }
+  [[nodiscard]] bool TryEnterFor(Cardinal AMilliseconds) noexcept {
+    return TryEnter() || (AMilliseconds != 0 && Wait(AMilliseconds));
+  }
   /// By the owner only.
   ZQ_HOT void Leave() noexcept {
     // Nothing of the lock is touched once it is free: whoever takes it next may destroy it.

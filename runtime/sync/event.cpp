@@ -82,6 +82,13 @@ Integer TEvent::WaitForAny(std::span<TEvent* const> AEvents, Cardinal ATimeout) 
     return Found == AEvents.end() ? -1 : static_cast<Integer>(Found - AEvents.begin());
   };
   const auto Until = Deadline(ATimeout);
+  struct TListed {
+    ~TListed() {
+      for (TEvent* const Event : Events) Event->Delist(&Listed);
+    }
+    std::span<TEvent* const> Events;
+    TWaiter& Listed;
+  } const Listed{AEvents, Waiter};  // a thread that is cancelled in its wait leaves nothing behind
   for (TEvent* const Event : AEvents) Event->Enlist(&Waiter);
   Integer Result = FirstSet();
   while (Result < 0) {
@@ -91,7 +98,6 @@ Integer TEvent::WaitForAny(std::span<TEvent* const> AEvents, Cardinal ATimeout) 
     Guard.unlock();
     Result = FirstSet();
   }
-  for (TEvent* const Event : AEvents) Event->Delist(&Waiter);
   return Result;
 }
 

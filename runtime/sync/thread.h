@@ -132,7 +132,8 @@ class ZQ_API TThread : public TObject {
 struct TInterlocked {
   template <class T>
   static T Add(T& ATarget, T ABy) noexcept {
-    return std::atomic_ref<T>(ATarget).fetch_add(ABy) + ABy;
+    using TBits = std::make_unsigned_t<T>;  // the sum wraps as the atomic one does
+    return static_cast<T>(static_cast<TBits>(std::atomic_ref<T>(ATarget).fetch_add(ABy)) + static_cast<TBits>(ABy));
   }
   template <class T>
   static T Increment(T& ATarget) noexcept {
