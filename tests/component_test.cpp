@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <string>
+#include <thread>
 #include <utility>
 #include <vector>
 
@@ -19,6 +20,7 @@ struct TProbe : TComponent {
   }
   void Notification(TComponent* AComponent, TOperation AOperation) override {
     TComponent::Notification(AComponent, AOperation);
+    if (AOperation == opRemove) AComponent->FreeNotification(this);  // of no use any more
     const char* const Sign = AComponent->ComponentState().Contains(csDestroying) ? "!" : "-";
     Log += Name().ToUTF8() + (AOperation == opInsert ? "+" : Sign) + AComponent->Name().ToUTF8();
     Log += dynamic_cast<TProbe*>(AComponent) == nullptr ? "? " : " ";
@@ -51,6 +53,7 @@ TEST(Component, NamesAreIdentifiersAndUniqueInTheirOwner) {
   EXPECT_THROW(static_cast<void>(New<TProbe>(Owner.get(), Log, u"failed")), EInvalidOperation);
   TProbe::FailNext = false;
   EXPECT_EQ(Owner->ComponentCount(), 2);
+  EXPECT_TRUE(Log.ends_with("+failed ~failed -failed? ")) << Log;
 }
 
 TEST(Component, AnEndIsToldOfWholeObjectsAndARefusedOneLeavesTheOwnerAlive) {
@@ -149,6 +152,15 @@ TEST_F(Bindings, NeitherFailedOnesNorThoseOfTheGoneWriteAnyMore) {
   A->SetValue(1);
   TBindings::Notify(A.get(), u"", nullptr);
   TBindings::Notify(Source, u"Value", nullptr);
+  EXPECT_EQ(B->Writes, 0);
+  auto* const Doomed = New<TNode>();
+  Bind(A.get(), u"src.Value", Doomed, u"dst.Value", {}, [&](const Variant& V) { return Doomed->Free(), V; });
+  A->SetValue(2);
+}
+
+TEST_F(Bindings, BelongToTheirThread) {
+  Bind(A.get(), u"src.Value", B.get(), u"dst.Value", {});
+  std::thread([&] { TBindings::Notify(A.get(), u"Value", nullptr); }).join();
   EXPECT_EQ(B->Writes, 0);
 }
 

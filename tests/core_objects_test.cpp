@@ -103,6 +103,8 @@ struct TCounter : TObject {
   int Sum = 0;
 };
 
+struct TWideCounter : TForeign, TCounter {};
+
 TEST(Method, BoundToAnObjectComparesByObjectAndFunction) {
   TCounter A, B;
   const TAdd OfA = Bind<&TCounter::Add>(&A);
@@ -110,6 +112,11 @@ TEST(Method, BoundToAnObjectComparesByObjectAndFunction) {
   EXPECT_EQ(OfA, TAdd::Of<&TCounter::Add>(&A));
   EXPECT_NE(OfA, TAdd::Of<&TCounter::Add>(&B));
   EXPECT_NE(OfA, TAdd::Of<&TCounter::Twice>(&A));
+  TWideCounter Wide;
+  EXPECT_EQ(TAdd::Of<&TCounter::Add>(&Wide), TAdd::Of<&TCounter::Add>(static_cast<TCounter*>(&Wide)));
+  EXPECT_FALSE(TAdd(std::function<int(int)>()) || TAdd(static_cast<int (*)(int)>(nullptr)));
+  TMethod<void(int)>{OfA}(1);  // its result is nobody's
+  EXPECT_EQ(A.Sum, 8);
   EXPECT_THROW(TAdd()(1), std::bad_function_call);
 }
 

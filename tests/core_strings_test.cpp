@@ -1,5 +1,6 @@
 #include <gtest/gtest.h>
 
+#include "runtime/core/guid.h"
 #include "runtime/core/strings.h"
 #include "runtime/core/utf8.h"
 #include "tests/support/support.h"
@@ -131,6 +132,13 @@ TEST(Strings, TrimTakesControlsAndZerosButNoOtherSpaces) {
   EXPECT_EQ(Trim(UnicodeString(u"\0 \u00A0\x1F", 4)), u"\u00A0");
   EXPECT_EQ(Trim(u"\r\n"), u"");
   EXPECT_EQ(TrimLeft(u" a ") + TrimRight(u" a "), u"a  a");
+}
+
+TEST(Guids, AreNewEachTimeAndHaveTheirText) {
+  const TGUID Made = CreateGUID();
+  EXPECT_FALSE(IsEqualGUID(Made, CreateGUID()));
+  EXPECT_EQ(GUIDToString(Made)[16], u'4') << "the version";
+  EXPECT_EQ(GUIDToString("{0D3C1F10-ABCD-4000-8000-0000000000ff}"_guid), u"{0D3C1F10-ABCD-4000-8000-0000000000FF}");
 }
 
 }  // namespace

@@ -61,7 +61,8 @@ TEST(Variants, NumbersAreReadExactlyOrRefused) {
   EXPECT_EQ(VarToInteger(-2147483648.5), std::numeric_limits<Integer>::min());
   for (const auto& [Value, Type] : {std::pair<Variant, TVarType>{2147483647.5, varInteger}, {std::nan(""), varInteger},
            {9223372036854775808.0, varInt64}, {std::numeric_limits<UInt64>::max(), varInt64}, {-1, varUInt64},
-           {128, varShortInt}, {256, varByte}, {-1, varWord}, {32768, varSmallint}, {-1, varLongWord}})
+           {1e300, varSingle}, {128, varShortInt}, {256, varByte}, {-1, varWord}, {32768, varSmallint},
+           {-1, varLongWord}})
     EXPECT_THROW(static_cast<void>(VarAsType(Value, Type)), EVariantOverflow) << Type;
 }
 
@@ -119,12 +120,13 @@ TEST(Variants, EqualityAndOrderNeverRaise) {
   const std::tuple<Variant, Variant, TOrder> Cases[] = {{1, 1.0, Same}, {1, 2U, Less},
       {-1, std::numeric_limits<UInt64>::max(), Less}, {std::numeric_limits<Int64>::max(), 9223372036854775808.0, Less},
       {true, -1, Same}, {1, Currency{10001}, Less}, {9, u"10", Less}, {u"10", u"9", Less},
-      {"a", WideString(u"a"), Same}, {u"a", 1, None}, {Null(), Null(), Same}, {Null(), 0, None},
-      {Variant(), Variant(), Same}, {Variant(), Null(), None}, {Variant(), 0, None}, {Variant(), u"", None},
-      {&Object, &Object, Same}, {&Object, 1, None}, {Counted, Counted, Same}, {Counted, IntfRef<IInterface>(), None},
-      {VarAsError(E_FAIL), VarAsError(E_FAIL), Same}, {VarAsError(E_FAIL), E_FAIL, None},
-      {std::nan(""), std::nan(""), None}, {VarArrayOf({1, u"a"}), VarArrayOf({1.0, "a"}), Same},
-      {VarArrayOf({1}), VarArrayOf({1, 2}), None}};
+      {"a", WideString(u"a"), Same}, {u"a", 1, None}, {u"0.1", 0.1, Same},
+      {RawByteString("a", 709), RawByteString("a", 709), Same}, {RawByteString("1", 709), 1, None},
+      {Null(), Null(), Same}, {Null(), 0, None}, {Variant(), Variant(), Same}, {Variant(), Null(), None},
+      {Variant(), 0, None}, {Variant(), u"", None}, {&Object, &Object, Same}, {&Object, 1, None},
+      {Counted, Counted, Same}, {Counted, IntfRef<IInterface>(), None}, {VarAsError(E_FAIL), VarAsError(E_FAIL), Same},
+      {VarAsError(E_FAIL), E_FAIL, None}, {std::nan(""), std::nan(""), None},
+      {VarArrayOf({1, u"a"}), VarArrayOf({1.0, "a"}), Same}, {VarArrayOf({1}), VarArrayOf({1, 2}), None}};
   for (const auto& [A, B, Order] : Cases) {
     EXPECT_EQ(A <=> B, Order) << VarType(A) << " and " << VarType(B);
     EXPECT_EQ(VarSameValue(B, A), Order == 0);
@@ -173,6 +175,8 @@ TEST(Variants, ArraysHaveBoundsInEachDimension) {
   EXPECT_THROW(static_cast<void>(VarArrayHighBound(Grid, 3)), EVariantBadIndex);
   EXPECT_THROW(static_cast<void>(VarArrayCreate({0, -2}, varVariant)), EVariantBadIndex);
   EXPECT_THROW(static_cast<void>(VarArrayHighBound(5, 1)), EVariantTypeCast);
+  constexpr Integer cMin = std::numeric_limits<Integer>::min(), cMax = std::numeric_limits<Integer>::max();
+  EXPECT_THROW(static_cast<void>(VarArrayCreate({cMin, cMax, cMin, cMax}, varInteger)), EVariantBadIndex);
 }
 
 TEST(Variants, ValuesConvertToTheTypeAskedFor) {

@@ -29,7 +29,7 @@ TEST(PathText, TakesEitherSeparatorAndKeepsTheKindInUse) {
   const std::pair<UnicodeString (*)(const UnicodeString&), std::map<UnicodeString, UnicodeString>> Cases[] = {
       {ExtractFileName, {{u"C:\\l/app.1.log", u"app.1.log"}, {u"a/b\\", u""}}},
       {ExtractFilePath, {{u"a/b\\c.x", u"a/b\\"}, {u"name", u""}}},
-      {ExtractFileDir, {{u"/x", u"/"}, {u"a\\b/c", u"a\\b"}, {u"name", u""}}},
+      {ExtractFileDir, {{u"/x", u"/"}, {u"a\\b/c", u"a\\b"}, {u"a//b", u"a"}, {u"name", u""}}},
       {ExtractFileExt, {{u"/x.d/name", u""}, {u"x.d\\name", u""}, {u"/x/a.b.c", u".c"}, {u"a.", u"."}}},
       {IncludeTrailingBackslash, {{u"a\\b", u"a\\b\\"}, {u"/a\\b", u"/a\\b\\"}, {u"/x", u"/x/"}, {u"x/", u"x/"}}},
       {ExcludeTrailingBackslash, {{u"a//", u"a/"}, {u"", u""}}},
@@ -132,6 +132,9 @@ TEST_F(TextFile, WritesLinesInItsCodePageAndGoesOnWhereTheFileEnds) {
   File.Rewrite();
   File.WriteLn(u"ä");
   EXPECT_EQ(Folder.Read("b.txt"), "\xE4\r\n");
+  File.Assign(Folder.File("c.txt"), 50221);
+  File.Rewrite();
+  EXPECT_NO_THROW(File.WriteLn(u"\u0100")) << "a character with escape sequences on both sides";
 }
 
 TEST_F(TextFile, LongLinesComeWholeAndShortOnesInOneSystemCall) {
@@ -229,6 +232,9 @@ TEST(Streams, CopiesTakeAllOrACountOrTheRestAndStringsKeepTheirEncoding) {
   Source.SaveToFile(Folder.File("a"));
   Dest.LoadFromFile(Folder.File("a"));
   EXPECT_EQ(Content(Dest), "0123456789");
+  Dest.SetPosition(5);
+  EXPECT_EQ(Dest.Seek(std::numeric_limits<Int64>::max(), soCurrent), std::numeric_limits<Int64>::max());
+  EXPECT_THROW(Dest.Write("x", 1), EStreamError);
   TStringStream Text(u"aä", TEncoding::BigEndianUnicode());
   EXPECT_EQ(Content(Text), std::string("\0a\0\xE4", 4));
   Text.SetPosition(2);

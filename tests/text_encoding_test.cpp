@@ -225,6 +225,20 @@ TEST(TextEncoding, OneCharacterIntoOneByte) {
   char Bytes[4];
   EXPECT_EQ(LocaleCharsFromUnicode(1252, 0, u"a日", 2, Bytes, 4, "##", &Used), 3);
   EXPECT_TRUE(std::string_view(Bytes, 3) == "a##" && Used);
+  EXPECT_EQ(LocaleCharsFromUnicode(437, 0, u"日", 1, Bytes, 4, "\x1A", nullptr), 1);
+  EXPECT_EQ(Bytes[0], '\x1A');
+}
+
+struct TLateConversion {
+  ~TLateConversion() { EXPECT_EQ(Encoded(1252, u"é"), "\xE9"); }
+};
+
+TEST(TextEncoding, ServesWhatEndsAfterTheThreadsConverters) {
+  std::thread([] {
+    thread_local const TLateConversion Late;
+    EXPECT_EQ(Encoded(1252, u"é"), "\xE9");
+    (void)&Late;
+  }).join();
 }
 
 }  // namespace

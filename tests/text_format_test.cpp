@@ -118,7 +118,7 @@ TEST(TextNumbers, FloatFormatsRoundOnceAndAwayFromZero) {
 TEST(TextNumbers, ReadsFloats) {
   const std::pair<const char16_t*, Extended> cValid[] = {{u" 1,5 ", 1.5L}, {u"-,5", -0.5L}, {u"5,", 5}, {u"1e3", 1000},
       {u"1,5E-2", 0.015L}, {u"+12", 12}, {u"1.234,5", 1234.5L}, {u"1.234.567,", 1234567}, {u"0,1", 0.1L},
-      {u"1E4932", 1e4932L}};
+      {u"1E4932", 1e4932L}, {u"1E-4950", 1e-4950L}, {u"1E-5000", 0}};
   for (const auto& [Text, Value] : cValid) EXPECT_EQ(StrToFloat(Text, Comma()), Value);
   Extended Untouched = 7;
   for (const char16_t* const Text : {u"", u"-", u",", u"e5", u"1e", u"1.5", u"1.234", u"1.23,4", u"1234.567,8",

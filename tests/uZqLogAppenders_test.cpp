@@ -102,9 +102,38 @@ TEST(AppenderFile, BlankNameOrNoLayoutGivesNoOutput) {
   Bare->SetFileName(Fixture.Folder.File("bare.log"));
   Fixture.File->SetFileName(u"   ");
   Fixture.File->SetFileExt(u"");
+  EXPECT_EQ(Fixture.File->GetFileName(), u"   ");
   Fixture.Log->Info(u"x");
   EXPECT_EQ(Fixture.Folder.Names(), TLines{"bare.log"});
   EXPECT_EQ(Fixture.Folder.Read("bare.log"), "");
+}
+
+// Gives its texts away before it returns them.
+class TTalkingLayout : public TZqSimpleLayout {
+ public:
+  using TZqSimpleLayout::TZqSimpleLayout;
+  UnicodeString GetHeader() override { return OnText(u"header"), u"header"; }
+  UnicodeString GetFooter() override { return OnText(u"footer"), u"footer"; }
+  UnicodeString FormatLine(
+      const UnicodeString&, TZqLogLevel, const UnicodeString& ALogMessage, PZqDataRec, TZqLogIndent) override {
+    return ALogMessage;
+  }
+  static inline std::function<void(const char16_t*)> OnText;
+
+ protected:
+  ~TTalkingLayout() override = default;
+};
+
+TEST(AppenderFile, LayoutThatLogsAndClosesFromItsHeaderAndFooterLosesNoLine) {
+  TFileFixture Fixture;
+  TTalkingLayout::OnText = [&](const char16_t* AText) {
+    Fixture.Log->Info(u"in " + UnicodeString(AText));
+    Fixture.File->Close();
+  };
+  Fixture.File.As<IZqLogAppenderEx>()->SetLayout(TZqLogBaseClass::Of<TTalkingLayout>());
+  Fixture.Log->Info(u"x");
+  Fixture.File->Close();
+  EXPECT_EQ(Fixture.Folder.Read("app.log"), "in header\r\nheader\r\nx\r\nin footer\r\nfooter");
 }
 
 TEST(AppenderFile, MakesFoldersAndTakesNamesThatAreNoText) {
@@ -234,6 +263,16 @@ TEST(AppenderRolling, NoBackupsMeansNoOutput) {
   Fixture.File->SetMaxBackupCount(0);
   Fixture.Log->Info(u"y");
   EXPECT_TRUE(Fixture.Folder.Names().empty());
+  Fixture.File->SetMaxBackupCount(5);
+  Fixture.Log->Info(u"z");
+  EXPECT_EQ(Fixture.Folder.Names(), TLines{"app.log"}) << "it writes again";
+}
+
+TEST(AppenderRolling, ExtensionWithADotOfItsOwnKeepsItsBackups) {
+  TRollingFixture Fixture;
+  Fixture.File->SetFileExt(u".log.txt");
+  for (int i = 0; i < 3; ++i) Fixture.File->RollOver();
+  EXPECT_EQ(Fixture.Folder.Names(), (TLines{"app.log.1.txt", "app.log.2.txt", "app.log.txt"}));
 }
 
 // ---------------------------------------------------------------------------------------- threads and faults

@@ -70,6 +70,12 @@ TEST(LoggerTree, ChildOutlivesTheRootWithoutAParent) {
   auto* const Left = dynamic_cast<TZqLogger*>(Child.Get());
   Child.Reset();
   Free(Left);  // its count ends nothing any more
+  auto* const Freed = New<TZqLogger>(Logger(), u"freed");
+  auto Held = Freed->GetLogger(u"held");
+  auto* const Orphan = dynamic_cast<TZqLogger*>(Held.Get());
+  Free(Freed);  // with the count that its child has on it
+  Held.Reset();
+  Free(Orphan);
 }
 
 // ---------------------------------------------------------------------------------------- levels and dispatch
@@ -156,7 +162,7 @@ TEST_P(LoggerCalls, MakeTheToldMessage) {
 INSTANTIATE_TEST_SUITE_P(Forms, LoggerCalls,
     testing::Values(
         TCallCase{"DebugOneArg", [](IZqLogger& L) { L.Debug(u"%d", {1}); }, "root.p Debug 1", liIndentNone, u"none"},
-        TCallCase{"DebugVariant", [](IZqLogger& L) { L.Debug(u"m", 7); }, "root.p Debug m", liIndentNone, u"7"},
+        TCallCase{"DebugVariant", [](IZqLogger& L) { L.Debug(u"m", 0); }, "root.p Debug m", liIndentNone, u"0"},
         TCallCase{"DebugObject", [](IZqLogger& L) { L.Debug(u"m", Shop()); }, "root.p Debug m", liIndentNone,
             u"object : TShop\r\n"},
         TCallCase{"FatalException", [](IZqLogger& L) { L.Fatal(cFault); }, "root.p Fatal broke", liIndentNone,
@@ -211,7 +217,9 @@ TEST(LoggerFaults, AppenderThatLogsIntoItsOwnLoggerEndsNothing) {
   };
   Fixture.Log->Info(u"call");
   EXPECT_EQ(Once->Notes(), (TNotes{"root.p Info call", "root.p Info answer"}));
-  Once->OnWrite = [&](PZqDataRec) { Fixture.Log->Info(u"echo"); };
+  Once->OnWrite = [&](PZqDataRec) {
+    for (int i = 0; i < 2; ++i) Fixture.Log->Info(u"echo");
+  };
   Fixture.Log->Info(u"call");
   EXPECT_LT(Once->Notes().size(), 100U);
   const auto Before = Once->Notes().size();
@@ -284,8 +292,13 @@ TEST(LoggerThreads, LoggersComeAndGoWhileOthersLog) {
 class TNamed : public TZqBaseAppender {
  public:
   using TZqBaseAppender::TZqBaseAppender;
+  static inline bool Refuses = false;
 
  protected:
+  void AfterConstruction() override {
+    TZqBaseAppender::AfterConstruction();
+    if (Refuses) throw EConvertError(u"no");
+  }
   ~TNamed() override = default;
 };
 
@@ -322,6 +335,9 @@ TEST(AppenderList, LastListToLetGoEndsTheAppender) {
   {
     const TLoggerFixture Fixture(u"p");
     Fixture.Log->AddAppender(TZqLogBaseClass::Of<TNamed>());
+    TNamed::Refuses = true;
+    EXPECT_THROW(Fixture.Log->AddAppender(TZqLogBaseClass::Of<TNamed>()), EConvertError);
+    TNamed::Refuses = false;
     EXPECT_EQ(LiveAppenders().size(), 1U);
   }
   EXPECT_TRUE(LiveAppenders().empty());
@@ -354,6 +370,7 @@ TEST(AppenderInterfaces, EqualGuidsGiveTheShorterAndCastToTheLonger) {
 
 class TConfig : public Implements<TInterfacedObject, IZqLogConfigurator> {
  public:
+  IntfRef<IZqLogger> Kept;  // goes with the configurator
   Variant GetLoggerValue(const UnicodeString&, const UnicodeString&, TZqMainTypeKind, const Variant& A) override {
     return A;
   }
@@ -368,13 +385,16 @@ class TConfig : public Implements<TInterfacedObject, IZqLogConfigurator> {
 
 TEST(LoggerConfig, NewChildrenGetTheRootsAndNilGoesDown) {
   const auto Parent = Logger()->GetLogger(u"p");
-  Logger()->SetConfig(IntfRef<IZqLogConfigurator>(New<TConfig>()));
+  auto* const Config = New<TConfig>();
+  for (const char16_t* const Name : {u"p.k", u"k"}) Config->Kept = Logger()->GetLogger(Name);
+  Logger()->SetConfig(IntfRef<IZqLogConfigurator>(Config));
   const auto Child = Parent->GetLogger(u"c");
   const auto ConfigOf = [](const IntfRef<IZqLogger>& ALog) { return dynamic_cast<TZqLogger&>(*ALog).Configurator(); };
   EXPECT_TRUE(ConfigOf(Child));
   EXPECT_FALSE(ConfigOf(Parent)) << "not handed to children that exist";
   Logger()->SetConfig(nullptr);
   EXPECT_FALSE(ConfigOf(Child));
+  EXPECT_EQ(Logger()->GetChildLoggers()->Count(), 1);
 }
 
 // ---------------------------------------------------------------------------------------- values and events
@@ -464,6 +484,7 @@ TEST(LogPackage, StartsOnceHoweverOftenAndStopsWithTheLast) {
   EXPECT_EQ(RegisteredLayouts(), Before);
   const TLoggerFixture Fixture(u"p");
   EXPECT_EQ(GetPackageInfoTable().Units.front().Name, std::u16string_view(u"uZqSysUtils"));
+  for (const PTypeInfo Type : GetPackageInfoTable().Types) EXPECT_NE(GetEnumName(Type, 1), u"1");
 }
 
 TEST(LogPackage, StopWritesTheFootersOfTheRootsAppenders) {

@@ -94,6 +94,7 @@ TEST(FileFacts, TellSizeStateUseAndLocalTimesOfTwoSeconds) {
   EXPECT_EQ(ZqFileTimeToDateTime(Moment).Value, 36526.0);
   const FILETIME Back = ZqDateTimeToFileTime(36526.0 + 1 / 86400.0);
   EXPECT_EQ(std::pair(Back.dwLowDateTime, Back.dwHighDateTime), std::pair(0x256D4000U + 10000000U, 0x01BF53EBU));
+  EXPECT_THROW((void)ZqDateTimeToFileTime(1e300), EConvertError);
 }
 
 // ------------------------------------------------------------------------------------------------------ Folders
@@ -218,15 +219,18 @@ TEST(ShellFolders, ATreeGoesWithoutWhatItsLinksLeadToEvenIfTheShellFails) {
   EXPECT_TRUE(ZqRemoveDir(Folder.File("new/"), false));
   EXPECT_TRUE(Folder.Names() == std::vector<std::string>{"kept"} && Folder.Read("kept/file") == "x");
   EXPECT_FALSE(ZqRemoveDir(Folder.File("tree"), false) || ZqRemoveDir(u" ", false));
+  EXPECT_FALSE(ZqRemoveDir(Folder.File("kept/.//"), false));
   GrowTree(Folder);
   TRefusingShell Shell;
   const TPlatformOverride<TShellService> Fake(Shell);
   EXPECT_FALSE(ZqRenameFolder(Folder.File("tree"), Folder.File("new")));
   EXPECT_TRUE(ZqRemoveDir(Folder.File("tree"), true));
   EXPECT_FALSE(ZqRemoveDir(Folder.File("tree"), false) || fs::exists(Folder.Path() / "tree"));
+  fs::create_directory_symlink(Folder.Path() / "kept", Folder.Path() / "link");
+  EXPECT_TRUE(ZqRemoveDir(Folder.File("link/"), false));
   EXPECT_EQ(Folder.Read("kept/file"), "x");
   EXPECT_TRUE(ZqGetShellFolder(5) == u"/listed" && Shell.Held == 0);  // by way of the item list, which is freed
-  EXPECT_EQ(Shell.Calls, (std::vector<std::pair<Cardinal, Word>>{{4, 0x0610}, {3, 0x0454}, {3, 0x0414}}));
+  EXPECT_EQ(Shell.Calls, (std::vector<std::pair<Cardinal, Word>>{{4, 0x0610}, {3, 0x0454}, {3, 0x0414}, {3, 0x0414}}));
 }
 
 TEST(ShellFolders, FollowTheUsersChoiceAndAreMade) {
@@ -236,8 +240,8 @@ TEST(ShellFolders, FollowTheUsersChoiceAndAreMade) {
   EXPECT_TRUE(ZqGetShellFolder(46) == Home.File("data") && fs::is_directory(Home.Path() / "data"));
   EXPECT_EQ(ZqGetMyDocumentsFolder(), Home.File("Documents"));
   fs::create_directory(Home.Path() / ".config");
-  Home.Write(".config/user-dirs.dirs", "# XDG_DOCUMENTS_DIR=\"/no\"\nXDG_DOCUMENTS_DIR=\"$HOME/My\\ Docs/\"\n");
-  EXPECT_EQ(ZqGetMyDocumentsFolder(), Home.File("My Docs"));
+  Home.Write(".config/user-dirs.dirs", "# XDG_DOCUMENTS_DIR=\"/no\"\nXDG_DOCUMENTS_DIR=\"$HOME/Bob's\\ Docs/\"\n");
+  EXPECT_EQ(ZqGetMyDocumentsFolder(), Home.File("Bob's Docs"));
   EXPECT_EQ(RaisedBy([] { (void)ZqGetShellFolder(12345); }), u"Exception: Invalid pidl");
 }
 

@@ -52,6 +52,7 @@ INSTANTIATE_TEST_SUITE_P(Uses, PipeWrongUse,
         TWrongUse{"NoValue", "--logger", 2, "--logger needs a value"},
         TWrongUse{"NoNumber", "--max-size 12k", 2, "--max-size takes a whole number from 0 to 4294967295, not '12k'"},
         TWrongUse{"TooManyBackups", "--backups 65536", 2, "--backups takes a whole number from 1 to 65535"},
+        TWrongUse{"BlankFile", "--file ' '", 2, "--file needs a name"},
         TWrongUse{"NoLevel", "--level loud", 2, "not 'loud'"},
         TWrongUse{"MissingInput", "/no/such/file", 1, "/no/such/file: No such file or directory"},
         TWrongUse{"FolderAsInput", "/", 1, "Is a directory"},
@@ -64,7 +65,7 @@ TEST(Pipe, LinesOfAnyBytesAndLengthPassWhole) {
   for (int c = 0; c < 256; ++c)
     if (c != '\n' && c != '\r') Bytes += static_cast<char>(c);
   const std::string Long(3'000'000, 'y');
-  Folder.Write("in", Bytes + "\n\n" + Long + "\n\xC3\xA4 and a tail without an end");
+  Folder.Write("in", Bytes + "\n\n" + Long + "\n\xF0\x9F\x92\x80 and a tail without an end");
   const TRun Run =
       RunPipe("--max-size 0 --file " + (Folder.Path() / "app.log").string() + " " + (Folder.Path() / "in").string());
   EXPECT_EQ(Run.Status, 0) << Run.Errors;
@@ -72,8 +73,8 @@ TEST(Pipe, LinesOfAnyBytesAndLengthPassWhole) {
   std::string Utf8;
   for (const char c : Bytes)
     Utf8 += c >= 0 ? std::string(1, c) : UnicodeString(1, static_cast<unsigned char>(c)).ToUTF8();
-  EXPECT_EQ(
-      Texts(Folder.Read("app.log")), (std::vector<std::string>{Utf8, "", Long, "\xC3\xA4 and a tail without an end"}));
+  EXPECT_EQ(Texts(Folder.Read("app.log")),
+      (std::vector<std::string>{Utf8, "", Long, "\xF0\x9F\x92\x80 and a tail without an end"}));
 }
 
 TEST(Pipe, RollsAndCountsAndKeepsEveryLine) {
