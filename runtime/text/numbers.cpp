@@ -1,10 +1,9 @@
 #include "runtime/text/numbers.h"
 
-#include <locale.h>
-
 #include <algorithm>
 #include <array>
 #include <charconv>
+#include <clocale>
 #include <cmath>
 #include <cstdlib>
 #include <limits>
