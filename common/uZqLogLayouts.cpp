@@ -26,16 +26,18 @@ void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
   if (ALogIndent == liIndentDecrease) FIndent.SetLength(FIndent.Length() - static_cast<Integer>(cIndentStep.size()));
 }
 
-// Most lines come in the second of the one before: then the milliseconds alone are written anew.
+// Most lines come in the second of the one before: then the milliseconds alone are written anew, and nobody asks for
+// the time zone.
 ZQ_HOT const char* TZqSimpleLayout::TimeNow() {
-  const Int64 Milliseconds = NowMilliseconds();
-  const auto Rest = static_cast<Integer>((Milliseconds % 1000 + 1000) % 1000);
-  const Int64 Second = (Milliseconds - Rest) / 1000;
-  if (Second != FSecond) {
-    const UnicodeString Text = FormatDateTime(u"yyyy-mm-dd hh:mm:ss:", UnixMillisecondsToDateTime(Milliseconds - Rest));
+  const Int64 Milliseconds = UtcMilliseconds();
+  if (Milliseconds < FSecond || Milliseconds > FSecond + 999) {
+    const Int64 Second = Milliseconds - (Milliseconds % 1000 + 1000) % 1000;
+    const TDateTime Local = UnixMillisecondsToDateTime(LocalMilliseconds(Second));
+    const UnicodeString Text = FormatDateTime(u"yyyy-mm-dd hh:mm:ss:", Local);
     std::copy(Text.begin(), Text.end(), FTime);
     FSecond = Second;
   }
+  const auto Rest = static_cast<Integer>(Milliseconds - FSecond);
   char* const Digits = FTime + cTimeLength - 6;
   Digits[0] = static_cast<char>('0' + Rest / 100);
   Digits[1] = static_cast<char>('0' + Rest / 10 % 10);

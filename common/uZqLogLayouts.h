@@ -34,7 +34,7 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
       PZqDataRec AValue, TZqLogIndent ALogIndent);
 
   UnicodeString FIndent;
-  Int64 FSecond = std::numeric_limits<Int64>::min();  // the one that FTime shows
+  Int64 FSecond = std::numeric_limits<Int64>::min();  // the one that FTime shows, in milliseconds, UTC
   char FTime[27] = "yyyy-mm-dd hh:mm:ss:zzz - ";      // how the last line began
 };
 

@@ -65,17 +65,17 @@ constinit std::atomic<TClockService*> Slot = &LinuxClock;
 
 std::atomic<TClockService*>& ServiceSlot(const TClockService*) { return Slot; }
 
-// Calls to the system's own clock, whose class is final, are direct.
-ZQ_HOT Int64 NowMilliseconds() {
-  const auto Local = [](auto& AClock) {
-    const Int64 Utc = FloorDiv(AClock.UtcMicroseconds(), 1000);
-    return Utc + Int64{1000} * AClock.UtcOffsetSeconds(FloorDiv(Utc, 1000));
-  };
+// The call to the system's own clock, whose class is final, is direct.
+ZQ_HOT Int64 UtcMilliseconds() {
   TClockService* const Clock = Slot.load(std::memory_order_acquire);
-  return Clock == &LinuxClock ? Local(LinuxClock) : Local(*Clock);
+  return FloorDiv(Clock == &LinuxClock ? LinuxClock.UtcMicroseconds() : Clock->UtcMicroseconds(), 1000);
 }
 
-TDateTime Now() { return UnixMillisecondsToDateTime(NowMilliseconds()); }
+Int64 LocalMilliseconds(Int64 AUtc) {
+  return AUtc + Int64{1000} * Platform().Clock().UtcOffsetSeconds(FloorDiv(AUtc, 1000));
+}
+
+TDateTime Now() { return UnixMillisecondsToDateTime(LocalMilliseconds(UtcMilliseconds())); }
 
 TDate Date() { return TDate(std::trunc(Now().Value)); }
 
@@ -121,8 +121,7 @@ Integer TTimeZone::UtcOffset(TDateTime ALocal, bool AForceDaylight) const {
 }
 
 TDateTime TTimeZone::ToLocalTime(TDateTime AUtc) const {
-  const Int64 Utc = DateTimeToUnixMilliseconds(AUtc);
-  return UnixMillisecondsToDateTime(Utc + Int64{1000} * Platform().Clock().UtcOffsetSeconds(FloorDiv(Utc, 1000)));
+  return UnixMillisecondsToDateTime(LocalMilliseconds(DateTimeToUnixMilliseconds(AUtc)));
 }
 
 TDateTime TTimeZone::ToUniversalTime(TDateTime ALocal, bool AForceDaylight) const {

@@ -6,7 +6,7 @@
 
 namespace zq {
 
-/// The system's clock and time zone. Called on every log line, from any thread.
+/// The system's clock and time zone. Called from any thread, the clock on every log line.
 class ZQ_API TClockService {
  public:
   /// Since 1970-01-01 00:00 UTC.
@@ -20,8 +20,10 @@ class ZQ_API TClockService {
 
 /// The current service's time of day, local, in whole milliseconds: what a log line shows never lies in the future.
 [[nodiscard]] ZQ_API TDateTime Now();
-/// The same moment as milliseconds since 1970-01-01 00:00 local time, for who needs no TDateTime.
-[[nodiscard]] ZQ_API Int64 NowMilliseconds();
+/// The same moment for who needs no TDateTime: milliseconds since 1970-01-01 00:00 UTC.
+[[nodiscard]] ZQ_API Int64 UtcMilliseconds();
+/// A moment since 1970-01-01 00:00 UTC as one since 1970-01-01 00:00 local time. The two differ by whole seconds.
+[[nodiscard]] ZQ_API Int64 LocalMilliseconds(Int64 AUtc);
 [[nodiscard]] ZQ_API TDate Date();
 [[nodiscard]] ZQ_API TTime Time();
 
