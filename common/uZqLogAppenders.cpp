@@ -289,6 +289,7 @@ void TZqRollingFileAppender::Renumber(const TEntry& AEntry, std::size_t APositio
 // renamed onto one that still waits for its turn.
 void TZqRollingFileAppender::RollOver() {
   const TScope Scope(FLock);
+  if (FFileStream && FInitializing != 0) return;
   try {
     EndFile();
   } catch (const Exception&) {  // a footer that can't be written: the roll may be what makes room again
@@ -313,7 +314,7 @@ void TZqRollingFileAppender::CheckBackupCount() {
 
 ZQ_HOT void TZqRollingFileAppender::CheckRollover() {
   const TScope Scope(FLock);
-  if (FFileStream && FMaxFileSize != 0 && FFileStream->Size() >= FMaxFileSize && FInitializing == 0) RollOver();
+  if (FFileStream && FMaxFileSize != 0 && FFileStream->Size() >= FMaxFileSize) RollOver();
 }
 
 ZQ_HOT bool TZqRollingFileAppender::PrepareWrite() {

@@ -350,14 +350,14 @@ IntfRef<IZqLogConfigurator> TZqLogger::SetConfigurator(IntfRef<IZqLogConfigurato
   return std::exchange(FConfigurator, std::move(AConfig));
 }
 
-// What goes here is dropped with no lock held: a configurator may hold loggers.
+// The former configurator goes with no lock held: it may hold loggers.
 void TZqLogger::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
   std::vector<IntfRef<TZqLogger>> Children;
   IntfRef<IZqLogConfigurator> Former;
-  const TLogLockScope Scope(FLock, FFullName, u".SetConfig");
-  Former = SetConfigurator(AConfig);
-  if (AConfig) return;
   {
+    const TLogLockScope Scope(FLock, FFullName, u".SetConfig");
+    Former = SetConfigurator(AConfig);
+    if (AConfig) return;
     const TLogLockScope Listed(FChildLoggers.FLock, FFullName, u".SetConfig");
     Children.assign(FChildLoggers.FList.begin(), FChildLoggers.FList.end());
   }
