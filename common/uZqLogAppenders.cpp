@@ -59,8 +59,8 @@ void TZqBaseAppender::Write(
 void TZqBaseAppender::SetConfig(const IntfRef<IZqLogConfigurator>&) {}
 
 void TZqBaseAppender::SetLayout(const IntfRef<IZqLogLayout>& ALayout) {
+  FSimpleLayout = ExactlySimple(ALayout);  // first: it asks the layout, which may raise
   FLayout = ALayout;
-  FSimpleLayout = ExactlySimple(ALayout);
   if (const auto Told = ALayout.Supports<_IZqLogLayout>()) Told->Initialize(this);
 }
 

@@ -350,18 +350,18 @@ IntfRef<IZqLogConfigurator> TZqLogger::SetConfigurator(IntfRef<IZqLogConfigurato
   return std::exchange(FConfigurator, std::move(AConfig));
 }
 
-// The former configurator goes with no lock held: it may hold loggers.
 void TZqLogger::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
-  std::vector<IntfRef<TZqLogger>> Children;
-  IntfRef<IZqLogConfigurator> Former;
-  {
-    const TLogLockScope Scope(FLock, FFullName, u".SetConfig");
-    Former = SetConfigurator(AConfig);
-    if (AConfig) return;
-    const TLogLockScope Listed(FChildLoggers.FLock, FFullName, u".SetConfig");
-    Children.assign(FChildLoggers.FList.begin(), FChildLoggers.FList.end());
-  }
-  for (const auto& Child : Children) Child->SetConfig(nullptr);
+  std::vector<IntfRef<IZqLogConfigurator>> Former;  // go with no lock held: they may hold loggers
+  ReplaceConfig(AConfig, Former);
+}
+
+void TZqLogger::ReplaceConfig(
+    const IntfRef<IZqLogConfigurator>& AConfig, std::vector<IntfRef<IZqLogConfigurator>>& AFormer) {
+  const TLogLockScope Scope(FLock, FFullName, u".SetConfig");
+  AFormer.push_back(SetConfigurator(AConfig));
+  if (AConfig) return;
+  const TLogLockScope Children(FChildLoggers.FLock, FFullName, u".SetConfig");
+  for (TZqLogger* const Child : FChildLoggers.FList) Child->ReplaceConfig(nullptr, AFormer);
 }
 
 IntfRef<TZqLogger> TZqLogger::FindOrMakeChild(const UnicodeString& AName, bool& AMade) {

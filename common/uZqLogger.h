@@ -117,7 +117,8 @@ struct ZQ_API IZqLogAppender : Extends<IZqLogBase> {
   ~IZqLogAppender() = default;
 };
 
-/// Turns messages into text, for one appender and under its lock.
+/// Turns messages into text, for one appender and under its lock. A line that it logs itself goes into the file that is
+/// there; what its header or footer changes about the appender's file counts from the next opening on.
 struct ZQ_API IZqLogLayout : Extends<IZqLogBase> {
   static constexpr TGUID IID = "{5008EFF8-569C-4FD3-8C1D-FCCEF0DF632E}"_guid;
   /// The last text of a file, without a line end; empty for none.
@@ -237,9 +238,10 @@ template <class T>
 concept TNumber = std::is_arithmetic_v<T> && std::constructible_from<Variant, T>;
 }
 
-/// A named logger of the tree. Any thread may call any operation. Logging lets no Exception out, apart from the
-/// EConvertError of a format text that doesn't fit its arguments; what an appender raises beside Exception is let out.
-/// Operations on the tree and on the appenders raise Exception when a lock stays busy for some five seconds.
+/// A named logger of the tree. Any thread may call any operation. Once a message is made, logging lets no Exception
+/// out; before that a format text that doesn't fit its arguments raises EConvertError, and an empty event
+/// EAssertionFailed. What an appender raises beside Exception is let out. Operations on the tree and on the appenders
+/// raise Exception when a lock stays busy for some five seconds.
 struct ZQ_API IZqLogger : Extends<IInterface> {
   static constexpr TGUID IID = "{C9719FC7-DE99-4B3B-A008-A480D810D29E}"_guid;
   /// Empty at the root.
@@ -535,6 +537,7 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   IntfRef<TZqLogger> FindOrMakeChild(const UnicodeString& AName, bool& AMade);
   void ClearChildLoggers();
   IntfRef<IZqLogConfigurator> SetConfigurator(IntfRef<IZqLogConfigurator> AConfig);
+  void ReplaceConfig(const IntfRef<IZqLogConfigurator>& AConfig, std::vector<IntfRef<IZqLogConfigurator>>& AFormer);
 
   // In this order, so that the children's list goes first at the end and the count on the parent last.
   UnicodeString FName;

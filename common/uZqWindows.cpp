@@ -28,7 +28,8 @@ UnicodeString ZqGetEnvironmentVar(const UnicodeString& AName) {
 UnicodeString ZqExpandEnvVarsAndStrings(const UnicodeString& AText) {
   // Values that hold "$(" are expanded in turn: those that refer to each other in a circle must come to an end.
   constexpr Integer MaxRounds = 100;  // of one name
-  constexpr Integer MaxGrowth = 0x4000000;
+  constexpr Int64 MaxGrowth = 0x1000000;
+  constexpr TReplaceFlags All{rfReplaceAll, rfIgnoreCase};
   UnicodeString Result = AText;
   std::map<UnicodeString, Integer> Rounds;
   for (Integer Start = Result.Pos(u"$("); Start > 0; Start = Result.Pos(u"$(")) {
@@ -36,9 +37,10 @@ UnicodeString ZqExpandEnvVarsAndStrings(const UnicodeString& AText) {
     const auto Length = End == std::u16string_view::npos ? 0 : static_cast<Integer>(End) + 2 - Start;
     const UnicodeString Part = Result.Copy(Start, Length);
     const UnicodeString Value = ZqGetEnvironmentVar(Part.Copy(3, Length - 3));
-    Result = StringReplace(Result, Part, Value, {rfReplaceAll, rfIgnoreCase});
-    if (++Rounds[Part] > MaxRounds || Result.Length() - AText.Length() > MaxGrowth)
+    const Int64 Places = (Result.Length() - StringReplace(Result, Part, {}, All).Length()) / Length;
+    if (++Rounds[Part] > MaxRounds || Places * Value.Length() > MaxGrowth)
       throw Exception(u"The Environment Variable %s refers to itself", {Part});
+    Result = StringReplace(Result, Part, Value, All);
   }
   return Result.Pos(u"%") == 0 ? Result : Platform().Environment().ExpandEnvironmentStrings(Result);
 }
@@ -122,7 +124,7 @@ TDateTime ThroughFileDate(Int64 AUtcMicroseconds) {
 
 TDateTime FileMoment(const UnicodeString& AName, Int64 TSearchRec::*AField) {
   TSearchRec Found;
-  if (FindFirst(AName, faAnyFile, Found) != 0 || DirectoryExists(AName)) return 0;
+  if (FindFirst(AName, faAnyFile, Found) != 0 || (Found.Attr & faDirectory) != 0 || DirectoryExists(AName)) return 0;
   return ThroughFileDate(Found.*AField);
 }
 

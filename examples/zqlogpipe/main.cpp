@@ -131,7 +131,7 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
     else if (Word.size() > 1 && Word.front() == '-') throw TUsageError("unknown option '" + std::string(Word) + "'");
     else Result.Inputs.emplace_back(Word);
   }
-  const auto IsBlank = [](const std::string& AName) { return AName.find_first_not_of(' ') == std::string::npos; };
+  const auto IsBlank = [](const std::string& AName) { return Trim(FromUTF8(AName)).IsEmpty(); };
   if (std::any_of(Result.Files.begin(), Result.Files.end(), IsBlank)) throw TUsageError("--file needs a name");
   if (Result.Files.empty() && !Result.Help) throw TUsageError("--file is needed");
   return Result;

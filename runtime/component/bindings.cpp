@@ -161,7 +161,7 @@ void TBindingManager::Notify(const TObject* AObject, const UnicodeString& APrope
   std::vector<std::shared_ptr<TBindingExpression>> Expressions;
   std::unique_lock Guard(FLock);
   std::copy_if(FExpressions.begin(), FExpressions.end(), std::back_inserter(Expressions),
-      [](const auto& AExpression) { return AExpression->IsOfThisThread(); });
+      [&](const auto& AExpression) { return AExpression->MayDependOn(AObject); });
   Guard.unlock();
   for (const auto& Expression : Expressions)
     if (Expression->DependsOn(AObject, AProperty)) Expression->Evaluate();

@@ -84,7 +84,10 @@ class ZQ_API TBindingExpression : public TComponent {
   /// A call that comes while it is evaluating is ignored: two-way bindings come to rest.
   void Evaluate();
   [[nodiscard]] bool DependsOn(const TObject* AObject, const UnicodeString& AProperty) const;
-  [[nodiscard]] bool IsOfThisThread() const noexcept { return FThread == std::this_thread::get_id(); }
+  /// Whether this thread may ask: it made the expression, or AObject is where the path begins.
+  [[nodiscard]] bool MayDependOn(const TObject* AObject) const noexcept {
+    return FThread == std::this_thread::get_id() || FInput.Root() == AObject;
+  }
   void Deactivate() noexcept { FActive.store(false, std::memory_order_release); }
 
  protected:
@@ -115,7 +118,8 @@ class ZQ_API TBindingManager {
   void Add(std::shared_ptr<TBindingExpression> AExpression);
   /// Ends AExpression, whose pointer is dead then; nothing where it isn't here.
   void Remove(const TBindingExpression* AExpression);
-  /// Evaluates those of this thread that depend on that property; an empty name stands for any.
+  /// Evaluates those that depend on that property; an empty name stands for any. Those that other threads made are not
+  /// asked, but where their path begins at AObject.
   void Notify(const TObject* AObject, const UnicodeString& AProperty);
 
  private:

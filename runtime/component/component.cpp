@@ -167,7 +167,7 @@ void TComponent::Detach(TComponent* AComponent) noexcept {
 
 void TComponent::FreeNotification(TComponent* AComponent) {
   const std::lock_guard Guard(LinkLock);
-  if (FTelling || std::find(FWatchers.begin(), FWatchers.end(), AComponent) != FWatchers.end()) return;
+  if (FTelling != 0 || std::find(FWatchers.begin(), FWatchers.end(), AComponent) != FWatchers.end()) return;
   AComponent->FWatched.push_back(this);
   FWatchers.push_back(AComponent);
 }
@@ -180,13 +180,13 @@ void TComponent::RemoveFreeNotification(TComponent* AComponent) {
 
 void TComponent::TellWatchers() {
   struct TTelling {
-    explicit TTelling(bool& AFlag) : Flag(AFlag) { Set(true); }
-    ~TTelling() { Set(false); }
-    void Set(bool AValue) const {
+    explicit TTelling(Integer& ADepth) : Depth(ADepth) { Change(1); }
+    ~TTelling() { Change(-1); }
+    void Change(Integer ABy) const {
       const std::lock_guard Guard(LinkLock);
-      Flag = AValue;
+      Depth += ABy;
     }
-    bool& Flag;
+    Integer& Depth;
   } const Telling(FTelling);
   for (;;) {
     std::unique_lock Guard(LinkLock);

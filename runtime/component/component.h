@@ -121,7 +121,7 @@ class ZQ_API TComponent : public Implements<TPersistent, IInterface> {
   std::vector<TComponent*> FComponents;
   std::vector<TComponent*> FWatchers;  // told of this component's end
   std::vector<TComponent*> FWatched;   // those whose FWatchers hold this component
-  bool FTelling = false;               // the watchers are being told
+  Integer FTelling = 0;                // above 0 while the watchers are being told
   std::atomic<Byte> FState = 0;        // a bit for each TComponentStateFlag
   std::unique_ptr<TObservers> FObservers;
 };

@@ -17,12 +17,14 @@ class TMethod;
 
 namespace detail {
 
-// The class that a member function belongs to; T for a callable of another kind.
+// The class that a member function belongs to, which a bound T is kept as; T for a callable of another kind, and where
+// that class wouldn't lead back to the object.
 template <class TMember, class T>
 struct TOwnerOf {
   using type = T;
 };
 template <class TMember, class TOwner, class T>
+  requires(std::is_polymorphic_v<TOwner> || !std::derived_from<T, TObject>)
 struct TOwnerOf<TMember TOwner::*, T> {
   using type = std::conditional_t<std::is_const_v<T>, const TOwner, TOwner>;
 };
@@ -50,7 +52,7 @@ class TMethod<R(TArgs...)> {
   // NOLINTNEXTLINE(bugprone-forwarding-reference-overload): the constraint leaves copies and moves alone
   TMethod(TCallable&& ACallable) {
     using TKept = std::decay_t<TCallable>;
-    if constexpr (std::constructible_from<TKept, std::nullptr_t>)
+    if constexpr (std::constructible_from<TKept, std::nullptr_t> && requires(const TKept& AKept) { !AKept; })
       if (!static_cast<const TKept&>(ACallable)) return;
     FData = new TShared<TKept>(std::forward<TCallable>(ACallable));
     FOps = &TShared<TKept>::Ops;

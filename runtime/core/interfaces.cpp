@@ -41,6 +41,7 @@ void TInterfacedObject::AfterConstruction() {
 
 void TInterfacedObject::BeforeDestruction() {
   if (RefCount() != 0) throw Exception(ClassName() + u" is freed while it is referenced");
+  FEnding.store(true, std::memory_order_release);  // also of one that is freed by hand
   TObject::BeforeDestruction();
 }
 

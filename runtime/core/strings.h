@@ -158,11 +158,14 @@ class ZQ_API AnsiString : public RawByteString {
     Str() += AText;
     return *this;
   }
-  AnsiString& operator+=(const RawByteString& AText) = delete;  // its bytes may be in another code page
-  AnsiString& operator+=(const AnsiString& AText) { return *this += AText.View(); }
   friend AnsiString operator+(AnsiString A, std::string_view B) { return std::move(A += B); }
-  friend AnsiString operator+(AnsiString A, const AnsiString& B) { return std::move(A += B); }
-  friend AnsiString operator+(AnsiString A, const RawByteString& B) = delete;
+  // Bytes that may be in another code page.
+  template <class T>
+    requires(std::derived_from<T, RawByteString> && !std::derived_from<T, AnsiString>)
+  AnsiString& operator+=(const T& AText) = delete;
+  template <class T>
+    requires(std::derived_from<T, RawByteString> && !std::derived_from<T, AnsiString>)
+  friend AnsiString operator+(AnsiString A, const T& B) = delete;
 };
 
 /// Bytes in UTF-8.

@@ -224,7 +224,7 @@ template <class S>
 Variant StorageToVariant(const void* AStorage) {
   const S& Value = *static_cast<const S*>(AStorage);
   if constexpr (std::is_enum_v<S>) {
-    constexpr bool Wide = std::cmp_greater(std::numeric_limits<std::underlying_type_t<S>>::max(), 0x7FFFFFFF);
+    constexpr bool Wide = static_cast<UInt64>(std::numeric_limits<std::underlying_type_t<S>>::max()) > 0x7FFFFFFFU;
     return static_cast<std::conditional_t<Wide, Int64, Integer>>(Value);
   } else if constexpr (KindOf<S>() == tkSet) return Value.ToInteger();
   else if constexpr (std::same_as<S, ShortString>) return UTF8String(Value.View());

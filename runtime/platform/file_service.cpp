@@ -30,7 +30,9 @@ class TLinuxFiles final : public TFileService {
  public:
   UnicodeString GetShortPathName(const UnicodeString& AName) override {
     if (FileGetAttr(AName) < 0) return {};
-    return FromSystemPath(std::filesystem::absolute(ToSystemPath(AName)).string());  // ".." may lie behind a link
+    std::error_code Failure;  // the text stays as it is: ".." may lie behind a link
+    const auto Path = std::filesystem::absolute(ToSystemPath(AName), Failure);
+    return Failure ? UnicodeString() : FromSystemPath(Path.string());
   }
 
   UnicodeString GetTempPath() override {

@@ -236,7 +236,7 @@ std::string_view WithoutBlanks(std::string_view AText) {
 std::string EntryValue(std::string_view AContent, std::string_view AKey) {
   bool InGroup = false;
   while (!AContent.empty()) {
-    const std::string_view Line = TakeLine(AContent);
+    const std::string_view Line = WithoutBlanks(TakeLine(AContent));
     if (Line.starts_with('[')) InGroup = Line == "[Desktop Entry]";
     const std::size_t Equals = Line.find('=');
     if (InGroup && Equals != Line.npos && WithoutBlanks(Line.substr(0, Equals)) == AKey)

@@ -132,8 +132,9 @@ class ZQ_API TThread : public TObject {
 struct TInterlocked {
   template <class T>
   static T Add(T& ATarget, T ABy) noexcept {
-    using TBits = std::make_unsigned_t<T>;  // the sum wraps as the atomic one does
-    return static_cast<T>(static_cast<TBits>(std::atomic_ref<T>(ATarget).fetch_add(ABy)) + static_cast<TBits>(ABy));
+    const T Former = std::atomic_ref<T>(ATarget).fetch_add(ABy);
+    if constexpr (std::floating_point<T>) return Former + ABy;
+    else return static_cast<T>(static_cast<UInt64>(Former) + static_cast<UInt64>(ABy));  // wraps as the atomic sum does
   }
   template <class T>
   static T Increment(T& ATarget) noexcept {
