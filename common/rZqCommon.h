@@ -23,10 +23,12 @@ struct TPackageInfo {
 };
 
 /// Starts each module in the order of the table. The load of the library does it; further calls count, and so must
-/// calls of Finalize. What a start operation raises comes out, and ends the load.
+/// calls of Finalize. What a start operation raises comes out, and ends the load. One thread at a
+/// time.
 ZQ_API void Initialize();
 /// Stops the modules in the reverse order when it has been called as often as Initialize. Appenders that still hang on
-/// loggers write their footers here. The unload does it.
+/// loggers write their footers here. No other thread may use the library any more. The end of the process
+/// does it: a library that was loaded stays until then.
 ZQ_API void Finalize();
 [[nodiscard]] ZQ_API const TPackageInfo& GetPackageInfoTable();
 

@@ -9,10 +9,24 @@ using namespace uZqClasses;
 // ---- Counted objects -----------------------------------------------------------------------------------------------
 
 Integer TZqRefCount::Up(bool AClaim) noexcept {
-  const Integer Result = FCount.fetch_add(1, std::memory_order_relaxed) + 1;
-  TZqAutoDestroy Undecided = radComputed;
-  if (AClaim && State() == Undecided) FState.compare_exchange_strong(Undecided, radTrue, std::memory_order_relaxed);
-  return Result;
+  const UInt64 Now = FWord.fetch_add(cOne, std::memory_order_relaxed) + cOne;
+  if (AClaim && StateIn(Now) == radComputed) {
+    UInt64 Seen = Now;
+    while (StateIn(Seen) == radComputed && !FWord.compare_exchange_weak(Seen, Seen | static_cast<Byte>(radTrue)))
+      continue;
+  }
+  return CountIn(Now);
+}
+
+Integer TZqRefCount::Down(bool& AEnds) noexcept {
+  const UInt64 Now = FWord.fetch_sub(cOne, std::memory_order_acq_rel) - cOne;
+  AEnds = CountIn(Now) == 0 && StateIn(Now) == radTrue;
+  return CountIn(Now);
+}
+
+void TZqRefCount::SetState(TZqAutoDestroy AValue) noexcept {
+  UInt64 Seen = FWord.load(std::memory_order_relaxed);
+  while (!FWord.compare_exchange_weak(Seen, (Seen & ~UInt64{0xFF}) | static_cast<Byte>(AValue))) continue;
 }
 
 HRESULT TZqObject::QueryInterface(const TGUID& AIID, void** AObj) {
@@ -23,15 +37,17 @@ Integer TZqObject::_AddRef() { return FCount.Up(true); }
 
 Integer TZqObject::_Release() {
   // Asked before the count goes down: an owner may free the object as soon as it is 0.
-  const bool Ends = FCount.State() == radTrue && !FDestroying.load(std::memory_order_acquire);
-  const Integer Result = FCount.Down();
-  if (Result == 0 && Ends) Free();
+  const bool Destroying = FDestroying.load(std::memory_order_acquire);
+  bool Ends = false;
+  const Integer Result = FCount.Down(Ends);
+  if (Ends && !Destroying) Free();
   return Result;
 }
 
 void TZqObject::AfterConstruction() {
   Implements::AfterConstruction();
-  FCount.Down();
+  bool Ends = false;
+  FCount.Down(Ends);
 }
 
 void TZqObject::BeforeDestruction() {
@@ -167,15 +183,16 @@ TZqComponent::~TZqComponent() { ClearBindings(); }
 Integer TZqComponent::_AddRef() { return FCount.Up(Owner() == nullptr); }
 
 Integer TZqComponent::_Release() {
-  const bool Ends = FCount.State() == radTrue;  // asked first, as in TZqObject
-  const Integer Result = FCount.Down();
-  if (Result == 0 && Ends && !ComponentState().Contains(csDestroying)) Free();
+  bool Ends = false;
+  const Integer Result = FCount.Down(Ends);
+  if (Ends && !ComponentState().Contains(csDestroying)) Free();
   return Result;
 }
 
 void TZqComponent::AfterConstruction() {
   Implements::AfterConstruction();
-  FCount.Down();
+  bool Ends = false;
+  FCount.Down(Ends);
 }
 
 void TZqComponent::BeforeDestruction() {

@@ -18,7 +18,7 @@ inline constexpr TResStringRec _SCompRefCountNotZero{
     65508, u"An instance of %s with the name %s is destroyed while it's refcount is not 0!"};
 inline constexpr TResStringRec _SEncodingNotSupported{65510, u"The specified encoding is not supported!"};
 
-void Start();
+ZQ_API void Start();
 }  // namespace uZqClasses
 
 // ---- Interfaces ----------------------------------------------------------------------------------------------------
@@ -68,16 +68,20 @@ using enum TZqAutoDestroy;
 /// A reference count and what it means when it is zero. Any thread.
 class ZQ_API TZqRefCount {
  public:
-  [[nodiscard]] Integer Value() const noexcept { return FCount.load(std::memory_order_relaxed); }
-  [[nodiscard]] TZqAutoDestroy State() const noexcept { return FState.load(std::memory_order_relaxed); }
-  void SetState(TZqAutoDestroy AValue) noexcept { FState.store(AValue, std::memory_order_relaxed); }
+  [[nodiscard]] Integer Value() const noexcept { return CountIn(FWord.load(std::memory_order_acquire)); }
+  [[nodiscard]] TZqAutoDestroy State() const noexcept { return StateIn(FWord.load(std::memory_order_acquire)); }
+  void SetState(TZqAutoDestroy AValue) noexcept;
   /// Counts up; with AClaim an undecided instance becomes radTrue.
   Integer Up(bool AClaim) noexcept;
-  Integer Down() noexcept { return FCount.fetch_sub(1, std::memory_order_acq_rel) - 1; }
+  /// Counts down; AEnds tells whether the count became 0 while the state was radTrue, both read in the same step.
+  Integer Down(bool& AEnds) noexcept;
 
  private:
-  std::atomic<Integer> FCount = 1;  // the construction's own, so that a reference in a constructor is no end
-  std::atomic<TZqAutoDestroy> FState = radComputed;
+  static constexpr UInt64 cOne = UInt64{1} << 32U;  // the count stands above the state and doesn't run into it
+  static Integer CountIn(UInt64 AWord) noexcept { return static_cast<Integer>(AWord >> 32U); }
+  static TZqAutoDestroy StateIn(UInt64 AWord) noexcept { return static_cast<TZqAutoDestroy>(AWord & 0xFFU); }
+
+  std::atomic<UInt64> FWord = cOne;  // the construction's own, so that a reference in a constructor is no end
 };
 
 /// Lives by an owner or by its interface references, which each instance decides: the first reference makes it theirs,

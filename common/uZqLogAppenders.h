@@ -13,7 +13,8 @@ namespace zq {
 /// State machine under all appenders: opened by the first Write, closed by Close, opened again by the next Write.
 ///
 /// Without a layout an appender takes every message and writes nothing. Lock and Unlock keep its operations apart, also
-/// when several loggers share it. Its end closes it; an appender that can't write its last bytes goes all the same.
+/// when several loggers share it: those of this class take no lock, a descendant's hold FLock around them. Its end
+/// closes it; an appender that can't write its last bytes goes all the same.
 class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZqLogAppenderEx> {
  public:
   using Implements::Implements;
@@ -21,7 +22,7 @@ class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZq
 
   /// Opens what the appender writes to; the first Write does so too. Raises what the opening raises.
   virtual void Initialize();
-  /// Reads the appender's settings under its name.
+  /// For descendants that read settings; nothing here.
   virtual void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig);
   /// Initialises the appender if need be; a descendant calls it first and then writes.
   void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
@@ -73,7 +74,7 @@ class ZQ_API TZqTextFile : public TObject {
   /// Closes; a failure there goes unseen. Close shows it.
   ~TZqTextFile() override;
 
-  /// Bytes in the file by this writer's count.
+  /// Bytes in the file by this writer's count, at most 4294967295.
   [[nodiscard]] Cardinal Size() const;
   void Write(const UnicodeString& AValue);
   /// With CR LF behind it.
@@ -122,7 +123,7 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
   /// Raises EInOutError when the line can't be written.
   void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
-  /// Raises EInOutError when the footer can't be written; the file is closed all the same.
+  /// Raises EInOutError when the footer can't be written, and what the layout raises; the file is closed all the same.
   void Close() override;
   using TZqBaseAppender::SetLayout;
   /// Closes the present file; a layout that has an extension of its own changes the file's. What Close raises leaves
@@ -223,7 +224,7 @@ class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRoll
 };
 
 namespace uZqLogAppenders {
-void Start();
+ZQ_API void Start();
 }  // namespace uZqLogAppenders
 
 }  // namespace zq

@@ -39,7 +39,7 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
 };
 
 namespace uZqLogLayouts {
-void Start();
+ZQ_API void Start();
 }  // namespace uZqLogLayouts
 
 }  // namespace zq

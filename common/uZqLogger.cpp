@@ -1,6 +1,8 @@
 #include "common/uZqLogger.h"
 
 #include <algorithm>
+#include <atomic>
+#include <iterator>
 #include <set>
 #include <utility>
 
@@ -10,6 +12,7 @@
 #include "runtime/core/typeinfo.h"
 #include "runtime/platform/clock.h"
 #include "runtime/platform/version_service.h"
+#include "runtime/sync/thread.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/format.h"
 #include "runtime/text/numbers.h"
@@ -230,10 +233,16 @@ IntfRef<IZqLogAppender> TZqLogAppenderList::GetAppender(Integer AIndex) const {
   return Item->Appender;
 }
 
+// The entry goes to the appender, which waits for the walks that share it; this thread's own walk is none to wait for.
+void TZqLogAppenderList::LetGoOf(TComponent* AComponent) {
+  TItems Taken = TakeItems([&](const TEntry& AEntry) { return AEntry.Component == AComponent; });
+  auto* const Ended = dynamic_cast<TZqLogBase*>(AComponent);
+  if (Ended != nullptr && !FLock.IsOwned()) std::move(Taken.begin(), Taken.end(), std::back_inserter(Ended->FWalks));
+}
+
 void TZqLogAppenderList::Notification(TComponent* AComponent, TOperation AOperation) {
   TComponent::Notification(AComponent, AOperation);
-  if (AOperation == opRemove && AComponent != this)
-    TakeItems([&](const TEntry& AEntry) { return AEntry.Component == AComponent; });
+  if (AOperation == opRemove && AComponent != this) LetGoOf(AComponent);
 }
 
 // ---------------------------------------------------------------------------------------- TZqLogger
@@ -543,17 +552,28 @@ TZqLogBase::~TZqLogBase() { ForgetAppender(this); }
 
 void TZqLogBase::BeforeDestruction() {
   ForgetAppender(this);
-  const TLockScope Ending(EndLock);
+  const bool AutoDestroyed = AutoDestroy();
   if (RefCount() != 0) LeaveLists();
-  Implements::BeforeDestruction();
+  try {
+    const TLockScope Ending(EndLock);
+    Implements::BeforeDestruction();
+  } catch (...) {
+    SetAutoDestroy(AutoDestroyed);
+    throw;
+  }
 }
 
-// An appender that is freed by hand: the lists that hold it let go now, and none of them is the last to end it.
+// Freed by hand: the lists that hold it let go now, and nobody that drops a count is the last to end it.
 void TZqLogBase::LeaveLists() {
-  const bool AutoDestroyed = AutoDestroy();
   SetAutoDestroy(false);
-  TellWatchers();
-  SetAutoDestroy(AutoDestroyed);
+  {
+    const TLockScope Ending(EndLock);
+    TellWatchers();
+  }
+  const auto IsOver = [](const auto& AWalk) { return AWalk.use_count() == 1; };
+  for (Cardinal i = 0; i < cLockTries && !std::all_of(FWalks.begin(), FWalks.end(), IsOver); ++i) Sleep(1);
+  std::atomic_thread_fence(std::memory_order_acquire);
+  FWalks.clear();
 }
 
 std::vector<TZqLogBase*> LiveAppenders() {

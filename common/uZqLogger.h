@@ -95,7 +95,7 @@ using TZqLogBaseClass = TClassRef<TZqLogBase(TZqLogger*, const UnicodeString&)>;
 struct ZQ_API IZqLogBase : Extends<IInterface> {
   static constexpr TGUID IID = "{0061FD2F-FEF2-4D47-A7B2-2B69A7EB2CE1}"_guid;
   virtual UnicodeString GetName() const = 0;
-  /// The component behind the interface, which it owns; an appender of a host that is none answers null.
+  /// The component behind the interface, not counted; null for an appender of a host that is none.
   virtual TComponent* Component() = 0;
 
  protected:
@@ -103,8 +103,9 @@ struct ZQ_API IZqLogBase : Extends<IInterface> {
 };
 
 /// Takes messages from loggers. Called on the thread that logs, under the lock of the logger's appender list; what it
-/// raises ends the message's way there and reaches nobody. One that logs into its own logger gets those messages too,
-/// but only a few levels deep; further ones are dropped there.
+/// raises of the Exception family ends the message's way there and reaches nobody; anything else reaches the caller.
+/// One that logs into its own logger gets those messages too, but only a few levels deep; further ones are dropped
+/// there.
 struct ZQ_API IZqLogAppender : Extends<IZqLogBase> {
   static constexpr TGUID IID = "{D10CACCF-3B7D-4CBB-96D3-7C22BEF8FE7E}"_guid;
   /// ASender is the full name of the logger that was called, ALoggerName that of the logger whose appender this is.
@@ -182,7 +183,7 @@ struct ZQ_API IZqLogConfigurator : Extends<IInterface> {
 
 struct ZQ_API IZqLogConfiguratorEx : Extends<IZqLogConfigurator> {
   static constexpr TGUID IID = "{A57D0CA9-7632-4A0E-8333-DAF4BDA6CF3E}"_guid;
-  /// Sets up a logger that is given this configurator, before its settings are read.
+  /// To set up a logger that is given this configurator. The library doesn't call it yet.
   virtual void ConfigureLogger(TZqLogger* ALogger) = 0;
 
  protected:
@@ -239,9 +240,9 @@ concept TNumber = std::is_arithmetic_v<T> && std::constructible_from<Variant, T>
 }
 
 /// A named logger of the tree. Any thread may call any operation. Once a message is made, logging lets no Exception
-/// out; before that a format text that doesn't fit its arguments raises EConvertError, and an empty event
-/// EAssertionFailed. What an appender raises beside Exception is let out. Operations on the tree and on the appenders
-/// raise Exception when a lock stays busy for some five seconds.
+/// out; before that comes out what Format raises for a text and its arguments, and EAssertionFailed for an empty event.
+/// What an appender raises beside Exception is let out. An AObject to name a method or a logger by is there. Operations
+/// on the tree and on the appenders raise Exception when a lock stays busy for some five seconds.
 struct ZQ_API IZqLogger : Extends<IInterface> {
   static constexpr TGUID IID = "{C9719FC7-DE99-4B3B-A008-A480D810D29E}"_guid;
   /// Empty at the root.
@@ -276,6 +277,13 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   /// Whether this logger's own appenders would get a message of that level.
   virtual bool IsEnabledFor(TZqLogLevel ALogLevel) const = 0;
 
+  /// The forms of a std::string_view take UTF-8.
+  void Trace(std::string_view ALogMessage) { Trace(UnicodeString::FromUTF8(ALogMessage)); }
+  void Debug(std::string_view ALogMessage) { Debug(UnicodeString::FromUTF8(ALogMessage)); }
+  void Info(std::string_view ALogMessage) { Info(UnicodeString::FromUTF8(ALogMessage)); }
+  void Warn(std::string_view ALogMessage) { Warn(UnicodeString::FromUTF8(ALogMessage)); }
+  void Error(std::string_view ALogMessage) { Error(UnicodeString::FromUTF8(ALogMessage)); }
+  void Fatal(std::string_view ALogMessage) { Fatal(UnicodeString::FromUTF8(ALogMessage)); }
   virtual void Trace(const UnicodeString& ALogMessage) = 0;
   virtual void Trace(const TObject* AObject, const UnicodeString& AMethodName) = 0;
   virtual void Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) = 0;
@@ -343,11 +351,13 @@ class ZQ_API TZqLogLock : public TObject {
   ~TZqLogLock() override = default;
   /// False, or Exception if ARaise, when the lock stays busy.
   bool Enter(const UnicodeString& ALockRequestedBy, bool ARaise);
-  /// The same for AOwner followed by AOperation, joined only when somebody reads it. Both must outlive the lock.
+  /// The same for AOwner followed by AOperation, joined only when somebody reads it. Both must outlive this object.
   bool Enter(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise);
+  bool Enter(UnicodeString&& AOwner, const char16_t* AOperation, bool ARaise) = delete;
   void Leave() noexcept { FLock.Leave(); }
   /// Who took the lock last, and on which thread.
   [[nodiscard]] UnicodeString LockedBy() const;
+  [[nodiscard]] bool IsOwned() const noexcept { return FLock.IsOwned(); }
 
  private:
   bool Take(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise);
@@ -392,13 +402,15 @@ class ZQ_API TZqLogAppenderList : public TComponent {
 
   /// Adds an appender once, however often it is called. Raises EAssertionFailed for an empty reference.
   void Add(const IntfRef<IZqLogAppender>& AAppender);
-  /// Makes an appender of that class, with the class name as its name.
+  /// Makes an appender of that class, with the class name as its name. Raises EIntfCastError for a class that is no
+  /// appender, EInvalidOperation for an empty one.
   IntfRef<IZqLogAppender> Add(TZqLogBaseClass AAppender);
   /// Of a registered class, whatever the case of the name; raises EListError if there is none.
   IntfRef<IZqLogAppender> Add(const ShortString& AAppender);
   /// The same with a layout.
   IntfRef<IZqLogAppender> Add(TZqLogBaseClass AAppender, TZqLogBaseClass ALayout);
   IntfRef<IZqLogAppender> Add(const ShortString& AAppender, const ShortString& ALayout);
+  /// Raises EAssertionFailed for an empty reference.
   void Remove(const IntfRef<IZqLogAppender>& AAppender);
   void Clear();
   /// Count and GetAppender take no lock: who walks the list holds it. GetAppender raises EListError.
@@ -430,6 +442,7 @@ class ZQ_API TZqLogAppenderList : public TComponent {
   template <class TLeaves>
   TItems TakeItems(TLeaves ALeaves);
   TItems TakeAll();
+  void LetGoOf(TComponent* AComponent);
 
   TZqLogger* FLogger;
   std::atomic<Integer> FCount = 0;      // FList's size
@@ -476,7 +489,12 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   bool IsEnabledFor(TZqLogLevel ALogLevel) const override { return GetLevel() <= ALogLevel; }
 
   using IZqLogger::Debug;
+  using IZqLogger::Error;
+  using IZqLogger::Fatal;
+  using IZqLogger::Info;
   using IZqLogger::Log;
+  using IZqLogger::Trace;
+  using IZqLogger::Warn;
   void Trace(const UnicodeString& ALogMessage) override;
   void Trace(const TObject* AObject, const UnicodeString& AMethodName) override;
   void Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) override;
@@ -563,7 +581,8 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
 /// Base of appenders and layouts: a named component, made through its class, that lives by its count.
 class ZQ_API TZqLogBase : public Implements<TZqComponent, IZqLogBase> {
  public:
-  /// AName becomes the component's name unless it is empty or begins with a digit. ALogger must outlive the object.
+  /// AName becomes the component's name unless it is empty or begins with a digit; raises EComponentError for one that
+  /// is no identifier. ALogger must outlive the object.
   TZqLogBase(TZqLogger* ALogger, const UnicodeString& AName);
   [[nodiscard]] TZqLogger* Logger() const noexcept { return FLogger; }
   UnicodeString GetName() const override { return Name(); }
@@ -572,13 +591,16 @@ class ZQ_API TZqLogBase : public Implements<TZqComponent, IZqLogBase> {
  protected:
   ~TZqLogBase() override;
   void AfterConstruction() override;
-  /// Freed by hand, the object first leaves the lists that hold it.
+  /// Freed by hand, on any thread, the object first leaves the lists that hold it and waits, for some five seconds at
+  /// most, until no other thread's message is on its way through it. Out of a message of its own it raises Exception.
   void BeforeDestruction() override;
 
  private:
+  friend class TZqLogAppenderList;
   void LeaveLists();
 
   TZqLogger* FLogger;
+  std::vector<std::shared_ptr<const void>> FWalks;  // entries that walks of lists may hold still
 };
 
 /// Classes by name, in order of registration.
@@ -602,6 +624,7 @@ class ZQ_API TZqLogBaseClassList : public TObject {
 /// Every appender alive, in order of creation; a copy, for a moment.
 [[nodiscard]] ZQ_API std::vector<TZqLogBase*> LiveAppenders();
 
+/// Class names for Add and SetLayout, which raise EListError for one that nobody has registered.
 inline constexpr ShortString ZqFileAppender = "TZqFileAppender";
 inline constexpr ShortString ZqRollingFileAppender = "TZqRollingFileAppender";
 inline constexpr ShortString ZqDailyRollingFileAppender = "TZqDailyRollingFileAppender";
@@ -611,8 +634,8 @@ inline constexpr ShortString ZqSimpleLayout = "TZqSimpleLayout";
 inline constexpr ShortString ZqXmlLayout = "TZqXmlLayout";
 
 namespace uZqLogger {
-void Start();
-void Stop();
+ZQ_API void Start();
+ZQ_API void Stop();
 }  // namespace uZqLogger
 
 }  // namespace zq

@@ -147,7 +147,8 @@ ZQ_API void ZqTokenize(const UnicodeString& AText, TStringList* AList, const Uni
     TStrings* ADelimiterList = nullptr);
 /// Adds the pieces between ADelimiter, empty ones too: one more than there are delimiters. Doesn't clear AList.
 ZQ_API void ZqStringToList(const UnicodeString& AText, const UnicodeString& ADelimiter, TStringList* AList);
-/// The items, each behind ADelimiter, from the second character on and at most 999999 of them.
+/// The items, each behind ADelimiter, without the first character of the whole: meant for delimiters of one character.
+/// Cut at 999999 characters.
 [[nodiscard]] ZQ_API UnicodeString ZqListToString(const TStrings* AList, const UnicodeString& ADelimiter);
 /// Replaces pair by pair: a later pair meets what an earlier one put in. Asserts that there are as many new texts.
 [[nodiscard]] ZQ_API UnicodeString ZqStringReplace(
@@ -158,10 +159,10 @@ ZQ_API void ZqStringToList(const UnicodeString& AText, const UnicodeString& ADel
 /// Without the characters up to U+0020 at both ends.
 [[nodiscard]] ZQ_API UnicodeString ZqTrim(const UnicodeString& AText);
 [[nodiscard]] ZQ_API AnsiString ZqTrim(const AnsiString& AText);
-/// The same at one end, but never without the last character left.
+/// The same at one end; of a text of blanks one stays.
 [[nodiscard]] ZQ_API UnicodeString ZqTrimLeft(const UnicodeString& AText);
 [[nodiscard]] ZQ_API UnicodeString ZqTrimRight(const UnicodeString& AText);
-/// Without blanks, control characters and quotes of both kinds at both ends, but for the last character left.
+/// Without blanks, control characters and quotes of both kinds at both ends; one character always stays.
 [[nodiscard]] ZQ_API UnicodeString ZqStripLiterals(const UnicodeString& AText);
 [[nodiscard]] ZQ_API UnicodeString ZqLeft(const UnicodeString& AText, Integer ACount);
 [[nodiscard]] ZQ_API UnicodeString ZqRight(const UnicodeString& AText, Integer ACount);
@@ -244,6 +245,7 @@ using enum TZqBitness;
 [[nodiscard]] ZQ_API Boolean Is64BitFile(const UnicodeString& AFile);
 /// The account that this process runs under.
 [[nodiscard]] ZQ_API UnicodeString ZqGetUserName();
+/// And its domain.
 [[nodiscard]] ZQ_API UnicodeString ZqGetUserName(UnicodeString& ADomain);
 [[nodiscard]] ZQ_API UnicodeString ZqGetComputerName();
 /// What an administrator wrote about this computer. Raises Exception where the service refuses, EAssertionFailed where

@@ -23,7 +23,7 @@ inline constexpr TResStringRec _SCantFindNormalizeString{65528, u"Failed to find
 inline constexpr TResStringRec _SNormalizeFailure{65529, u"Failed to normalize the given value"};
 inline constexpr TResStringRec _SEncodingNotSupported{65530, u"The specified encoding is not supported!"};
 
-void Start();
+ZQ_API void Start();
 }  // namespace uZqTypes
 
 // ---- Encodings and code pages ---------------------------------------------------------------------------------------
@@ -38,8 +38,8 @@ inline constexpr std::array<Byte, 4> cZqUTF32LE{0xFF, 0xFE, 0x00, 0x00};
 /// Conversions between bytes of a code page and UTF-16, for any number of threads.
 ///
 /// Those that give a string raise EOSError where the source is no text of the code page or the code page has no
-/// converter; 65001, and 0 where it stands for that, replaces malformed pieces by U+FFFD instead. Those into a caller's
-/// buffer never raise.
+/// converter; 65001, and 0 where it stands for that, replaces malformed pieces by U+FFFD instead. To a code page, what
+/// it doesn't have becomes a similar character or "?" without a raise. Those into a caller's buffer never raise.
 class ZQ_API TZqEncoding : public TEncoding {
  public:
   TZqEncoding() = delete;
@@ -236,8 +236,8 @@ using TZqVariantTypeKind = TSubrange<rtkUnknown, rtkInterface>;
 
 // ---- Variants, strictly ---------------------------------------------------------------------------------------------
 // ADefValue for Null, Empty and a type that is not known, the value for a compatible type; any other raises
-// EConvertError. The members of up to 32 bits read an Integer, the others an Int64: what doesn't fit that raises
-// EVariantOverflow, what doesn't fit the result is cut to its width.
+// EConvertError. The members of up to 32 bits, but ZqVarLongword, read an Integer, the others an Int64: what doesn't
+// fit that raises EVariantOverflow, what doesn't fit the result is cut to its width.
 
 [[nodiscard]] ZQ_API ShortInt ZqVarShortint(const Variant& AValue, Integer ADefValue);
 [[nodiscard]] ZQ_API SmallInt ZqVarSmallint(const Variant& AValue, Integer ADefValue);
@@ -274,7 +274,7 @@ using TZqVariantTypeKind = TSubrange<rtkUnknown, rtkInterface>;
 [[nodiscard]] ZQ_API Cardinal ZqVarToLongword(const Variant& AValue, Integer ADefValue, Boolean ARaiseError);
 [[nodiscard]] ZQ_API Single ZqVarToSingle(const Variant& AValue, Single ADefValue, Boolean ARaiseError);
 [[nodiscard]] ZQ_API Double ZqVarToDouble(const Variant& AValue, Double ADefValue, Boolean ARaiseError);
-/// Text must bear the current decimal separator; the other members take either.
+/// Text must bear the current decimal separator; the other members go by ZqStrToFloat.
 [[nodiscard]] ZQ_API Extended ZqVarToExtended(const Variant& AValue, Double ADefValue, Boolean ARaiseError);
 /// Text is a date as yyyy-mm-dd, on any locale, or in the current format settings.
 [[nodiscard]] ZQ_API TDateTime ZqVarToDate(const Variant& AValue, TDateTime ADefValue, Boolean ARaiseError);
@@ -300,7 +300,8 @@ using TZqVariantTypeKind = TSubrange<rtkUnknown, rtkInterface>;
 /// By the first character alone: true for "1", "T", "t", "Y" and "y".
 [[nodiscard]] ZQ_API Boolean ZqStrToBool(const UnicodeString& AValue) noexcept;
 [[nodiscard]] ZQ_API UnicodeString ZqBoolToStr(Boolean AValue, const UnicodeString& ATrue, const UnicodeString& AFalse);
-/// By the current format settings and then with the other decimal separator. Raises EConvertError when neither fits.
+/// By the current format settings, and then with the decimal separator that the locale doesn't have. Raises
+/// EConvertError when neither fits.
 [[nodiscard]] ZQ_API Extended ZqStrToFloat(const UnicodeString& AValue);
 [[nodiscard]] ZQ_API Extended ZqStrToFloatDef(const UnicodeString& AValue, Extended ADefValue);
 

@@ -115,11 +115,7 @@ TDateTime ThroughFileDate(Int64 AUtcMicroseconds) {
   constexpr double First = 29221, Last = 75971;  // the days 1980-01-01 and 2107-12-31
   const TDateTime Moment = TTimeZone::Local().ToLocalTime(UnixMillisecondsToDateTime(AUtcMicroseconds / 1000));
   if (Moment < First || Moment >= Last + 1) return 0;
-  const TSystemTime Local = DateTimeToSystemTime(Moment);
-  const Cardinal Day = (Local.Year - 1980U) << 9U | static_cast<Cardinal>(Local.Month) << 5U | Local.Day;
-  const Cardinal Time =
-      static_cast<Cardinal>(Local.Hour) << 11U | static_cast<Cardinal>(Local.Minute) << 5U | Local.Second / 2U;
-  return FileDateToDateTime(static_cast<Integer>(Day << 16U | Time));
+  return FileDateToDateTime(DateTimeToFileDate(Moment));
 }
 
 TDateTime FileMoment(const UnicodeString& AName, Int64 TSearchRec::*AField) {

@@ -24,7 +24,8 @@ struct FILETIME {
 
 // ------------------------------------------------------------------------------------------------------ Path text
 
-/// The trimmed folder or drive with a separator behind it: "C" and "C:" become "C:\".
+/// The trimmed path with a separator behind it. A text that neither begins with "\" nor holds ":" or "/" counts as a
+/// drive: "C" becomes "C:\", but "logs" becomes "logs:\", too.
 [[nodiscard]] ZQ_API UnicodeString ZqIncludeTrailingBackslash(const UnicodeString& ADir);
 /// The trimmed text with a separator behind it, or with one taken off; empty stays empty.
 [[nodiscard]] ZQ_API UnicodeString ZqCheckDirSlash(const UnicodeString& ADir, bool AAddSlash);
@@ -49,9 +50,11 @@ struct FILETIME {
 /// systems that keep no time of birth give the last change.
 [[nodiscard]] ZQ_API TDateTime ZqGetFileCreated(const UnicodeString& AName);
 [[nodiscard]] ZQ_API TDateTime ZqGetFileLastModified(const UnicodeString& AName);
-/// The low 32 bits; -1 where there is no such file.
+/// In bytes, the low 32 bits; -1 where there is no such file. In this one and the two above, a name with "*" or "?" is
+/// a mask and means its first match.
 [[nodiscard]] ZQ_API Integer ZqGetFileSize(const UnicodeString& AName);
-/// These two leave the time zone as it is. They raise EConvertError outside of the years 1 to 9999.
+/// These two leave the time zone as it is. They raise EConvertError outside of the years 1 to 9999; a moment before
+/// 1601 becomes 0.
 [[nodiscard]] ZQ_API TDateTime ZqFileTimeToDateTime(const FILETIME& AValue);
 [[nodiscard]] ZQ_API FILETIME ZqDateTimeToFileTime(TDateTime AValue);
 

@@ -39,9 +39,7 @@ INSTANTIATE_TEST_SUITE_P(Table, Utf8Decode,
         TUtf8Case{"Surrogate", "\xED\xA0\x80\xED\xB0\x80", u"\uFFFD\uFFFD\uFFFD\uFFFD\uFFFD\uFFFD"},
         TUtf8Case{"BeyondTheLastPlane", "\xF4\x90\x80\x80\xF5", u"\uFFFD\uFFFD\uFFFD\uFFFD\uFFFD"},
         TUtf8Case{"CutAtTwo", "\xE2\x82", u"\uFFFD"}, TUtf8Case{"CutAtThree", "\xF0\x9F\x98", u"\uFFFD"},
-        TUtf8Case{"CutByAscii", "\xF0\x9F\x98z\xC3z", u"\uFFFDz\uFFFDz"},
-        TUtf8Case{"CutByASequence", "\xE2\x82\xE2\x82\xAC", u"\uFFFD\u20AC"},
-        TUtf8Case{"StrayTrails", "\x80\xBF", u"\uFFFD\uFFFD"},
+        TUtf8Case{"CutByASequence", "\xF0\x9F\x98z\xE2\x82\xE2\x82\xAC", u"\uFFFDz\uFFFD\u20AC"},
         TUtf8Case{"TheStandardsExample", "a\xF1\x80\x80\xE1\x80\xC2\x62\x80\x63\x80\xBF\x64",
             u"a\uFFFD\uFFFD\uFFFDb\uFFFDc\uFFFD\uFFFDd"}),
     [](const auto& AInfo) { return std::string(AInfo.param.Name); });
@@ -131,7 +129,6 @@ TEST(Strings, CaseIsThatOfAscii) {
 TEST(Strings, TrimTakesControlsAndZerosButNoOtherSpaces) {
   EXPECT_EQ(Trim(UnicodeString(u"\0 \u00A0\x1F", 4)), u"\u00A0");
   EXPECT_EQ(Trim(u"\r\n"), u"");
-  EXPECT_EQ(TrimLeft(u" a ") + TrimRight(u" a "), u"a  a");
 }
 
 TEST(Guids, AreNewEachTimeAndHaveTheirText) {

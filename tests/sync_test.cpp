@@ -28,6 +28,7 @@ TEST(Event, AWaitEndsAtTheSignalOrWhenItsTimeIsOver) {
     Event.SetEvent();
   });
   EXPECT_EQ(Event.WaitFor(cLong), wrSignaled);
+  EXPECT_LT(std::chrono::steady_clock::now() - Start, std::chrono::milliseconds(cLong));
 }
 
 TEST(Event, EachSignalOfAnAutomaticOneReleasesExactlyOneWaiter) {

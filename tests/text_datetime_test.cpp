@@ -64,14 +64,6 @@ TEST(TextCalendar, EveryMillisecondComesBack) {
     }
 }
 
-TEST(TextCalendar, FileDatesHoldTwoSeconds) {
-  EXPECT_EQ(DateTimeToFileDate(EncodeDate(2021, 12, 23) + EncodeTime(10, 53, 18, 0)), 0x539756A9);
-  EXPECT_EQ(Shown(FileDateToDateTime(0x539756A9)), u"2021-12-23 10:53:18:000");
-  EXPECT_EQ(Shown(FileDateToDateTime(DateTimeToFileDate(EncodeDate(2107, 12, 31)))), u"2107-12-31 00:00:00:000");
-  EXPECT_THROW((void)FileDateToDateTime(0), EConvertError);
-  EXPECT_THROW((void)DateTimeToFileDate(EncodeDate(1979, 12, 31)), EConvertError);
-}
-
 TEST(TextDateFormat, RoundsToMillisecondsAndCarries) {
   const double Day = EncodeDate(2021, 12, 31);
   const std::pair<double, const char16_t*> cCases[] = {{Day + EncodeTime(10, 53, 18, 123), u"2021-12-31 10:53:18:123"},

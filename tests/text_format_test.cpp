@@ -4,6 +4,7 @@
 #include <cstdlib>
 #include <filesystem>
 #include <limits>
+#include <optional>
 
 #include "runtime/core/exceptions.h"
 #include "runtime/core/variants.h"
@@ -11,6 +12,7 @@
 #include "runtime/text/encoding.h"
 #include "runtime/text/format.h"
 #include "runtime/text/numbers.h"
+#include "tests/support/environment_scope.h"
 #include "tests/support/raised.h"
 #include "tests/support/support.h"
 
@@ -147,15 +149,13 @@ class TextLocale : public testing::Test {
     const std::string Home = Folder.Path().string(), Name = ALocale + ".UTF-8";
     const std::string Command = "cd '" + Home + "' && LC_ALL=C localedef -c -i ./source -f UTF-8 './" + Name;
     if (std::system((Command + "' >/dev/null 2>&1").c_str()) == -1) return false;
-    setenv("LOCPATH", Home.c_str(), 1);
+    Path.emplace("LOCPATH", Home);
     setenv("LC_ALL", Name.c_str(), 1);
     return std::filesystem::exists(Folder.Path() / Name / "LC_TIME");
   }
-  void TearDown() override {
-    unsetenv("LOCPATH");
-    unsetenv("LC_ALL");
-  }
   const TTempFolder Folder;
+  const TEnvironmentScope Language{"LC_ALL", "C"};
+  std::optional<TEnvironmentScope> Path;
 };
 
 TEST_F(TextLocale, SettingsComeFromTheEnvironment) {
@@ -176,16 +176,6 @@ TEST_F(TextLocale, SettingsComeFromTheEnvironment) {
       Shown += u"|" + Text;
     EXPECT_EQ(Shown, Want) << Locale;
   }
-}
-
-TEST(TextSettings, AChangeReachesTheFunctionsWithoutSettings) {
-  const TFormatSettings Before = FormatSettings();
-  const auto Held = SharedFormatSettings();
-  SetFormatSettings(Comma());
-  EXPECT_EQ(FloatToStr(1.5) + Format(u" %f", {2.5}), u"1,5 2,50");
-  EXPECT_EQ(StrToFloat(u"1,5"), 1.5);
-  EXPECT_EQ(Held->DecimalSeparator, Before.DecimalSeparator);
-  SetFormatSettings(Before);
 }
 
 }  // namespace

@@ -123,6 +123,21 @@ TEST(ObjectAdapter, AnswersWithItsObjectAndEndsItOnlyWhenItOwnsIt) {
   }
 }
 
+struct TNested : TLinked {
+  using TLinked::TLinked;
+  TZqObjectEx* GetOwner() override { return Owner; }
+  TZqObjectEx* Owner = nullptr;
+};
+
+TEST(LinkedObjects, TellTheirPathAndWhatTheyCannotTake) {
+  std::string Log;
+  const TOwned<TNested> Inner(New<TNested>(Log, "i")), Outer(New<TNested>(Log, "o"));
+  EXPECT_EQ(Inner->GetNamePath(), u"TNested");
+  Inner->Owner = Outer.get();
+  EXPECT_EQ(Inner->GetNamePath(), u"TNested.TNested");
+  EXPECT_EQ(RaisedBy([&] { Inner->Assign(nullptr); }), u"EConvertError: Cannot assign a nil to a TNested");
+}
+
 // ---- Components ----------------------------------------------------------------------------------------------------
 
 struct TPart : TZqComponent {

@@ -260,6 +260,7 @@ TEST(AppenderRolling, NotAppendingKeepsTheOldFileAsABackup) {
 TEST(AppenderRolling, NoBackupsMeansNoOutput) {
   TRollingFixture Fixture;
   Fixture.Log->Info(u"x");
+  Fixture.File->RollOver();
   Fixture.File->SetMaxBackupCount(0);
   Fixture.Log->Info(u"y");
   EXPECT_TRUE(Fixture.Folder.Names().empty());
@@ -413,6 +414,7 @@ TEST(AppenderFaults, KilledProcessLeavesEveryLineWhoseCallReturned) {
   ASSERT_EQ(::pipe(Pipe), 0);
   const pid_t Child = ::fork();
   if (Child == 0) {
+    ::close(Pipe[0]);
     const TLoggerFixture Fixture;
     AddFile(Fixture.Log, Folder.File("app.log"));
     for (int i = 0;; ++i) {

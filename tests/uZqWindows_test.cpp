@@ -83,12 +83,15 @@ TEST(FileFacts, TellSizeStateUseAndLocalTimesOfTwoSeconds) {
   EXPECT_TRUE(ZqFileIsReadOnly(File));
   EXPECT_EQ(RaisedBy([&] { (void)ZqGetShortFileName(None); }), u"Exception: Failed to determine the short filename!");
 
-  const TEnvironmentScope Zone("TZ", "XXX-2");
+  const struct TZone {
+    ~TZone() { TTimeZone::Refresh(); }
+    const TEnvironmentScope Name{"TZ", "XXX-2"};
+  } Zone;
   TTimeZone::Refresh();
+  EXPECT_NEAR(ZqGetFileCreated(File), Now(), 5 / 86400.0);
   const std::chrono::sys_seconds Time{std::chrono::seconds(1709251199)};  // 2024-02-29 23:59:59 UTC
   fs::last_write_time(Folder.Path() / "file", std::chrono::file_clock::from_sys(Time));
   EXPECT_EQ(FormatDateTime(u"yyyy-mm-dd hh:mm:ss", ZqGetFileLastModified(File)), u"2024-03-01 01:59:58");
-  EXPECT_NEAR(ZqGetFileCreated(File), Now(), 5 / 86400.0);
   EXPECT_EQ(ZqGetFileLastModified(None).Value, 0);
   const FILETIME Moment{0x256D4000, 0x01BF53EB};  // 2000-01-01, counted from 1601
   EXPECT_EQ(ZqFileTimeToDateTime(Moment).Value, 36526.0);

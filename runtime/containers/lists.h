@@ -154,14 +154,15 @@ class ZQ_API TThreadListOf : public TObject {
   void UnlockList() { FLock.unlock(); }
 
   /// The list, locked for a scope.
-  class TScope {
+  class [[nodiscard]] TScope {
    public:
     explicit TScope(TThreadListOf& AList) : FOwner(AList), FList(AList.LockList()) {}
     TScope(const TScope&) = delete;
     TScope& operator=(const TScope&) = delete;
     ~TScope() { FOwner.UnlockList(); }
     TListOf<T>* operator->() const noexcept { return FList; }
-    TListOf<T>& operator*() const noexcept { return *FList; }
+    TListOf<T>& operator*() const& noexcept { return *FList; }
+    TListOf<T>& operator*() const&& = delete;  // in a range-for it would end before the loop's body
 
    private:
     TThreadListOf& FOwner;

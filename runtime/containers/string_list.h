@@ -81,6 +81,7 @@ class ZQ_API TStrings : public TPersistent {
     using pointer = const UnicodeString*;
     using reference = const UnicodeString&;
 
+    TIterator() noexcept = default;
     TIterator(const TStrings& AStrings, Integer AIndex) noexcept : FStrings(&AStrings), FIndex(AIndex) {}
     reference operator*() const { return FStrings->Strings(FIndex); }
     TIterator& operator++() noexcept {
@@ -91,8 +92,8 @@ class ZQ_API TStrings : public TPersistent {
     friend bool operator==(const TIterator&, const TIterator&) noexcept = default;
 
    private:
-    const TStrings* FStrings;
-    Integer FIndex;
+    const TStrings* FStrings = nullptr;
+    Integer FIndex = 0;
   };
   [[nodiscard]] TIterator begin() const noexcept { return {*this, 0}; }
   [[nodiscard]] TIterator end() const noexcept { return {*this, Count()}; }

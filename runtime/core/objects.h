@@ -147,7 +147,7 @@ class TClassRef<TBase(TArgs...)> {
   TBase* (*FCreate)(TArgs...) = nullptr;
 };
 
-/// malloc's, for the raw blocks that functions hand out.
+/// malloc's, for the raw blocks that functions hand out. Raises std::bad_alloc; a size of 0 gives a block, too.
 [[nodiscard]] ZQ_API void* GetMem(std::size_t ASize);
 ZQ_API void FreeMem(void* ABlock) noexcept;
 

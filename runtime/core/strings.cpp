@@ -34,12 +34,6 @@ std::size_t FindText(
   return Found == AText.end() ? std::u16string_view::npos : static_cast<std::size_t>(Found - AText.begin());
 }
 
-UnicodeString TrimEnds(std::u16string_view AText, bool ALeft, bool ARight) {
-  while (ALeft && !AText.empty() && AText.front() <= u' ') AText.remove_prefix(1);
-  while (ARight && !AText.empty() && AText.back() <= u' ') AText.remove_suffix(1);
-  return AText;
-}
-
 }  // namespace
 
 UnicodeString UnicodeString::FromUTF8(std::string_view AText) { return utf8::Decode(AText); }
@@ -74,9 +68,12 @@ Integer Pos(std::u16string_view ASub, std::u16string_view AText) noexcept {
   return Found == std::u16string_view::npos ? 0 : static_cast<Integer>(Found) + 1;
 }
 
-UnicodeString Trim(const UnicodeString& AText) { return TrimEnds(AText, true, true); }
-UnicodeString TrimLeft(const UnicodeString& AText) { return TrimEnds(AText, true, false); }
-UnicodeString TrimRight(const UnicodeString& AText) { return TrimEnds(AText, false, true); }
+UnicodeString Trim(const UnicodeString& AText) {
+  std::u16string_view Result = AText;
+  while (!Result.empty() && Result.front() <= u' ') Result.remove_prefix(1);
+  while (!Result.empty() && Result.back() <= u' ') Result.remove_suffix(1);
+  return Result;
+}
 
 UnicodeString LowerCase(UnicodeString AText) {
   std::transform(AText.begin(), AText.end(), AText.begin(), LowerAscii);

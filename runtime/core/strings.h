@@ -45,7 +45,7 @@ class ZQ_API UnicodeString {
   [[nodiscard]] char16_t& operator[](Integer AIndex) noexcept { return FText[static_cast<std::size_t>(AIndex - 1)]; }
   /// ACount characters from AIndex on, clipped at the end; empty for a count of 0 or less.
   [[nodiscard]] UnicodeString Copy(Integer AIndex, Integer ACount) const;
-  /// Place of the first ASub, 0 if absent. An empty ASub is nowhere.
+  /// Place of the first ASub, from 1; 0 if absent. An empty ASub is nowhere.
   [[nodiscard]] Integer Pos(std::u16string_view ASub) const noexcept;
 
   [[nodiscard]] const char16_t* c_str() const noexcept { return FText.c_str(); }
@@ -64,11 +64,15 @@ class ZQ_API UnicodeString {
 
   UnicodeString& operator+=(const UnicodeString& AText) { return Append(AText.FText); }
   UnicodeString& operator+=(std::u16string_view AText) { return Append(AText); }
+  UnicodeString& operator+=(const std::u16string& AText) { return Append(AText); }
   UnicodeString& operator+=(const char16_t* AText) { return Append(AText); }
   UnicodeString& operator+=(char16_t AChar) {
     FText += AChar;
     return *this;
   }
+  template <class T>
+    requires(std::is_arithmetic_v<T> && !std::same_as<T, char16_t>)
+  UnicodeString& operator+=(T) = delete;  // a number or a byte is no character
   UnicodeString& Append(std::u16string_view AText) {
     FText += AText;
     return *this;
@@ -76,9 +80,14 @@ class ZQ_API UnicodeString {
 
   friend UnicodeString operator+(UnicodeString A, const UnicodeString& B) { return std::move(A += B); }
   friend UnicodeString operator+(UnicodeString A, std::u16string_view B) { return std::move(A += B); }
+  friend UnicodeString operator+(UnicodeString A, const std::u16string& B) { return std::move(A += B); }
   friend UnicodeString operator+(UnicodeString A, const char16_t* B) { return std::move(A += B); }
+  template <class T>
+    requires(std::is_arithmetic_v<T> && !std::same_as<T, char16_t>)
+  friend UnicodeString operator+(const UnicodeString& A, T B) = delete;
   friend UnicodeString operator+(UnicodeString A, char16_t B) { return std::move(A += B); }
   friend UnicodeString operator+(std::u16string_view A, const UnicodeString& B) { return UnicodeString(A) += B; }
+  friend UnicodeString operator+(const std::u16string& A, const UnicodeString& B) { return UnicodeString(A) += B; }
   friend UnicodeString operator+(const char16_t* A, const UnicodeString& B) { return UnicodeString(A) += B; }
   friend UnicodeString operator+(char16_t A, const UnicodeString& B) { return UnicodeString(A) += B; }
 
@@ -88,6 +97,8 @@ class ZQ_API UnicodeString {
   friend bool operator==(const UnicodeString& A, const char16_t* B) noexcept { return A.FText == B; }
   friend bool operator==(const UnicodeString& A, const std::u16string& B) noexcept { return A.FText == B; }
   friend auto operator<=>(const UnicodeString& A, const UnicodeString& B) noexcept { return A.FText <=> B.FText; }
+  friend auto operator<=>(const UnicodeString& A, std::u16string_view B) noexcept { return A.View() <=> B; }
+  friend auto operator<=>(const UnicodeString& A, const char16_t* B) noexcept { return A.FText <=> B; }
 
  private:
   std::u16string FText;
@@ -175,6 +186,7 @@ class ZQ_API UTF8String : public RawByteString {
   UTF8String(const char* AText) : RawByteString(AText == nullptr ? "" : AText, 65001) {}
   UTF8String(std::string_view AText) : RawByteString(std::string(AText), 65001) {}
   UTF8String(std::string AText) noexcept : RawByteString(std::move(AText), 65001) {}
+  UTF8String(const RawByteString& ABytes) = delete;  // they may be in another code page
 };
 
 /// At most 255 one-byte characters, inline; what is longer is cut. Carries class names.
@@ -207,8 +219,6 @@ class ShortString {
 [[nodiscard]] ZQ_API Integer Pos(std::u16string_view ASub, std::u16string_view AText) noexcept;
 /// Without the characters up to U+0020 at both ends.
 [[nodiscard]] ZQ_API UnicodeString Trim(const UnicodeString& AText);
-[[nodiscard]] ZQ_API UnicodeString TrimLeft(const UnicodeString& AText);
-[[nodiscard]] ZQ_API UnicodeString TrimRight(const UnicodeString& AText);
 /// These four touch and compare the ASCII letters only.
 [[nodiscard]] ZQ_API UnicodeString LowerCase(UnicodeString AText);
 [[nodiscard]] ZQ_API UnicodeString UpperCase(UnicodeString AText);

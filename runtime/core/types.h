@@ -39,11 +39,17 @@ using TArray = std::vector<T>;
 using TBytes = TArray<Byte>;
 
 /// A moment, a date or a time of day: days since 1899-12-30, the fraction is the time of day. Distinct types, so that
-/// overloads and the type registry tell them apart; each converts to and from its double.
+/// overloads and the type registry tell them apart; each converts to and from its double, and they to each other with
+/// the whole of it.
+struct TDate;
+struct TTime;
 struct TDateTime {
   double Value = 0;
   constexpr TDateTime() noexcept = default;
   constexpr TDateTime(double AValue) noexcept : Value(AValue) {}
+  template <class T>
+    requires(std::same_as<T, TDate> || std::same_as<T, TTime>)
+  constexpr TDateTime(T AValue) noexcept : Value(AValue.Value) {}
   constexpr operator double() const noexcept { return Value; }
 };
 struct TDate {

@@ -156,7 +156,8 @@ class ZQ_API Variant {
   }
 
   [[nodiscard]] TVarType Type() const noexcept { return FType; }
-  /// Element of an array with one dimension, counted from its low bound. Raises EVariantBadIndex.
+  /// Element of an array with one dimension, by its index; valid as long as the array. Raises EVariantTypeCast for what
+  /// is no array, EVariantBadIndex.
   [[nodiscard]] const Variant& operator[](Integer AIndex) const;
 
   friend ZQ_API std::partial_ordering operator<=>(const Variant& A, const Variant& B);
@@ -235,7 +236,8 @@ class ZQ_API Variant {
 /// Array of variants with one dimension, from 0.
 [[nodiscard]] ZQ_API Variant VarArrayOf(TArray<Variant> AItems);
 /// Array of empty elements, or of zeros of AElementType. ABounds holds low and high bound of each dimension in turn; a
-/// high bound one below the low one makes no elements. Raises EVariantBadIndex for other bounds.
+/// high bound one below the low one makes no elements. Raises EVariantBadIndex for other bounds and for more elements
+/// than memory can hold, EVariantTypeCast for a type that no element can have.
 [[nodiscard]] ZQ_API Variant VarArrayCreate(std::span<const Integer> ABounds, TVarType AElementType);
 [[nodiscard]] inline Variant VarArrayCreate(std::initializer_list<Integer> ABounds, TVarType AElementType) {
   return VarArrayCreate(std::span(ABounds.begin(), ABounds.size()), AElementType);

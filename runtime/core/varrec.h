@@ -47,15 +47,21 @@ struct TVarRec {
   TVarRec(T AValue) noexcept : Kind(vtBoolean), VBoolean(AValue) {}
   template <std::floating_point T>
   TVarRec(T AValue) noexcept : Kind(vtExtended), VExtended(AValue) {}
-  TVarRec(TDateTime AValue) noexcept : Kind(vtExtended), VExtended(AValue.Value) {}
+  template <class T>
+    requires(std::same_as<T, TDateTime> || std::same_as<T, TDate> || std::same_as<T, TTime>)
+  TVarRec(T AValue)
+  noexcept : Kind(vtExtended), VExtended(AValue.Value) {}
   TVarRec(char16_t AValue) noexcept : Kind(vtWideChar), VWideChar(AValue) {}
   TVarRec(char AValue) noexcept : Kind(vtAnsiChar), VAnsiChar(AValue) {}
   TVarRec(const UnicodeString& AValue) noexcept : Kind(vtWideText), VWideText(AValue.View()) {}
   TVarRec(std::u16string_view AValue) noexcept : Kind(vtWideText), VWideText(AValue) {}
+  TVarRec(const std::u16string& AValue) noexcept : Kind(vtWideText), VWideText(AValue) {}
   TVarRec(const char16_t* AValue) noexcept : Kind(vtWideText), VWideText(AValue == nullptr ? u"" : AValue) {}
+  // Bytes without a code page of their own are in the process's; UTF-8 comes as UTF8String.
   TVarRec(const RawByteString& AValue) noexcept
       : Kind(vtAnsiText), CodePage(AValue.CodePage()), VAnsiText(AValue.View()) {}
   TVarRec(std::string_view AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue) {}
+  TVarRec(const std::string& AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue) {}
   TVarRec(const char* AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue == nullptr ? "" : AValue) {}
   TVarRec(const ShortString& AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue.View()) {}
   TVarRec(const Variant& AValue) noexcept : Kind(vtVariant), VVariant(&AValue) {}

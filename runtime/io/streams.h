@@ -32,6 +32,7 @@ class ZQ_API TStream : public TObject {
   Integer Seek(Integer AOffset, Word AOrigin) {
     return static_cast<Integer>(Seek(Int64{AOffset}, static_cast<TSeekOrigin>(AOrigin)));
   }
+  Int64 Seek(Int64 AOffset, Word AOrigin) = delete;  // it would lose the high half of AOffset
   /// Found by going to the end and back, unless a class knows better.
   [[nodiscard]] virtual Int64 GetSize();
   /// Nothing in a stream whose size can't be set.

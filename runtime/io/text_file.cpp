@@ -56,9 +56,11 @@ void TTextFile::AppendOrCreate() { Open(O_CREAT, u"open"); }
 void TTextFile::Open(int AFlags, const char16_t* AStep) {
   Close();
   const std::string Path = ToSystemPath(FFileName);
-  do FHandle = ::open(Path.c_str(), AFlags | O_WRONLY | O_APPEND | O_CLOEXEC, 0666);
+  // A pipe that nobody reads is a failure then, and no endless wait; writing waits as it does for any file.
+  do FHandle = ::open(Path.c_str(), AFlags | O_WRONLY | O_APPEND | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0666);
   while (!IsOpen() && errno == EINTR);
   if (!IsOpen()) Fail(AStep, errno);
+  ::fcntl(FHandle, F_SETFL, O_APPEND);
   FWritten = 0;
   FTorn = false;
 }

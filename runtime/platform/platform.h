@@ -56,7 +56,7 @@ class TPlatform {
 /// Puts a service in its seam for a scope, for all threads. Overrides nest; AService stays the caller's and must
 /// outlive every call that a thread is still making through it.
 template <class TService>
-class TPlatformOverride {
+class [[nodiscard]] TPlatformOverride {
  public:
   explicit TPlatformOverride(TService& AService) noexcept : FSaved(Slot().exchange(&AService)) {}
   TPlatformOverride(const TPlatformOverride&) = delete;

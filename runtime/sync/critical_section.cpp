@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <ctime>
 #include <mutex>
 
@@ -15,7 +16,8 @@ namespace zq {
 namespace {
 
 constexpr std::int64_t cSlice = 1'000'000;  // ns; see Wait
-constexpr int cSpins = 2000;                // pauses in all, some 20 to 90 us
+constexpr std::int64_t cLongestSlice = 16 * cSlice;
+constexpr int cSpins = 2000;  // pauses in all, some 20 to 90 us
 constexpr int cLongestPause = 512;
 
 // Initial-exec: one load relative to the thread pointer, where a shared library would otherwise make a call.
@@ -39,8 +41,10 @@ std::int64_t Nanoseconds() noexcept {
   return std::int64_t{Time.tv_sec} * 1'000'000'000 + Time.tv_nsec;
 }
 
-void Futex(std::atomic<std::uint32_t>& AWord, int AOperation, std::uint32_t AValue, const timespec* ATimeout) noexcept {
-  ::syscall(SYS_futex, &AWord, AOperation | FUTEX_PRIVATE_FLAG, AValue, ATimeout, nullptr, 0);
+// False when the time was over.
+bool Futex(std::atomic<std::uint32_t>& AWord, int AOperation, std::uint32_t AValue, const timespec* ATimeout) noexcept {
+  return ::syscall(SYS_futex, &AWord, AOperation | FUTEX_PRIVATE_FLAG, AValue, ATimeout, nullptr, 0) >= 0 ||
+         errno != ETIMEDOUT;
 }
 
 }  // namespace
@@ -79,19 +83,24 @@ bool TCriticalSection::Spin() noexcept {
 }
 
 // Leave reads FSleepers and stores without a full barrier about them, which keeps leaving cheap: a wake-up can be
-// missed when a thread lies down at that very moment. Sleeping in slices bounds what that costs.
+// missed when a thread lies down at that very moment. Sleeping in slices bounds what that costs. The slices grow, and
+// who wakes by itself looks but once: many that wait must not take the processors from the one that they wait for.
 [[gnu::noinline]] bool TCriticalSection::Wait(Cardinal AMilliseconds) noexcept {
   const std::int64_t Deadline = AMilliseconds == cForEver ? 0 : Nanoseconds() + std::int64_t{AMilliseconds} * 1'000'000;
   if (Spin()) return true;
   FSleepers.fetch_add(1);
   bool Taken = false;
-  for (std::int64_t Left = cSlice; !Taken && Left > 0; Taken = Spin()) {
-    if (Deadline != 0) Left = std::min(cSlice, Deadline - Nanoseconds());
+  for (std::int64_t Slice = cSlice, Left = Slice; !Taken && Left > 0;) {
+    Left = Deadline == 0 ? Slice : std::min(Slice, Deadline - Nanoseconds());
     const std::uint32_t Owner = FOwner.load(std::memory_order_relaxed);
-    if (Owner == 0 || Left <= 0) continue;
-    const timespec Timeout{0, static_cast<long>(Left)};
-    Futex(FOwner, FUTEX_WAIT, Owner, &Timeout);
-    FWaking.store(false, std::memory_order_relaxed);
+    bool Woken = true;
+    if (Owner != 0 && Left > 0) {
+      const timespec Timeout{0, static_cast<long>(Left)};
+      Woken = Futex(FOwner, FUTEX_WAIT, Owner, &Timeout);
+      FWaking.store(false, std::memory_order_relaxed);
+      if (!Woken) Slice = std::min(2 * Slice, cLongestSlice);
+    }
+    Taken = Woken ? Spin() : TryEnter();
   }
   FSleepers.fetch_sub(1);
   return Taken;

@@ -61,7 +61,7 @@ class ZQ_API TCriticalSection {
 
 /// Holds ALock, anything with Enter and Leave, for a scope.
 template <class TLock>
-class TLockScope {
+class [[nodiscard]] TLockScope {
  public:
   explicit TLockScope(TLock& ALock) : FLock(ALock) { FLock.Enter(); }
   TLockScope(const TLockScope&) = delete;

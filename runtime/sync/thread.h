@@ -96,8 +96,9 @@ class ZQ_API TThread : public TObject {
   /// What ended Execute; to be read when the thread has finished.
   [[nodiscard]] const ExceptionRef& FatalException() const noexcept { return FFatalException; }
 
-  /// Runs AProcedure on the main thread and waits for that; at once where the caller is the main thread. What it
-  /// raises is raised here, as the same object.
+  /// Runs AProcedure on the main thread, in its next CheckSynchronize or WaitFor, and waits for that, for ever if there
+  /// is none; at once where the caller is the main thread. What it raises is raised here, as the same object. AThread,
+  /// which may be null, is whose RemoveQueuedEvents drops a queued call.
   static void Synchronize(const TThread* AThread, const TThreadProcedure& AProcedure);
   /// The same without waiting; on the main thread at once.
   static void Queue(const TThread* AThread, TThreadProcedure AProcedure);
@@ -131,7 +132,7 @@ class ZQ_API TThread : public TObject {
 /// Atomic steps on plain numbers; each returns the new value, Exchange and CompareExchange the old one.
 struct TInterlocked {
   template <class T>
-  static T Add(T& ATarget, T ABy) noexcept {
+  static T Add(T& ATarget, std::type_identity_t<T> ABy) noexcept {
     const T Former = std::atomic_ref<T>(ATarget).fetch_add(ABy);
     if constexpr (std::floating_point<T>) return Former + ABy;
     else return static_cast<T>(static_cast<UInt64>(Former) + static_cast<UInt64>(ABy));  // wraps as the atomic sum does
@@ -145,11 +146,11 @@ struct TInterlocked {
     return Add(ATarget, static_cast<T>(-1));
   }
   template <class T>
-  static T Exchange(T& ATarget, T AValue) noexcept {
+  static T Exchange(T& ATarget, std::type_identity_t<T> AValue) noexcept {
     return std::atomic_ref<T>(ATarget).exchange(AValue);
   }
   template <class T>
-  static T CompareExchange(T& ATarget, T AValue, T AComparand) noexcept {
+  static T CompareExchange(T& ATarget, std::type_identity_t<T> AValue, std::type_identity_t<T> AComparand) noexcept {
     std::atomic_ref<T>(ATarget).compare_exchange_strong(AComparand, AValue);
     return AComparand;
   }

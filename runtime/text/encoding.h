@@ -56,7 +56,7 @@ ZQ_API int NormalizeString(int AForm, const char16_t* ASource, int AChars, char1
 /// Sets the process's ANSI code page, for all threads, until the end of its scope. Scopes nest.
 class ZQ_API TAnsiCodePageScope {
  public:
-  explicit TAnsiCodePageScope(Word ACodePage) noexcept;
+  [[nodiscard]] explicit TAnsiCodePageScope(Word ACodePage) noexcept;
   TAnsiCodePageScope(const TAnsiCodePageScope&) = delete;
   TAnsiCodePageScope& operator=(const TAnsiCodePageScope&) = delete;
   ~TAnsiCodePageScope();

@@ -25,6 +25,10 @@ namespace zq {
 [[nodiscard]] ZQ_API UnicodeString Format(const UnicodeString& AFormat, std::span<const TVarRec> AArgs);
 [[nodiscard]] ZQ_API UnicodeString Format(
     const UnicodeString& AFormat, std::span<const TVarRec> AArgs, const TFormatSettings& ASettings);
+[[nodiscard]] inline UnicodeString Format(
+    const UnicodeString& AFormat, TVarArgs AArgs, const TFormatSettings& ASettings) {
+  return Format(AFormat, std::span(AArgs.begin(), AArgs.size()), ASettings);
+}
 [[nodiscard]] inline UnicodeString Format(const TResStringRec& AFormat, TVarArgs AArgs) {
   return Format(LoadResString(AFormat), AArgs);
 }
