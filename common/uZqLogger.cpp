@@ -33,6 +33,8 @@ std::atomic<TZqLogBaseClassList*> AppenderClasses = nullptr;
 std::vector<TZqLogBase*>* Appenders = nullptr;  // every appender alive
 constinit std::mutex AppendersLock;
 constinit TCriticalSection EndLock;  // held while an appender or a list ends: linked components must not at one time
+using TWalks = std::vector<std::shared_ptr<const void>>;
+TWalks* Walks = nullptr;  // under EndLock: entries of the ending appender that walks of lists may share still
 
 // Holds a log lock for a scope, for a requester that is a name and an operation.
 class TLogLockScope {
@@ -233,11 +235,12 @@ IntfRef<IZqLogAppender> TZqLogAppenderList::GetAppender(Integer AIndex) const {
   return Item->Appender;
 }
 
-// The entry goes to the appender, which waits for the walks that share it; this thread's own walk is none to wait for.
-void TZqLogAppenderList::LetGoOf(TComponent* AComponent) {
+// The entry goes to the appender that ends, which waits for the walks that share it; this thread's own walk is none to
+// wait for.
+void TZqLogAppenderList::LetGoOf(const TComponent* AComponent) {
   TItems Taken = TakeItems([&](const TEntry& AEntry) { return AEntry.Component == AComponent; });
-  auto* const Ended = dynamic_cast<TZqLogBase*>(AComponent);
-  if (Ended != nullptr && !FLock.IsOwned()) std::move(Taken.begin(), Taken.end(), std::back_inserter(Ended->FWalks));
+  if (EndLock.IsOwned() && Walks != nullptr && !FLock.IsOwned())
+    std::move(Taken.begin(), Taken.end(), std::back_inserter(*Walks));
 }
 
 void TZqLogAppenderList::Notification(TComponent* AComponent, TOperation AOperation) {
@@ -566,14 +569,16 @@ void TZqLogBase::BeforeDestruction() {
 // Freed by hand: the lists that hold it let go now, and nobody that drops a count is the last to end it.
 void TZqLogBase::LeaveLists() {
   SetAutoDestroy(false);
+  TWalks Left;
   {
     const TLockScope Ending(EndLock);
+    TWalks* const Outer = std::exchange(Walks, &Left);
     TellWatchers();
+    Walks = Outer;
   }
   const auto IsOver = [](const auto& AWalk) { return AWalk.use_count() == 1; };
-  for (Cardinal i = 0; i < cLockTries && !std::all_of(FWalks.begin(), FWalks.end(), IsOver); ++i) Sleep(1);
+  for (Cardinal i = 0; i < cLockTries && !std::all_of(Left.begin(), Left.end(), IsOver); ++i) Sleep(1);
   std::atomic_thread_fence(std::memory_order_acquire);
-  FWalks.clear();
 }
 
 std::vector<TZqLogBase*> LiveAppenders() {

@@ -442,7 +442,7 @@ class ZQ_API TZqLogAppenderList : public TComponent {
   template <class TLeaves>
   TItems TakeItems(TLeaves ALeaves);
   TItems TakeAll();
-  void LetGoOf(TComponent* AComponent);
+  void LetGoOf(const TComponent* AComponent);
 
   TZqLogger* FLogger;
   std::atomic<Integer> FCount = 0;      // FList's size
@@ -596,11 +596,9 @@ class ZQ_API TZqLogBase : public Implements<TZqComponent, IZqLogBase> {
   void BeforeDestruction() override;
 
  private:
-  friend class TZqLogAppenderList;
   void LeaveLists();
 
   TZqLogger* FLogger;
-  std::vector<std::shared_ptr<const void>> FWalks;  // entries that walks of lists may hold still
 };
 
 /// Classes by name, in order of registration.
