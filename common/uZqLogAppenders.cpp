@@ -35,11 +35,18 @@ void TZqBaseAppender::AfterConstruction() {
 }
 
 void TZqBaseAppender::BeforeDestruction() {
+  const bool AutoDestroyed = AutoDestroy();
+  LeaveLists();  // first: a message behind the footer would open the file again
   try {
     Close();
   } catch (const Exception&) {  // the last bytes can't be written: the file is closed, and the appender goes
   }
-  Implements::BeforeDestruction();
+  try {
+    Implements::BeforeDestruction();
+  } catch (...) {
+    SetAutoDestroy(AutoDestroyed);
+    throw;
+  }
 }
 
 IntfRef<IZqLogLayout> TZqBaseAppender::Layout() const {

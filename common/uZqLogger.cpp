@@ -556,7 +556,7 @@ TZqLogBase::~TZqLogBase() { ForgetAppender(this); }
 void TZqLogBase::BeforeDestruction() {
   ForgetAppender(this);
   const bool AutoDestroyed = AutoDestroy();
-  if (RefCount() != 0) LeaveLists();
+  LeaveLists();
   try {
     const TLockScope Ending(EndLock);
     Implements::BeforeDestruction();
@@ -566,8 +566,8 @@ void TZqLogBase::BeforeDestruction() {
   }
 }
 
-// Freed by hand: the lists that hold it let go now, and nobody that drops a count is the last to end it.
 void TZqLogBase::LeaveLists() {
+  if (RefCount() == 0) return;
   SetAutoDestroy(false);
   TWalks Left;
   {
@@ -578,7 +578,6 @@ void TZqLogBase::LeaveLists() {
   }
   const auto IsOver = [](const auto& AWalk) { return AWalk.use_count() == 1; };
   for (Cardinal i = 0; i < cLockTries && !std::all_of(Left.begin(), Left.end(), IsOver); ++i) Sleep(1);
-  std::atomic_thread_fence(std::memory_order_acquire);
 }
 
 std::vector<TZqLogBase*> LiveAppenders() {

@@ -592,12 +592,13 @@ class ZQ_API TZqLogBase : public Implements<TZqComponent, IZqLogBase> {
   ~TZqLogBase() override;
   void AfterConstruction() override;
   /// Freed by hand, on any thread, the object first leaves the lists that hold it and waits, for some five seconds at
-  /// most, until no other thread's message is on its way through it. Out of a message of its own it raises Exception.
+  /// most, until no other thread's message is on its way through it. It raises Exception where it is counted still, as
+  /// out of a message of its own.
   void BeforeDestruction() override;
-
- private:
+  // That first step: nothing where nobody counts the object. Its last count doesn't end it any more.
   void LeaveLists();
 
+ private:
   TZqLogger* FLogger;
 };
 
