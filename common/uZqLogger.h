@@ -557,18 +557,18 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   IntfRef<IZqLogConfigurator> SetConfigurator(IntfRef<IZqLogConfigurator> AConfig);
   void ReplaceConfig(const IntfRef<IZqLogConfigurator>& AConfig, std::vector<IntfRef<IZqLogConfigurator>>& AFormer);
 
-  // In this order, so that the children's list goes first at the end and the count on the parent last.
+  // In this order, so that the children's list goes first at the end. What a message reads on its way up lies together.
   UnicodeString FName;
   UnicodeString FFullName;
+  mutable TCriticalSection FConfigLock;  // innermost, for one copy of FConfigurator
+  IntfRef<IZqLogConfigurator> FConfigurator;
+  TZqLogLock FLock;
   std::atomic<Integer> FRefCount = 0;
   std::atomic<TZqLogger*> FParent;  // the same object as FParentLogger; emptied with it when the parent goes first
   IntfRef<IZqLogger> FParentLogger;
   std::atomic<bool> FParentLevel = true;
   std::atomic<TZqLogLevel> FLevel = llDebug;
   std::atomic<bool> FAdditive = true;
-  mutable TCriticalSection FConfigLock;  // innermost, for one copy of FConfigurator
-  IntfRef<IZqLogConfigurator> FConfigurator;
-  TZqLogLock FLock;
   TOwned<TZqLogAppenderList> FAppenders;
   TZqLoggerList FChildLoggers;
 };
