@@ -17,6 +17,7 @@ namespace {
 
 constexpr std::int64_t cSlice = 1'000'000;  // ns; see Wait
 constexpr std::int64_t cLongestSlice = 16 * cSlice;
+constexpr std::uint32_t cFewSleepers = 3;
 constexpr int cSpins = 2000;  // pauses in all, some 20 to 90 us
 constexpr int cLongestPause = 512;
 
@@ -83,8 +84,9 @@ bool TCriticalSection::Spin() noexcept {
 }
 
 // Leave reads FSleepers and stores without a full barrier about them, which keeps leaving cheap: a wake-up can be
-// missed when a thread lies down at that very moment. Sleeping in slices bounds what that costs. The slices grow, and
-// who wakes by itself looks but once: many that wait must not take the processors from the one that they wait for.
+// missed when a thread lies down at that very moment. Sleeping in slices bounds what that costs. Where more
+// than a few sleep, the slices grow, and who wakes by itself looks but once: they must not take the processors from the
+// one that they wait for.
 [[gnu::noinline]] bool TCriticalSection::Wait(Cardinal AMilliseconds) noexcept {
   const std::int64_t Deadline = AMilliseconds == cForEver ? 0 : Nanoseconds() + std::int64_t{AMilliseconds} * 1'000'000;
   if (Spin()) return true;
@@ -96,7 +98,8 @@ bool TCriticalSection::Spin() noexcept {
     bool Woken = true;
     if (Owner != 0 && Left > 0) {
       const timespec Timeout{0, static_cast<long>(Left)};
-      Woken = Futex(FOwner, FUTEX_WAIT, Owner, &Timeout);
+      const bool Few = FSleepers.load(std::memory_order_relaxed) <= cFewSleepers;
+      Woken = Futex(FOwner, FUTEX_WAIT, Owner, &Timeout) || Few;
       FWaking.store(false, std::memory_order_relaxed);
       if (!Woken) Slice = std::min(2 * Slice, cLongestSlice);
     }
