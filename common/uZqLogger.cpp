@@ -572,9 +572,11 @@ void TZqLogBase::LeaveLists() {
   TWalks Left;
   {
     const TLockScope Ending(EndLock);
-    TWalks* const Outer = std::exchange(Walks, &Left);
+    const struct TCollecting {
+      ~TCollecting() { Walks = Outer; }
+      TWalks* Outer;
+    } Collecting{std::exchange(Walks, &Left)};
     TellWatchers();
-    Walks = Outer;
   }
   const auto IsOver = [](const auto& AWalk) { return AWalk.use_count() == 1; };
   for (Cardinal i = 0; i < cLockTries && !std::all_of(Left.begin(), Left.end(), IsOver); ++i) Sleep(1);

@@ -241,8 +241,8 @@ concept TNumber = std::is_arithmetic_v<T> && std::constructible_from<Variant, T>
 
 /// A named logger of the tree. Any thread may call any operation. Once a message is made, logging lets no Exception
 /// out; before that comes out what Format raises for a text and its arguments, and EAssertionFailed for an empty event.
-/// What an appender raises beside Exception is let out. An AObject to name a method or a logger by is there. Operations
-/// on the tree and on the appenders raise Exception when a lock stays busy for some five seconds.
+/// What an appender raises beside Exception is let out. An AObject that names a method or a logger isn't null.
+/// Operations on the tree and on the appenders raise Exception when a lock stays busy for some five seconds.
 struct ZQ_API IZqLogger : Extends<IInterface> {
   static constexpr TGUID IID = "{C9719FC7-DE99-4B3B-A008-A480D810D29E}"_guid;
   /// Empty at the root.
