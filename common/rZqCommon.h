@@ -4,7 +4,7 @@
 
 #include "runtime/core/api.h"
 #include "runtime/core/strings.h"
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 #include "runtime/core/types.h"
 
 namespace zq {

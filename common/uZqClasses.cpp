@@ -1,6 +1,6 @@
 #include "common/uZqClasses.h"
 
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 
 namespace zq {
 

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "runtime/platform/clock.h"
+#include "runtime/text/local_time.h"
 #include "runtime/text/datetime.h"
 
 namespace zq {

@@ -8,9 +8,9 @@
 
 #include "common/uZqLogAppenders.h"
 #include "common/uZqWindows.h"
-#include "runtime/containers/string_list.h"
-#include "runtime/core/typeinfo.h"
-#include "runtime/platform/clock.h"
+#include "runtime/io/string_list.h"
+#include "runtime/values/typeinfo.h"
+#include "runtime/text/local_time.h"
 #include "runtime/platform/version_service.h"
 #include "runtime/sync/thread.h"
 #include "runtime/text/datetime.h"
@@ -645,7 +645,7 @@ UnicodeString SystemName(Word ACode) {
 }
 
 UnicodeString SystemVersion() {
-  const TSystemRelease Release = Platform().Version().Release();
+  const TSystemRelease Release = Service<TVersionService>().Release();
   return Format(u"%d.%d", {Release.Major, Release.Minor}) +
          Format(u"; Build: %x, \"%s\"", {Release.Build, Release.Text});
 }

@@ -11,7 +11,7 @@
 #include "common/uZqTypes.h"
 #include "runtime/component/component.h"
 #include "runtime/core/interfaces.h"
-#include "runtime/core/variants.h"
+#include "runtime/values/variants.h"
 #include "runtime/core/varrec.h"
 #include "runtime/sync/critical_section.h"
 

@@ -8,11 +8,11 @@
 
 #include "runtime/com/registry.h"
 #include "runtime/containers/lists.h"
-#include "runtime/containers/string_list.h"
-#include "runtime/core/typeinfo.h"
+#include "runtime/io/string_list.h"
+#include "runtime/values/typeinfo.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
-#include "runtime/platform/clock.h"
+#include "runtime/text/local_time.h"
 #include "runtime/platform/desktop_service.h"
 #include "runtime/platform/file_service.h"
 #include "runtime/platform/process_facts.h"
@@ -100,7 +100,7 @@ Boolean ZqIsDelphiRunning() {
   constexpr std::pair<const char16_t*, const char16_t*> cWindows[] = {{u"TApplication", u"Delphi"},
       {u"TAlignPalette", nullptr}, {u"TPropertyInspector", nullptr}, {u"TAppBuilder", nullptr}};
   bool Result = false;
-  for (const auto& [Class, Title] : cWindows) Result |= Platform().Desktop().FindWindow(Class, Title);
+  for (const auto& [Class, Title] : cWindows) Result |= Service<TDesktopService>().FindWindow(Class, Title);
   return Result;
 }
 
@@ -376,7 +376,7 @@ Cardinal LittleEndian(const Byte* ABytes, std::size_t ACount) noexcept {
 
 UnicodeString FindAlongPath(const UnicodeString& AFile) {
   if (FileExists(AFile)) return AFile;
-  const UnicodeString Found = Platform().Files().SearchPath(AFile);
+  const UnicodeString Found = Service<TFileService>().SearchPath(AFile);
   return Found.IsEmpty() ? AFile : Found;
 }
 
@@ -400,7 +400,7 @@ UnicodeString ZqGetFileMimeType(const UnicodeString& AFile) {
 
 std::unique_ptr<TResourceStream> ZqFindResource(const UnicodeString& AName, const WideChar* AType) {
   for (const HINST Module : {HInstance(), MainInstance()})
-    if (Platform().Resources().FindResource(Module, AName, AType))
+    if (Service<TResourceService>().FindResource(Module, AName, AType))
       return std::make_unique<TResourceStream>(Module, AName, AType);
   return nullptr;
 }
@@ -411,7 +411,7 @@ std::unique_ptr<TResourceStream> ZqGetResource(const UnicodeString& AName, const
   return Result;
 }
 
-Boolean IsWow64() { return Platform().ProcessFacts().IsWow64Process().value_or(false); }
+Boolean IsWow64() { return Service<TProcessFacts>().IsWow64Process().value_or(false); }
 
 Boolean IsOS64() { return IsCPU64() || IsWow64(); }
 
@@ -429,18 +429,18 @@ Boolean Is64BitFile(const UnicodeString& AFile) {
   return LittleEndian(PEHeader.data(), 4) == cPESignature && LittleEndian(&PEHeader[cMachineAt], 2) != cMachineI386;
 }
 
-UnicodeString ZqGetUserName() { return Platform().Users().GetUserName(); }
+UnicodeString ZqGetUserName() { return Service<TUserService>().GetUserName(); }
 
 UnicodeString ZqGetUserName(UnicodeString& ADomain) {
   UnicodeString Result;
-  Platform().Users().LookupTokenUser(Result, ADomain);
+  Service<TUserService>().LookupTokenUser(Result, ADomain);
   return Result;
 }
 
-UnicodeString ZqGetComputerName() { return Platform().Users().GetComputerName(); }
+UnicodeString ZqGetComputerName() { return Service<TUserService>().GetComputerName(); }
 
 UnicodeString ZqGetComputerDescription() {
-  TUserService& Users = Platform().Users();
+  TUserService& Users = Service<TUserService>();
   Assert(Users.LoadNetApi(), u"The ZqGetComputerDescription is not supported by your version of Windows");
   if (!Users.HasServerGetInfo()) throw Exception(u"Failed to locate API funtion.");
   UnicodeString Result;
@@ -448,7 +448,7 @@ UnicodeString ZqGetComputerDescription() {
   return Result;
 }
 
-Boolean ZqIsDebuggerPresent() { return Platform().ProcessFacts().IsDebuggerPresent().value_or(false); }
+Boolean ZqIsDebuggerPresent() { return Service<TProcessFacts>().IsDebuggerPresent().value_or(false); }
 
 Integer ZqAge(TDateTime ADate) {
   if (ADate <= 0) return 0;

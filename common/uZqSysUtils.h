@@ -8,7 +8,7 @@
 #include "runtime/core/exceptions.h"
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
-#include "runtime/core/variants.h"
+#include "runtime/values/variants.h"
 #include "runtime/core/varrec.h"
 #include "runtime/io/streams.h"
 #include "runtime/text/format.h"

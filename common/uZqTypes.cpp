@@ -7,7 +7,7 @@
 #include <span>
 #include <string>
 
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 #include "runtime/core/utf8.h"
 #include "runtime/io/streams.h"
 #include "runtime/text/datetime.h"

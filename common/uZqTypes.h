@@ -7,10 +7,10 @@
 #include "runtime/core/api.h"
 #include "runtime/core/exceptions.h"
 #include "runtime/core/strings.h"
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 #include "runtime/core/types.h"
-#include "runtime/core/values.h"
-#include "runtime/core/variants.h"
+#include "runtime/values/values.h"
+#include "runtime/values/variants.h"
 #include "runtime/text/encoding.h"
 
 namespace zq {

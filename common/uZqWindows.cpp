@@ -1,5 +1,6 @@
 #include "common/uZqWindows.h"
 
+#include <algorithm>
 #include <filesystem>
 #include <map>
 
@@ -7,7 +8,7 @@
 #include "runtime/core/exceptions.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
-#include "runtime/platform/clock.h"
+#include "runtime/text/local_time.h"
 #include "runtime/platform/environment_service.h"
 #include "runtime/platform/file_service.h"
 #include "runtime/platform/shell_service.h"
@@ -20,10 +21,30 @@ namespace zq {
 // ---------------------------------------------------------------------------------------------------- Environment
 
 UnicodeString ZqGetEnvironmentVar(const UnicodeString& AName) {
-  const auto Value = Platform().Environment().GetEnvironmentVariable(AName);
+  const auto Value = Service<TEnvironmentService>().GetEnvironmentVariable(AName);
   if (!Value || Value->IsEmpty()) throw Exception(u"There is no Environment Variable with the name %s", {AName});
   return *Value;
 }
+
+namespace {
+
+// AText with each "%NAME%" replaced by the variable's value; unknown names stay as they are.
+UnicodeString ExpandEnvironmentStrings(const UnicodeString& AText) {
+  TEnvironmentService& Environment = Service<TEnvironmentService>();
+  UnicodeString Result;
+  std::u16string_view Rest = AText;
+  while (!Rest.empty()) {
+    const std::size_t End = Rest.front() == u'%' ? Rest.find(u'%', 1) : Rest.npos;
+    const auto Value = End == Rest.npos ? std::nullopt : Environment.GetEnvironmentVariable(Rest.substr(1, End - 1));
+    // The "%" behind an unknown name may be the first of the next one.
+    const std::size_t Taken = Value ? End + 1 : std::min(Rest.find(u'%', 1), Rest.size());
+    Result += Value ? Value->View() : Rest.substr(0, Taken);
+    Rest.remove_prefix(Taken);
+  }
+  return Result;
+}
+
+}  // namespace
 
 UnicodeString ZqExpandEnvVarsAndStrings(const UnicodeString& AText) {
   // Values that hold "$(" are expanded in turn: those that refer to each other in a circle must come to an end.
@@ -42,7 +63,7 @@ UnicodeString ZqExpandEnvVarsAndStrings(const UnicodeString& AText) {
       throw Exception(u"The Environment Variable %s refers to itself", {Part});
     Result = StringReplace(Result, Part, Value, All);
   }
-  return Result.Pos(u"%") == 0 ? Result : Platform().Environment().ExpandEnvironmentStrings(Result);
+  return Result.Pos(u"%") == 0 ? Result : ExpandEnvironmentStrings(Result);
 }
 
 UnicodeString ZqExpandFileName(const UnicodeString& AName) {
@@ -93,7 +114,7 @@ bool ZqIsAliasedFilename(const UnicodeString& AName) {
 // ----------------------------------------------------------------------------------------------------- File facts
 
 UnicodeString ZqGetShortFileName(const UnicodeString& AName) {
-  UnicodeString Result = Platform().Files().GetShortPathName(AName);
+  UnicodeString Result = Service<TFileService>().GetShortPathName(AName);
   if (Result.IsEmpty()) throw Exception(u"Failed to determine the short filename!");
   return Result;
 }
@@ -105,7 +126,7 @@ bool ZqFileIsReadOnly(const UnicodeString& AName) {
 }
 
 bool ZqFileIsInUse(const UnicodeString& AName) {
-  return FileExists(AName) && !Platform().Files().OpensExclusively(AName);
+  return FileExists(AName) && !Service<TFileService>().OpensExclusively(AName);
 }
 
 namespace {
@@ -182,7 +203,7 @@ bool RemoveByHand(const UnicodeString& ADir) {
 }  // namespace
 
 bool ZqRenameFolder(const UnicodeString& AOld, const UnicodeString& ANew) {
-  return Platform().Shell().SHFileOperation(FO_RENAME, ShellList(Trim(AOld)), ShellList(Trim(ANew)),
+  return Service<TShellService>().SHFileOperation(FO_RENAME, ShellList(Trim(AOld)), ShellList(Trim(ANew)),
              FOF_NOCONFIRMATION | FOF_NOCONFIRMMKDIR | FOF_NOERRORUI) == 0;
 }
 
@@ -192,11 +213,11 @@ bool ZqRemoveDir(const UnicodeString& ADir, bool AUseRecycleBin) {
   if (Named.IsEmpty()) return false;
   Word Flags = FOF_SILENT | FOF_NOCONFIRMATION | FOF_NOERRORUI;
   if (AUseRecycleBin) Flags |= FOF_ALLOWUNDO;
-  return Platform().Shell().SHFileOperation(FO_DELETE, ShellList(Dir), {}, Flags) == 0 || RemoveByHand(Named);
+  return Service<TShellService>().SHFileOperation(FO_DELETE, ShellList(Dir), {}, Flags) == 0 || RemoveByHand(Named);
 }
 
 UnicodeString ZqGetTempDirectory() {
-  UnicodeString Result = Platform().Files().GetTempPath();
+  UnicodeString Result = Service<TFileService>().GetTempPath();
   if (Result.IsEmpty() || Result.Length() > 260) throw Exception(u"Can't determine name temp directory");
   return Result;
 }
@@ -204,7 +225,7 @@ UnicodeString ZqGetTempDirectory() {
 UnicodeString ZqCreateTempDirectory() {
   const UnicodeString Folder = ZqGetTempDirectory();
   for (Cardinal Number = 1; Number <= 65534; ++Number) {
-    UnicodeString Name = Platform().Files().GetTempFileName(Folder, u"Ast", Number);
+    UnicodeString Name = Service<TFileService>().GetTempFileName(Folder, u"Ast", Number);
     if (!Name.IsEmpty() && CreateDir(Name)) return Name;
   }
   throw Exception(u"Failed to create a temporary directory!");
@@ -214,7 +235,7 @@ UnicodeString ZqCreateTempDirectory() {
 
 void ZqCreateShortcut(const UnicodeString& ATarget, const UnicodeString& ALinkFile, const UnicodeString& ADescription,
     const UnicodeString& AArguments) {
-  const auto Link = Platform().Shell().CreateShellLink();
+  const auto Link = Service<TShellService>().CreateShellLink();
   Link->SetArguments(AArguments);
   Link->SetDescription(ADescription);
   Link->SetPath(ATarget);
@@ -222,7 +243,7 @@ void ZqCreateShortcut(const UnicodeString& ATarget, const UnicodeString& ALinkFi
 }
 
 UnicodeString ZqGetTargetFromShortcut(const UnicodeString& ALinkFile) {
-  const auto Link = Platform().Shell().CreateShellLink();
+  const auto Link = Service<TShellService>().CreateShellLink();
   UnicodeString Result;
   Link->Load(ALinkFile, STGM_SHARE_DENY_NONE);
   Link->GetPath(Result);
@@ -239,8 +260,8 @@ Word VersionFive(const TOSVersionInfo& AInfo) {
   if (AInfo.MinorVersion == 0) return 500;
   if (AInfo.MinorVersion == 1)
     return AInfo.ServicePackMajor > 2 ? 517 : static_cast<Word>(511 + 2 * AInfo.ServicePackMajor);
-  if (!Platform().Version().KernelExports(u"GetLargePageMinimum")) return 521;
-  return Platform().Version().GetSystemMetrics(SM_SERVERR2) != 0 ? 523 : 520;
+  if (!Service<TVersionService>().KernelExports(u"GetLargePageMinimum")) return 521;
+  return Service<TVersionService>().GetSystemMetrics(SM_SERVERR2) != 0 ? 523 : 520;
 }
 
 bool RegistrySaysSixThree() {
@@ -267,14 +288,14 @@ Word VersionByExports() {
   } Probes[] = {{u"OpenThread", 11}, {u"GetThreadPriorityBoost", 16}, {u"IsDebuggerPresent", 7},
       {u"GetDiskFreeSpaceEx", 5}, {u"ConnectNamedPipe", 14}, {u"Beep", 3}};
   for (const auto& Probe : Probes)
-    if (Platform().Version().KernelExports(Probe.Name)) return Probe.Version;
+    if (Service<TVersionService>().KernelExports(Probe.Name)) return Probe.Version;
   throw Exception(u"Failed to determine the version of the OS!");
 }
 
 }  // namespace
 
 Word ZqGetWindowsVersion() {
-  TVersionService& Version = Platform().Version();
+  TVersionService& Version = Service<TVersionService>();
   if (!Version.HasKernel()) throw Exception(u"Failed to load Kernel32.dll!");
   TOSVersionInfo Info;
   const bool Known = Version.KernelExports(u"GetVersionExA") && Version.GetVersionEx(Info);
@@ -282,7 +303,7 @@ Word ZqGetWindowsVersion() {
 }
 
 UnicodeString ZqGetShellFolder(Integer ACsidl) {
-  TShellService& Shell = Platform().Shell();
+  TShellService& Shell = Service<TShellService>();
   UnicodeString Path;
   if (Shell.SHGetSpecialFolderPath(ACsidl, true, Path)) return Path;
   if (!Shell.SHGetMalloc()) return {};

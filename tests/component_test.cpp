@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "runtime/component/bindings.h"
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 
 namespace zq {
 namespace {

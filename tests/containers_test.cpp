@@ -6,7 +6,7 @@
 
 #include "runtime/containers/collection.h"
 #include "runtime/containers/lists.h"
-#include "runtime/containers/string_list.h"
+#include "runtime/io/string_list.h"
 #include "runtime/text/encoding.h"
 #include "tests/support/raised.h"
 #include "tests/support/support.h"

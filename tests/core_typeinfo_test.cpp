@@ -8,8 +8,8 @@
 #include <tuple>
 #include <utility>
 
-#include "runtime/core/typeinfo.h"
-#include "runtime/core/values.h"
+#include "runtime/values/typeinfo.h"
+#include "runtime/values/values.h"
 #include "tests/support/support.h"
 
 namespace zq {

@@ -6,7 +6,7 @@
 #include <tuple>
 #include <utility>
 
-#include "runtime/core/variants.h"
+#include "runtime/values/variants.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/format_settings.h"
 #include "tests/support/support.h"

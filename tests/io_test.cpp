@@ -264,7 +264,7 @@ TEST(Streams, ResourcesLieBesideTheirModule) {
   EXPECT_EQ(Content(Logo) + Content(ById), "PNGseven");
   EXPECT_THROW(Logo.Write("x", 1), EStreamError);
   EXPECT_THROW(TResourceStream(MainInstance(), u"none", RT_RCDATA), EResNotFound);
-  EXPECT_FALSE(Platform().Resources().FindResource(MainInstance(), u"../RCDATA", RT_RCDATA));
+  EXPECT_FALSE(Service<TResourceService>().FindResource(MainInstance(), u"../RCDATA", RT_RCDATA));
   EXPECT_EQ(ZqGetResource(u"logo.png", RT_RCDATA)->Size(), 3) << "of the program, as the library has none";
   const UnicodeString Raised = RaisedBy([] { (void)ZqGetResource(u"LOGO", RT_RCDATA); });
   EXPECT_TRUE(Raised.Pos(u": There is no resource with the name: LOGO") > 1 && !ZqFindResource(u"LOGO", RT_RCDATA));

@@ -4,7 +4,8 @@
 #include <thread>
 
 #include "runtime/com/registry.h"
-#include "runtime/platform/clock.h"
+#include "runtime/platform/clock_service.h"
+#include "runtime/text/local_time.h"
 #include "runtime/text/datetime.h"
 #include "tests/support/environment_scope.h"
 #include "tests/support/scripted_registry.h"
@@ -24,17 +25,17 @@ struct TScriptedClock : TClockService {
 UnicodeString Shown(TDateTime AValue) { return FormatDateTime(u"yyyy-mm-dd hh:mm:ss:zzz", AValue); }
 
 TEST(Platform, OverridesNestAndReachEveryCaller) {
-  TClockService& Real = Platform().Clock();
+  TClockService& Real = Service<TClockService>();
   TScriptedClock First(1, 0), Second(2, 0);
   {
     const TPlatformOverride<TClockService> Outer(First);
     {
       const TPlatformOverride<TClockService> Inner(Second);
-      std::thread([&] { EXPECT_EQ(&Platform().Clock(), &Second); }).join();
+      std::thread([&] { EXPECT_EQ(&Service<TClockService>(), &Second); }).join();
     }
-    EXPECT_EQ(&Platform().Clock(), &First);
+    EXPECT_EQ(&Service<TClockService>(), &First);
   }
-  EXPECT_EQ(&Platform().Clock(), &Real);
+  EXPECT_EQ(&Service<TClockService>(), &Real);
 }
 
 // -------------------------------------------------------------------------------------------------------- Clock

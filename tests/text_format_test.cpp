@@ -7,7 +7,7 @@
 #include <optional>
 
 #include "runtime/core/exceptions.h"
-#include "runtime/core/variants.h"
+#include "runtime/values/variants.h"
 #include "runtime/text/casing.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/format.h"

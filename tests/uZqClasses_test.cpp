@@ -7,7 +7,7 @@
 #include <utility>
 #include <vector>
 
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 #include "tests/support/raised.h"
 #include "tests/support/support.h"
 

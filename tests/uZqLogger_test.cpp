@@ -6,7 +6,7 @@
 #include <thread>
 
 #include "common/rZqCommon.h"
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/format.h"
 #include "runtime/text/numbers.h"

@@ -3,8 +3,9 @@
 #include <gtest/gtest.h>
 
 #include "runtime/containers/lists.h"
-#include "runtime/containers/string_list.h"
-#include "runtime/platform/clock.h"
+#include "runtime/io/string_list.h"
+#include "runtime/platform/clock_service.h"
+#include "runtime/text/local_time.h"
 #include "runtime/platform/desktop_service.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/encoding.h"

@@ -12,7 +12,7 @@
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
 #include "runtime/io/streams.h"
-#include "runtime/platform/clock.h"
+#include "runtime/text/local_time.h"
 #include "runtime/platform/shell_service.h"
 #include "runtime/platform/version_service.h"
 #include "runtime/text/datetime.h"

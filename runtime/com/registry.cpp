@@ -12,13 +12,13 @@ void TRegistry::SetRootKey(HKEY AValue) {
 }
 
 HKEY TRegistry::Find(const UnicodeString& AKey, Cardinal AAccess, bool ACreate) const {
-  TRegistryService& Service = Platform().Registry();
+  TRegistryService& System = Service<TRegistryService>();
   const bool FromRoot = AKey.View().starts_with(u'\\');
   const HKEY Base = FromRoot || FKey == 0 ? FRootKey : FKey;
   const UnicodeString Path = AKey.View().substr(FromRoot ? 1 : 0);
   HKEY Result = 0;
-  if (Service.RegOpenKeyEx(Base, Path, AAccess, Result) == ERROR_SUCCESS) return Result;
-  return ACreate && Service.RegCreateKeyEx(Base, Path, AAccess, Result) == ERROR_SUCCESS ? Result : 0;
+  if (System.RegOpenKeyEx(Base, Path, AAccess, Result) == ERROR_SUCCESS) return Result;
+  return ACreate && System.RegCreateKeyEx(Base, Path, AAccess, Result) == ERROR_SUCCESS ? Result : 0;
 }
 
 bool TRegistry::Take(HKEY AKey) noexcept {
@@ -34,12 +34,12 @@ bool TRegistry::OpenKeyReadOnly(const UnicodeString& AKey) { return Take(Find(AK
 
 bool TRegistry::KeyExists(const UnicodeString& AKey) const {
   const HKEY Key = Find(AKey, KEY_READ, false);
-  if (Key != 0) Platform().Registry().RegCloseKey(Key);
+  if (Key != 0) Service<TRegistryService>().RegCloseKey(Key);
   return Key != 0;
 }
 
 bool TRegistry::Query(const UnicodeString& AName, Cardinal& AType, TBytes& AData) const {
-  return FKey != 0 && Platform().Registry().RegQueryValueEx(FKey, AName, AType, AData) == ERROR_SUCCESS;
+  return FKey != 0 && Service<TRegistryService>().RegQueryValueEx(FKey, AName, AType, AData) == ERROR_SUCCESS;
 }
 
 bool TRegistry::ValueExists(const UnicodeString& AName) const {
@@ -81,12 +81,12 @@ void TRegistry::WriteInteger(const UnicodeString& AName, Integer AValue) {
 }
 
 void TRegistry::Write(const UnicodeString& AName, Cardinal AType, const TBytes& AData) {
-  if (FKey == 0 || Platform().Registry().RegSetValueEx(FKey, AName, AType, AData) != ERROR_SUCCESS)
+  if (FKey == 0 || Service<TRegistryService>().RegSetValueEx(FKey, AName, AType, AData) != ERROR_SUCCESS)
     throw ERegistryException(u"Failed to set data for '" + AName + u"'");
 }
 
 void TRegistry::CloseKey() noexcept {
-  if (FKey != 0) Platform().Registry().RegCloseKey(std::exchange(FKey, 0));
+  if (FKey != 0) Service<TRegistryService>().RegCloseKey(std::exchange(FKey, 0));
 }
 
 }  // namespace zq

@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <iterator>
 
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 
 namespace zq {
 

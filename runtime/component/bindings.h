@@ -9,7 +9,7 @@
 #include "runtime/component/component.h"
 #include "runtime/core/delegates.h"
 #include "runtime/core/interfaces.h"
-#include "runtime/core/variants.h"
+#include "runtime/values/variants.h"
 
 namespace zq {
 

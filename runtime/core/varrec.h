@@ -29,7 +29,13 @@ struct TVarRec {
     vtAnsiText,
     vtObject,
     vtClass,
-    vtVariant
+    vtOther
+  };
+
+  /// A value of a type that this floor doesn't know, with the way to its text, which may raise.
+  struct TOther {
+    const void* Value;
+    UnicodeString (*ToText)(const void* AValue);
   };
 
   template <std::signed_integral T>
@@ -64,7 +70,7 @@ struct TVarRec {
   TVarRec(const std::string& AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue) {}
   TVarRec(const char* AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue == nullptr ? "" : AValue) {}
   TVarRec(const ShortString& AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue.View()) {}
-  TVarRec(const Variant& AValue) noexcept : Kind(vtVariant), VVariant(&AValue) {}
+  ZQ_API TVarRec(const Variant& AValue) noexcept;
   TVarRec(const TObject* AValue) noexcept : Kind(vtObject), VObject(AValue) {}
   TVarRec(TClass AValue) noexcept : Kind(vtClass), VClass(AValue) {}
   TVarRec(const void* AValue) noexcept : Kind(vtPointer), VPointer(AValue) {}
@@ -84,7 +90,7 @@ struct TVarRec {
     std::string_view VAnsiText;
     const TObject* VObject;
     TClass VClass;
-    const Variant* VVariant;
+    TOther VOther;
   };
 };
 

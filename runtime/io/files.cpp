@@ -16,7 +16,7 @@
 #include <vector>
 
 #include "runtime/io/paths.h"
-#include "runtime/platform/clock.h"
+#include "runtime/text/local_time.h"
 
 namespace zq {
 

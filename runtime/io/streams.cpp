@@ -248,7 +248,7 @@ void TStringStream::WriteString(const UnicodeString& AText) {
 }
 
 TResourceStream::TResourceStream(HINST AModule, const UnicodeString& AName, const WideChar* AType) {
-  std::optional<TBytes> Found = Platform().Resources().LoadResource(AModule, AName, AType);
+  std::optional<TBytes> Found = Service<TResourceService>().LoadResource(AModule, AName, AType);
   if (!Found) throw EResNotFound(u"Resource " + AName + u" not found");
   FBytes = std::move(*Found);
   SetPointer(FBytes.data(), static_cast<Int64>(FBytes.size()));

@@ -2,13 +2,15 @@
 
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
-#include "runtime/platform/platform.h"
+#include "runtime/platform/service.h"
 
 namespace zq {
 
 /// File facts beyond what runtime/io has. Any thread.
 class ZQ_API TFileService {
  public:
+  static TServiceSlot<TFileService> Slot;
+
   /// The short form of an existing file's path; empty on failure. Linux knows none: the absolute path itself.
   [[nodiscard]] virtual UnicodeString GetShortPathName(const UnicodeString& AName) = 0;
   /// Folder for temporary files, with a separator at the end; empty on failure.

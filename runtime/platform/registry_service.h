@@ -2,7 +2,7 @@
 
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
-#include "runtime/platform/platform.h"
+#include "runtime/platform/service.h"
 
 namespace zq {
 
@@ -37,6 +37,8 @@ inline constexpr Integer ERROR_ACCESS_DENIED = 5;
 /// tables. Any other key is not found, and none can be made or written.
 class ZQ_API TRegistryService {
  public:
+  static TServiceSlot<TRegistryService> Slot;
+
   [[nodiscard]] virtual Integer RegOpenKeyEx(
       HKEY AKey, const UnicodeString& ASubKey, Cardinal AAccess, HKEY& AResult) = 0;
   /// Opens a key that exists.

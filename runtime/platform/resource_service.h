@@ -4,7 +4,7 @@
 
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
-#include "runtime/platform/platform.h"
+#include "runtime/platform/service.h"
 
 namespace zq {
 
@@ -23,6 +23,8 @@ inline constexpr const WideChar* RT_MANIFEST = u"#24";
 /// number is its digits.
 class ZQ_API TResourceService {
  public:
+  static TServiceSlot<TResourceService> Slot;
+
   [[nodiscard]] virtual bool FindResource(HINST AModule, const UnicodeString& AName, const UnicodeString& AType) = 0;
   /// The content; none where it isn't found or can't be read.
   [[nodiscard]] virtual std::optional<TBytes> LoadResource(

@@ -4,7 +4,7 @@
 
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
-#include "runtime/platform/platform.h"
+#include "runtime/platform/service.h"
 
 namespace zq {
 
@@ -40,6 +40,8 @@ using TItemList = void*;
 /// Shell folders, operations on whole folders, shortcuts.
 class ZQ_API TShellService {
  public:
+  static TServiceSlot<TShellService> Slot;
+
   /// Path of the shell folder with that number; with ACreate it is made if it isn't there. On Linux the XDG folders: a
   /// program's files for all users (46) lie in the user's data folder, which is always writable.
   [[nodiscard]] virtual bool SHGetSpecialFolderPath(Integer ACsidl, bool ACreate, UnicodeString& APath) = 0;

@@ -4,13 +4,15 @@
 
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
-#include "runtime/platform/platform.h"
+#include "runtime/platform/service.h"
 
 namespace zq {
 
 /// Who runs this process, and where. Texts are empty where the system refuses.
 class ZQ_API TUserService {
  public:
+  static TServiceSlot<TUserService> Slot;
+
   [[nodiscard]] virtual UnicodeString GetComputerName() = 0;
   [[nodiscard]] virtual UnicodeString GetUserName() = 0;
   /// Name and domain of the account in the process's token. Linux: the NIS domain, else the computer's name.

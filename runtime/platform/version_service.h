@@ -2,7 +2,7 @@
 
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
-#include "runtime/platform/platform.h"
+#include "runtime/platform/service.h"
 
 namespace zq {
 
@@ -27,6 +27,8 @@ inline constexpr Integer SM_SERVERR2 = 89;
 /// a workstation of major version 10.
 class ZQ_API TVersionService {
  public:
+  static TServiceSlot<TVersionService> Slot;
+
   /// The kernel library is loaded.
   [[nodiscard]] virtual bool HasKernel() = 0;
   /// It exports AName.

@@ -4,7 +4,7 @@
 #include <chrono>
 #include <optional>
 
-#include "runtime/platform/clock.h"
+#include "runtime/text/local_time.h"
 #include "runtime/text/casing.h"
 
 namespace zq {

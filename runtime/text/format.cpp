@@ -5,7 +5,6 @@
 #include <optional>
 
 #include "runtime/core/exceptions.h"
-#include "runtime/core/variants.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/numbers.h"
 
@@ -25,7 +24,7 @@ std::optional<UnicodeString> TextOf(const TVarRec& AValue) {
     case TVarRec::vtAnsiText: return BytesToText(AValue.VAnsiText, AValue.CodePage);
     case TVarRec::vtWideChar: return UnicodeString(AValue.VWideChar);
     case TVarRec::vtAnsiChar: return BytesToText({&AValue.VAnsiChar, 1}, 0);
-    case TVarRec::vtVariant: return VarToUStr(*AValue.VVariant);
+    case TVarRec::vtOther: return AValue.VOther.ToText(AValue.VOther.Value);
     case TVarRec::vtClass: return AValue.VClass.ClassName();
     case TVarRec::vtObject: return AValue.VObject == nullptr ? UnicodeString() : AValue.VObject->ToString();
     default: return std::nullopt;

@@ -8,7 +8,7 @@
 #include "common/uZqLogAppenders.h"
 #include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
-#include "runtime/platform/clock.h"
+#include "runtime/platform/clock_service.h"
 #include "tests/support/support.h"
 
 namespace zq {

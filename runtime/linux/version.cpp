@@ -28,10 +28,9 @@ class TLinuxVersion final : public TVersionService {
 };
 
 constinit TLinuxVersion LinuxVersion;
-constinit std::atomic<TVersionService*> Slot = &LinuxVersion;
 
 }  // namespace
 
-std::atomic<TVersionService*>& ServiceSlot(const TVersionService*) { return Slot; }
+constinit TServiceSlot<TVersionService> TVersionService::Slot(LinuxVersion);
 
 }  // namespace zq

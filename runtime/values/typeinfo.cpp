@@ -1,4 +1,4 @@
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 
 #include <algorithm>
 #include <map>
@@ -7,7 +7,7 @@
 #include <typeindex>
 #include <unordered_map>
 
-#include "runtime/core/values.h"
+#include "runtime/values/values.h"
 #include "runtime/text/numbers.h"
 
 namespace zq {

@@ -1,10 +1,9 @@
-#include "runtime/platform/clock.h"
+#include "runtime/text/local_time.h"
 
 #include <algorithm>
 #include <cmath>
-#include <ctime>
-#include <limits>
-#include <mutex>
+
+#include "runtime/platform/clock_service.h"
 
 namespace zq {
 
@@ -16,63 +15,12 @@ constexpr Int64 cUnixEpoch = 25569;  // as a TDateTime
 
 constexpr Int64 FloorDiv(Int64 AValue, Int64 ABy) noexcept { return AValue / ABy - (AValue % ABy < 0 ? 1 : 0); }
 
-// Rises when the zone may have changed.
-constinit std::atomic<unsigned> ZoneGeneration{0};
-constinit std::mutex ZoneLock;  // localtime_r reads what tzset writes
-
-Integer SystemOffset(Int64 AUtcSeconds) noexcept {
-  const auto Moment = static_cast<std::time_t>(AUtcSeconds);
-  std::tm Local{};
-  return localtime_r(&Moment, &Local) == nullptr ? 0 : static_cast<Integer>(Local.tm_gmtoff);
-}
-
-// Zones change their offset at most once in a quarter of an hour, mostly at its start. So a thread remembers the offset
-// of one that begins and ends alike, and asks the system only on leaving it.
-class TLinuxClock final : public TClockService {
- public:
-  Int64 UtcMicroseconds() override {
-    timespec Time{};
-    clock_gettime(CLOCK_REALTIME, &Time);
-    return Time.tv_sec * 1000000LL + Time.tv_nsec / 1000;
-  }
-  Integer UtcOffsetSeconds(Int64 AUtcSeconds) override {
-    // Initial-exec: no call where a shared library would otherwise make one.
-    __attribute__((tls_model("initial-exec"))) thread_local constinit TQuarter Known;
-    const Int64 Quarter = FloorDiv(AUtcSeconds, cQuarter);
-    const unsigned Generation = ZoneGeneration.load(std::memory_order_relaxed);
-    if (Known.Number == Quarter && Known.Generation == Generation) return Known.Offset;
-    const std::lock_guard Guard(ZoneLock);
-    tzset();
-    const Integer First = SystemOffset(Quarter * cQuarter);
-    if (First != SystemOffset(Quarter * cQuarter + cQuarter - 1)) return SystemOffset(AUtcSeconds);
-    Known = {Quarter, Generation, First};
-    return First;
-  }
-
- private:
-  static constexpr Int64 cQuarter = 900;
-  struct TQuarter {
-    Int64 Number = std::numeric_limits<Int64>::min();
-    unsigned Generation = 0;
-    Integer Offset = 0;
-  };
-};
-
-constinit TLinuxClock LinuxClock;
-constinit std::atomic<TClockService*> Slot = &LinuxClock;
-
 }  // namespace
 
-std::atomic<TClockService*>& ServiceSlot(const TClockService*) { return Slot; }
-
-// The call to the system's own clock, whose class is final, is direct.
-ZQ_HOT Int64 UtcMilliseconds() {
-  TClockService* const Clock = Slot.load(std::memory_order_acquire);
-  return FloorDiv(Clock == &LinuxClock ? LinuxClock.UtcMicroseconds() : Clock->UtcMicroseconds(), 1000);
-}
+ZQ_HOT Int64 UtcMilliseconds() { return FloorDiv(Service<TClockService>().UtcMicroseconds(), 1000); }
 
 Int64 LocalMilliseconds(Int64 AUtc) {
-  return AUtc + Int64{1000} * Platform().Clock().UtcOffsetSeconds(FloorDiv(AUtc, 1000));
+  return AUtc + Int64{1000} * Service<TClockService>().UtcOffsetSeconds(FloorDiv(AUtc, 1000));
 }
 
 TDateTime Now() { return UnixMillisecondsToDateTime(LocalMilliseconds(UtcMilliseconds())); }
@@ -106,10 +54,10 @@ const TTimeZone& TTimeZone::Local() noexcept {
   return Zone;
 }
 
-void TTimeZone::Refresh() noexcept { ZoneGeneration.fetch_add(1, std::memory_order_relaxed); }
+void TTimeZone::Refresh() noexcept { Service<TClockService>().ForgetZone(); }
 
 Integer TTimeZone::UtcOffset(TDateTime ALocal, bool AForceDaylight) const {
-  TClockService& Clock = Platform().Clock();
+  TClockService& Clock = Service<TClockService>();
   const Int64 Local = FloorDiv(DateTimeToUnixMilliseconds(ALocal), 1000);
   // No zone is a day away from UTC: these two lie before and behind whatever change the clock makes about ALocal.
   const Integer Before = Clock.UtcOffsetSeconds(Local - cDay);

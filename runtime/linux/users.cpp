@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "runtime/platform/system_files.h"
+#include "runtime/linux/system_files.h"
 
 namespace zq {
 
@@ -48,10 +48,9 @@ class TLinuxUsers final : public TUserService {
 };
 
 constinit TLinuxUsers LinuxUsers;
-constinit std::atomic<TUserService*> Slot = &LinuxUsers;
 
 }  // namespace
 
-std::atomic<TUserService*>& ServiceSlot(const TUserService*) { return Slot; }
+constinit TServiceSlot<TUserService> TUserService::Slot(LinuxUsers);
 
 }  // namespace zq

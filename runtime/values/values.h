@@ -5,8 +5,8 @@
 #include <new>
 
 #include "runtime/core/exceptions.h"
-#include "runtime/core/typeinfo.h"
-#include "runtime/core/variants.h"
+#include "runtime/values/typeinfo.h"
+#include "runtime/values/variants.h"
 
 namespace zq {
 

@@ -18,7 +18,7 @@
 #include "runtime/core/objects.h"
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
-#include "runtime/core/variants.h"
+#include "runtime/values/variants.h"
 
 namespace zq {
 

@@ -1,4 +1,4 @@
-#include "runtime/containers/string_list.h"
+#include "runtime/io/string_list.h"
 
 #include <algorithm>
 #include <compare>

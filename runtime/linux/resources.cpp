@@ -69,12 +69,11 @@ class TLinuxResources final : public TResourceService {
 };
 
 constinit TLinuxResources LinuxResources;
-constinit std::atomic<TResourceService*> Slot = &LinuxResources;
 
 }  // namespace
 
-HINST HInstance() noexcept { return ModuleAt(reinterpret_cast<const void*>(&HInstance)).dli_fbase; }
+constinit TServiceSlot<TResourceService> TResourceService::Slot(LinuxResources);
 
-std::atomic<TResourceService*>& ServiceSlot(const TResourceService*) { return Slot; }
+HINST HInstance() noexcept { return ModuleAt(reinterpret_cast<const void*>(&HInstance)).dli_fbase; }
 
 }  // namespace zq

@@ -16,8 +16,8 @@
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
 #include "runtime/io/text_file.h"
-#include "runtime/platform/clock.h"
-#include "runtime/platform/system_files.h"
+#include "runtime/text/local_time.h"
+#include "runtime/linux/system_files.h"
 #include "runtime/text/datetime.h"
 
 namespace zq {
@@ -345,10 +345,9 @@ class TLinuxShell final : public TShellService {
 };
 
 constinit TLinuxShell LinuxShell;
-constinit std::atomic<TShellService*> Slot = &LinuxShell;
 
 }  // namespace
 
-std::atomic<TShellService*>& ServiceSlot(const TShellService*) { return Slot; }
+constinit TServiceSlot<TShellService> TShellService::Slot(LinuxShell);
 
 }  // namespace zq

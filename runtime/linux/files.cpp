@@ -12,7 +12,7 @@
 
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
-#include "runtime/platform/system_files.h"
+#include "runtime/linux/system_files.h"
 #include "runtime/text/numbers.h"
 
 namespace zq {
@@ -67,10 +67,9 @@ class TLinuxFiles final : public TFileService {
 };
 
 constinit TLinuxFiles LinuxFiles;
-constinit std::atomic<TFileService*> Slot = &LinuxFiles;
 
 }  // namespace
 
-std::atomic<TFileService*>& ServiceSlot(const TFileService*) { return Slot; }
+constinit TServiceSlot<TFileService> TFileService::Slot(LinuxFiles);
 
 }  // namespace zq

@@ -1,4 +1,4 @@
-#include "runtime/platform/system_files.h"
+#include "runtime/linux/system_files.h"
 
 #include <pwd.h>
 #include <unistd.h>

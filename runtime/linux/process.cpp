@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "runtime/platform/system_files.h"
+#include "runtime/linux/system_files.h"
 
 namespace zq {
 
@@ -29,10 +29,9 @@ class TLinuxProcess final : public TProcessFacts {
 };
 
 constinit TLinuxProcess LinuxProcess;
-constinit std::atomic<TProcessFacts*> Slot = &LinuxProcess;
 
 }  // namespace
 
-std::atomic<TProcessFacts*>& ServiceSlot(const TProcessFacts*) { return Slot; }
+constinit TServiceSlot<TProcessFacts> TProcessFacts::Slot(LinuxProcess);
 
 }  // namespace zq

@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "runtime/platform/system_files.h"
+#include "runtime/linux/system_files.h"
 
 namespace zq {
 
@@ -98,10 +98,9 @@ class TLinuxRegistry final : public TRegistryService {
 };
 
 constinit TLinuxRegistry LinuxRegistry;
-constinit std::atomic<TRegistryService*> Slot = &LinuxRegistry;
 
 }  // namespace
 
-std::atomic<TRegistryService*>& ServiceSlot(const TRegistryService*) { return Slot; }
+constinit TServiceSlot<TRegistryService> TRegistryService::Slot(LinuxRegistry);
 
 }  // namespace zq

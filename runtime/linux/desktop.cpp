@@ -10,10 +10,9 @@ class TLinuxDesktop final : public TDesktopService {
 };
 
 constinit TLinuxDesktop LinuxDesktop;
-constinit std::atomic<TDesktopService*> Slot = &LinuxDesktop;
 
 }  // namespace
 
-std::atomic<TDesktopService*>& ServiceSlot(const TDesktopService*) { return Slot; }
+constinit TServiceSlot<TDesktopService> TDesktopService::Slot(LinuxDesktop);
 
 }  // namespace zq

@@ -2,23 +2,11 @@
 
 #include "runtime/core/api.h"
 #include "runtime/core/types.h"
-#include "runtime/platform/platform.h"
 
+/// The time of day and the rules of the time zone, over the current clock service. Any thread.
 namespace zq {
 
-/// The system's clock and time zone. Called from any thread, the clock on every log line.
-class ZQ_API TClockService {
- public:
-  /// Since 1970-01-01 00:00 UTC.
-  virtual Int64 UtcMicroseconds() = 0;
-  /// What the local clock showed more than UTC at that moment, in seconds; AUtcSeconds since 1970-01-01.
-  virtual Integer UtcOffsetSeconds(Int64 AUtcSeconds) = 0;
-
- protected:
-  ~TClockService() = default;
-};
-
-/// The current service's time of day, local, in whole milliseconds: what a log line shows never lies in the future.
+/// The local time of day in whole milliseconds: what a log line shows never lies in the future.
 [[nodiscard]] ZQ_API TDateTime Now();
 /// The same moment for who needs no TDateTime: milliseconds since 1970-01-01 00:00 UTC.
 [[nodiscard]] ZQ_API Int64 UtcMilliseconds();

@@ -1,10 +1,10 @@
-#include "runtime/core/variants.h"
+#include "runtime/values/variants.h"
 
 #include <cmath>
 #include <limits>
 #include <optional>
 
-#include "runtime/core/typeinfo.h"
+#include "runtime/values/typeinfo.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/format_settings.h"
@@ -198,6 +198,11 @@ std::partial_ordering operator<=>(const Variant& A, const Variant& B) {
     return static_cast<double>(*NumberA) <=> static_cast<double>(*NumberB);
   return *NumberA <=> *NumberB;
 }
+
+TVarRec::TVarRec(const Variant& AValue) noexcept
+    : Kind(vtOther), VOther{&AValue, [](const void* AVariant) {
+                              return VarToUStr(*static_cast<const Variant*>(AVariant));
+                            }} {}
 
 Variant Null() noexcept { return TVarAccess::Make(varNull, TVarAccess::TData{.Int = 0}); }
 

@@ -1,4 +1,4 @@
-#include "runtime/core/values.h"
+#include "runtime/values/values.h"
 
 #include <bit>
 #include <cstring>
