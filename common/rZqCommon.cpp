@@ -1,5 +1,7 @@
 #include "common/rZqCommon.h"
 
+#include <ranges>
+
 #include "common/uZqClasses.h"
 #include "common/uZqLogAppenders.h"
 #include "common/uZqLogLayouts.h"
@@ -13,16 +15,13 @@ namespace {
 
 constexpr TPackageUnit cUnits[] = {
     {u"uZqSysUtils", uZqSysUtils::Start, uZqSysUtils::Stop},
-    {u"uZqTypes", uZqTypes::Start, nullptr},
-    {u"uZqClasses", uZqClasses::Start, nullptr},
+    {u"uZqTypes", uZqTypes::Start, uZqTypes::Stop},
+    {u"uZqClasses", uZqClasses::Start, uZqClasses::Stop},
     {u"uZqWindows", nullptr, nullptr},
-    {u"uZqLogLayouts", uZqLogLayouts::Start, nullptr},
+    {u"uZqLogLayouts", uZqLogLayouts::Start, uZqLogLayouts::Stop},
     {u"uZqLogger", uZqLogger::Start, uZqLogger::Stop},
-    {u"uZqLogAppenders", uZqLogAppenders::Start, nullptr},
+    {u"uZqLogAppenders", uZqLogAppenders::Start, uZqLogAppenders::Stop},
 };
-
-// Of each unit: 0 before it has started, -1 with one start, -2 with two.
-Integer Counters[std::size(cUnits)] = {};
 
 [[gnu::constructor]] void Load() { Initialize(); }
 [[gnu::destructor]] void Unload() { Finalize(); }
@@ -30,13 +29,13 @@ Integer Counters[std::size(cUnits)] = {};
 }  // namespace
 
 void Initialize() {
-  for (std::size_t i = 0; i < std::size(cUnits); ++i)
-    if (Counters[i]-- == 0 && cUnits[i].Start != nullptr) cUnits[i].Start();
+  for (const TPackageUnit& Unit : cUnits)
+    if (Unit.Start != nullptr) Unit.Start();
 }
 
 void Finalize() {
-  for (std::size_t i = std::size(cUnits); i-- > 0;)
-    if (++Counters[i] == 0 && cUnits[i].Stop != nullptr) cUnits[i].Stop();
+  for (const TPackageUnit& Unit : std::views::reverse(cUnits))
+    if (Unit.Stop != nullptr) Unit.Stop();
 }
 
 const TPackageInfo& GetPackageInfoTable() {

@@ -4,12 +4,13 @@
 
 #include "runtime/core/api.h"
 #include "runtime/core/strings.h"
-#include "runtime/values/typeinfo.h"
 #include "runtime/core/types.h"
+#include "runtime/values/typeinfo.h"
 
 namespace zq {
 
-/// One module of the library. An operation is null where the module has no work.
+/// One module of the library. Both operations count their calls: a module works at the first start and at the last
+/// stop, also where it is called by itself. They are null where the module has no work.
 struct TPackageUnit {
   const char16_t* Name;
   void (*Start)();

@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "common/uZqWindows.h"
+#include "runtime/core/start_count.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
 #include "runtime/text/numbers.h"
@@ -13,17 +14,12 @@ namespace zq {
 
 namespace {
 
+constinit TStartCount Starts;
 constexpr Word cVista = 601;
 constexpr Integer cCommonDocuments = 46;
 constexpr std::size_t cKeptLine = 1 << 16;  // bytes
 
 bool IsBlank(const TFileName& AName) { return Trim(AName).IsEmpty(); }
-
-TZqSimpleLayout* ExactlySimple(const IntfRef<IZqLogLayout>& ALayout) {
-  TComponent* const Component = ALayout ? ALayout->Component() : nullptr;
-  const bool Simple = Component != nullptr && Component->ClassType() == ClassOf<TZqSimpleLayout>();
-  return Simple ? static_cast<TZqSimpleLayout*>(Component) : nullptr;
-}
 
 }  // namespace
 
@@ -35,18 +31,12 @@ void TZqBaseAppender::AfterConstruction() {
 }
 
 void TZqBaseAppender::BeforeDestruction() {
-  const bool AutoDestroyed = AutoDestroy();
   LeaveLists();  // first: a message behind the footer would open the file again
   try {
     Close();
   } catch (const Exception&) {  // the last bytes can't be written: the file is closed, and the appender goes
   }
-  try {
-    Implements::BeforeDestruction();
-  } catch (...) {
-    SetAutoDestroy(AutoDestroyed);
-    throw;
-  }
+  Implements::BeforeDestruction();
 }
 
 IntfRef<IZqLogLayout> TZqBaseAppender::Layout() const {
@@ -66,8 +56,10 @@ void TZqBaseAppender::Write(
 void TZqBaseAppender::SetConfig(const IntfRef<IZqLogConfigurator>&) {}
 
 void TZqBaseAppender::SetLayout(const IntfRef<IZqLogLayout>& ALayout) {
-  FSimpleLayout = ExactlySimple(ALayout);  // first: it asks the layout, which may raise
+  auto Bytes = ALayout.Supports<IZqLogByteLayout>();  // first: it asks the layout, which may raise
+  if (FWriting != 0) FFormer.insert(FFormer.end(), {FLayout, FByteLayout});
   FLayout = ALayout;
+  FByteLayout = std::move(Bytes);
   if (const auto Told = ALayout.Supports<_IZqLogLayout>()) Told->Initialize(this);
 }
 
@@ -196,15 +188,11 @@ ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeSt
   if (!PrepareWrite()) return;
   TZqBaseAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
   if (!FLayout || !FFileStream) return;
-  if (FSimpleLayout == nullptr) {
-    const auto Layout = FLayout;
-    const UnicodeString Line = Layout->FormatLine(ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
-    if (!Line.IsEmpty() && FFileStream) FFileStream->WriteLn(Line);
-    return;
-  }
+  const TWriting Writing(*this);
   utf8::TBuffer Line = std::move(FSpareLine);  // a message from within the layout comes back here and finds none
   Line.Clear();
-  FSimpleLayout->AppendLine(Line, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+  if (FByteLayout) FByteLayout->AppendLine(Line, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+  else Line.Append(FLayout->FormatLine(ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent));
   if (!Line.IsEmpty() && FFileStream) {
     Line.AppendBytes("\r\n");
     FFileStream->WriteBytes(Line.View());
@@ -368,8 +356,11 @@ void TZqRollingFileAppender::SetMaxBackupCount(Word AValue) {
 }
 
 void uZqLogAppenders::Start() {
+  if (!Starts.Begins()) return;
   RegisteredAppenders()->Add(TZqLogBaseClass::Of<TZqFileAppender>());
   RegisteredAppenders()->Add(TZqLogBaseClass::Of<TZqRollingFileAppender>());
 }
+
+void uZqLogAppenders::Stop() { Starts.Ends(); }
 
 }  // namespace zq

@@ -1,8 +1,8 @@
 #pragma once
 
 #include <memory>
+#include <vector>
 
-#include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
 #include "runtime/core/utf8.h"
 #include "runtime/io/files.h"
@@ -54,13 +54,31 @@ class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZq
    private:
     TZqBaseAppender& FAppender;
   };
+  // For descendants: a message is written in this scope. A layout that SetLayout replaces from within stays to its end.
+  class TWriting {
+   public:
+    explicit TWriting(TZqBaseAppender& AAppender) noexcept : FAppender(AAppender) { ++FAppender.FWriting; }
+    TWriting(const TWriting&) = delete;
+    TWriting& operator=(const TWriting&) = delete;
+    ~TWriting() {
+      if (--FAppender.FWriting == 0 && !FAppender.FFormer.empty()) FAppender.FFormer.clear();
+    }
+
+   private:
+    TZqBaseAppender& FAppender;
+  };
   using TScope = TLockScope<TCriticalSection>;
 
-  IntfRef<IZqLogLayout> FLayout;  // changed by SetLayout alone
+  // These two are changed by SetLayout alone. The second is the first's way of writing bytes, empty if it has none.
+  IntfRef<IZqLogLayout> FLayout;
+  IntfRef<IZqLogByteLayout> FByteLayout;
   bool FInitialized = false;
-  Integer FInitializing = 0;                 // depth of TInitializing
-  TZqSimpleLayout* FSimpleLayout = nullptr;  // FLayout, if it is of just that class
+  Integer FInitializing = 0;  // depth of TInitializing
   mutable TCriticalSection FLock;
+
+ private:
+  Integer FWriting = 0;  // depth of TWriting
+  std::vector<IntfRef<IInterface>> FFormer;
 };
 
 /// Writer of UTF-8 text lines that counts its bytes. Each call is one system call, so what returned is in the file, and
@@ -225,6 +243,7 @@ class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRoll
 
 namespace uZqLogAppenders {
 ZQ_API void Start();
+ZQ_API void Stop();
 }  // namespace uZqLogAppenders
 
 }  // namespace zq

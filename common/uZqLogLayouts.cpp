@@ -2,13 +2,15 @@
 
 #include <algorithm>
 
-#include "runtime/text/local_time.h"
+#include "runtime/core/start_count.h"
 #include "runtime/text/datetime.h"
+#include "runtime/text/local_time.h"
 
 namespace zq {
 
 namespace {
 
+constinit TStartCount Starts;
 constexpr std::u16string_view cIndentStep = u"  ";
 constexpr std::size_t cTimeLength = std::string_view("yyyy-mm-dd hh:mm:ss:zzz - ").size();
 
@@ -16,6 +18,14 @@ void AppendAscii(utf8::TBuffer& ALine, std::string_view AText) { ALine.AppendByt
 void AppendAscii(UnicodeString& ALine, std::string_view AText) { ALine.Append(FromUTF8(AText)); }
 
 }  // namespace
+
+bool TZqSimpleLayout::GetInterface(const TGUID& AIID, void** AObj) {
+  if (AIID != IZqLogByteLayout::IID || ClassType() != ClassOf<TZqSimpleLayout>())
+    return Implements::GetInterface(AIID, AObj);
+  *AObj = static_cast<IZqLogByteLayout*>(&FByteLayout);
+  _AddRef();
+  return true;
+}
 
 UnicodeString TZqSimpleLayout::GetHeader() { return u"Log started on : " + DateTimeToStr(Now()); }
 
@@ -64,6 +74,11 @@ ZQ_HOT void TZqSimpleLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeStrin
   Compose(ALine, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
 }
 
+ZQ_HOT void TZqSimpleLayout::TByteLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName,
+    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  Layout.Compose(ALine, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+}
+
 UnicodeString TZqSimpleLayout::FormatLine(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   UnicodeString Result;
@@ -71,6 +86,11 @@ UnicodeString TZqSimpleLayout::FormatLine(const UnicodeString& ALoggerName, TZqL
   return Result;
 }
 
-void uZqLogLayouts::Start() { RegisteredLayouts()->Add(TZqLogBaseClass::Of<TZqSimpleLayout>()); }
+void uZqLogLayouts::Start() {
+  if (!Starts.Begins()) return;
+  RegisteredLayouts()->Add(TZqLogBaseClass::Of<TZqSimpleLayout>());
+}
+
+void uZqLogLayouts::Stop() { Starts.Ends(); }
 
 }  // namespace zq

@@ -10,16 +10,18 @@ namespace zq {
 /// One line of plain text per message: indent, time, level, logger, message, value.
 ///
 /// The indentation that EnterMethod and ExitMethod build up is the layout's, so one layout serves one appender, which
-/// calls it under its lock.
+/// calls it under its lock. This class writes bytes; a descendant is asked for its FormatLine, unless it names
+/// IZqLogByteLayout among its interfaces and has an AppendLine of its own.
 class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqLogLayout> {
  public:
   using Implements::Implements;
+  bool GetInterface(const TGUID& AIID, void** AObj) override;
   void Initialize(TZqLogBase*) override {}
   UnicodeString GetFooter() override;
   UnicodeString GetHeader() override;
   UnicodeString FormatLine(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
       PZqDataRec AValue, TZqLogIndent ALogIndent) override;
-  /// Appends, in UTF-8, what this class's FormatLine returns; a descendant's own FormatLine isn't asked.
+  /// Appends, in UTF-8, what this class's FormatLine returns.
   void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent);
 
@@ -27,12 +29,24 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
   ~TZqSimpleLayout() override = default;
 
  private:
+  // An object of its own, so that no descendant's AppendLine can be overlooked and none of this class taken for one.
+  struct TByteLayout final : IZqLogByteLayout {
+    explicit TByteLayout(TZqSimpleLayout& ALayout) noexcept : Layout(ALayout) {}
+    HRESULT QueryInterface(const TGUID& AIID, void** AObj) override { return Layout.QueryInterface(AIID, AObj); }
+    Integer _AddRef() override { return Layout._AddRef(); }
+    Integer _Release() override { return Layout._Release(); }
+    void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+        const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
+    TZqSimpleLayout& Layout;
+  };
+
   void ChangeIndent(TZqLogIndent ALogIndent);
   const char* TimeNow();
   template <class TLine>
   void Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
       PZqDataRec AValue, TZqLogIndent ALogIndent);
 
+  TByteLayout FByteLayout{*this};
   UnicodeString FIndent;
   Int64 FSecond = std::numeric_limits<Int64>::min();  // the one that FTime shows, in milliseconds, UTC
   char FTime[27] = "yyyy-mm-dd hh:mm:ss:zzz - ";      // how the last line began
@@ -40,6 +54,7 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
 
 namespace uZqLogLayouts {
 ZQ_API void Start();
+ZQ_API void Stop();
 }  // namespace uZqLogLayouts
 
 }  // namespace zq

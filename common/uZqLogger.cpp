@@ -7,15 +7,18 @@
 #include <utility>
 
 #include "common/uZqLogAppenders.h"
+#include "common/uZqSysUtils.h"
+#include "common/uZqTypes.h"
 #include "common/uZqWindows.h"
+#include "runtime/core/start_count.h"
 #include "runtime/io/string_list.h"
-#include "runtime/values/typeinfo.h"
-#include "runtime/text/local_time.h"
 #include "runtime/platform/version_service.h"
 #include "runtime/sync/thread.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/format.h"
+#include "runtime/text/local_time.h"
 #include "runtime/text/numbers.h"
+#include "runtime/values/typeinfo.h"
 
 namespace zq {
 
@@ -26,6 +29,7 @@ constexpr Integer cMaxNesting = 4;     // of an appender that logs into its own 
 constexpr char16_t cAppenderListRequest[] = u".AppenderList.Remove";
 constexpr char16_t cLoggerListRequest[] = u".LoggerList.Remove";
 
+constinit TStartCount Starts;
 std::atomic<TZqLogger*> RootLogger = nullptr;
 constinit std::mutex RootLock;
 std::atomic<TZqLogBaseClassList*> LayoutClasses = nullptr;
@@ -544,10 +548,14 @@ void ForgetAppender(const TZqLogBase* AObject) {
 
 void TZqLogBase::AfterConstruction() {
   Implements::AfterConstruction();
+  ListAppender();
+}
+
+void TZqLogBase::ListAppender() {
   if (dynamic_cast<TZqBaseAppender*>(this) == nullptr) return;
   const std::lock_guard Guard(AppendersLock);
   Assert(Appenders != nullptr, u"An appender is made before the library has started");
-  Appenders->push_back(this);
+  if (std::find(Appenders->begin(), Appenders->end(), this) == Appenders->end()) Appenders->push_back(this);
 }
 
 // An appender whose AfterConstruction raised, further down, is listed still.
@@ -555,19 +563,23 @@ TZqLogBase::~TZqLogBase() { ForgetAppender(this); }
 
 void TZqLogBase::BeforeDestruction() {
   ForgetAppender(this);
-  const bool AutoDestroyed = AutoDestroy();
   LeaveLists();
+  const TLockScope Ending(EndLock);
+  Implements::BeforeDestruction();
+}
+
+void TZqLogBase::EndRefused() noexcept {
+  if (std::exchange(FEndedByCount, false)) SetAutoDestroy(true);
   try {
-    const TLockScope Ending(EndLock);
-    Implements::BeforeDestruction();
-  } catch (...) {
-    SetAutoDestroy(AutoDestroyed);
-    throw;
+    ListAppender();
+  } catch (...) {  // the library has stopped, or memory is out: nobody finds it by its name then
   }
+  Implements::EndRefused();
 }
 
 void TZqLogBase::LeaveLists() {
   if (RefCount() == 0) return;
+  FEndedByCount = FEndedByCount || AutoDestroy();
   SetAutoDestroy(false);
   TWalks Left;
   {
@@ -611,6 +623,7 @@ TZqLogBaseClassList* RegisteredLayouts() { return MadeOnFirstUse(LayoutClasses);
 TZqLogBaseClassList* RegisteredAppenders() { return MadeOnFirstUse(AppenderClasses); }
 
 void uZqLogger::Start() {
+  if (!Starts.Begins()) return;
   Appenders = new std::vector<TZqLogBase*>;
   DescribeType<TZqLogLevel>(u"uZqLogger")
       .EnumNames({u"llAll", u"llTrace", u"llDebug", u"llInfo", u"llWarn", u"llError", u"llFatal", u"llDoNotLog"});
@@ -618,6 +631,7 @@ void uZqLogger::Start() {
 }
 
 void uZqLogger::Stop() {
+  if (!Starts.Ends()) return;
   Free(RootLogger.load());
   delete LayoutClasses.exchange(nullptr);
   delete AppenderClasses.exchange(nullptr);

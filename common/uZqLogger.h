@@ -6,16 +6,19 @@
 #include <string_view>
 #include <vector>
 
-#include "common/uZqClasses.h"
-#include "common/uZqSysUtils.h"
-#include "common/uZqTypes.h"
+#include "common/uZqClasses/component.h"
+#include "common/uZqTypes/kinds.h"
 #include "runtime/component/component.h"
 #include "runtime/core/interfaces.h"
-#include "runtime/values/variants.h"
 #include "runtime/core/varrec.h"
 #include "runtime/sync/critical_section.h"
+#include "runtime/values/variants.h"
 
 namespace zq {
+
+namespace utf8 {
+class TBuffer;
+}
 
 enum class TZqLogLevel : Byte { llAll, llTrace, llDebug, llInfo, llWarn, llError, llFatal, llDoNotLog };
 using enum TZqLogLevel;
@@ -132,6 +135,19 @@ struct ZQ_API IZqLogLayout : Extends<IZqLogBase> {
 
  protected:
   ~IZqLogLayout() = default;
+};
+
+/// A layout that appends its line, as UTF-8, to the appender's own buffer, which spares a text and its conversion.
+/// Beside IZqLogLayout: an appender that knows of it asks for it once, when the layout is set, and then for no
+/// FormatLine.
+struct ZQ_API IZqLogByteLayout : Extends<IInterface> {
+  static constexpr TGUID IID = "{7F0C9D94-3B76-4F24-99D5-339276B8D37F}"_guid;
+  /// Appends what FormatLine returns, so nothing for no line at all. ALine is the appender's and empty.
+  virtual void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) = 0;
+
+ protected:
+  ~IZqLogByteLayout() = default;
 };
 
 /// An appender that writes through a layout. Bears the GUID of IZqLogAppender.
@@ -595,11 +611,16 @@ class ZQ_API TZqLogBase : public Implements<TZqComponent, IZqLogBase> {
   /// most, until no other thread's message is on its way through it. It raises Exception where it is counted still, as
   /// out of a message of its own.
   void BeforeDestruction() override;
+  /// Listed and ended by its count as before; the lists that it left don't get it back.
+  void EndRefused() noexcept override;
   // That first step: nothing where nobody counts the object. Its last count doesn't end it any more.
   void LeaveLists();
 
  private:
+  void ListAppender();
+
   TZqLogger* FLogger;
+  bool FEndedByCount = false;  // until LeaveLists
 };
 
 /// Classes by name, in order of registration.

@@ -8,11 +8,10 @@
 
 #include "runtime/com/registry.h"
 #include "runtime/containers/lists.h"
-#include "runtime/io/string_list.h"
-#include "runtime/values/typeinfo.h"
+#include "runtime/core/start_count.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
-#include "runtime/text/local_time.h"
+#include "runtime/io/string_list.h"
 #include "runtime/platform/desktop_service.h"
 #include "runtime/platform/file_service.h"
 #include "runtime/platform/process_facts.h"
@@ -21,7 +20,9 @@
 #include "runtime/text/casing.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/encoding.h"
+#include "runtime/text/local_time.h"
 #include "runtime/text/numbers.h"
+#include "runtime/values/typeinfo.h"
 
 namespace zq {
 
@@ -29,7 +30,12 @@ namespace uZqSysUtils {
 
 TObjectList* ExceptionClassList = nullptr;
 
+namespace {
+constinit TStartCount Starts;
+}
+
 void Start() {
+  if (!Starts.Begins()) return;
   ExceptionClassList = nullptr;
   DescribeType<TZqCharCase>(u"uZqSysUtils")
       .EnumNames({u"rcNormal", u"rcUpperCase", u"rcLowerCase", u"rcTitleCase", u"rcUpperCamelCase", u"rcLowerCamelCase",
@@ -37,7 +43,9 @@ void Start() {
   DescribeType<TZqBitness>(u"uZqSysUtils").EnumNames({u"bit32", u"bit64"});
 }
 
-void Stop() { FreeAndNil(ExceptionClassList); }
+void Stop() {
+  if (Starts.Ends()) FreeAndNil(ExceptionClassList);
+}
 
 }  // namespace uZqSysUtils
 

@@ -7,13 +7,14 @@
 #include <span>
 #include <string>
 
-#include "runtime/values/typeinfo.h"
+#include "runtime/core/start_count.h"
 #include "runtime/core/utf8.h"
 #include "runtime/io/streams.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/format.h"
 #include "runtime/text/format_settings.h"
 #include "runtime/text/numbers.h"
+#include "runtime/values/typeinfo.h"
 
 namespace zq {
 
@@ -815,7 +816,12 @@ Extended ZqStrToFloatDef(const UnicodeString& AValue, Extended ADefValue) {
   return ADefValue;
 }
 
+namespace {
+constinit TStartCount Starts;
+}
+
 void uZqTypes::Start() {
+  if (!Starts.Begins()) return;
   DescribeType<TZqMainTypeKind>(u"uZqTypes")
       .EnumNames({u"mtkUnknown", u"mtkInteger", u"mtkFloat", u"mtkString", u"mtkBoolean", u"mtkDateTime", u"mtkArray",
           u"mtkStructure", u"mtkOther"});
@@ -827,5 +833,7 @@ void uZqTypes::Start() {
           u"rtkInterface", u"rtkPointer", u"rtkMethod", u"rtkProcedure", u"rtkException", u"rtkClass", u"rtkClassRef"});
   DescribeType<TZqNullableBool>(u"uZqTypes").EnumNames({u"nbNull", u"nbYes", u"nbNo"});
 }
+
+void uZqTypes::Stop() { Starts.Ends(); }
 
 }  // namespace zq

@@ -4,14 +4,15 @@
 #include <string_view>
 #include <type_traits>
 
+#include "common/uZqTypes/kinds.h"
 #include "runtime/core/api.h"
 #include "runtime/core/exceptions.h"
 #include "runtime/core/strings.h"
-#include "runtime/values/typeinfo.h"
 #include "runtime/core/types.h"
+#include "runtime/text/encoding.h"
+#include "runtime/values/typeinfo.h"
 #include "runtime/values/values.h"
 #include "runtime/values/variants.h"
-#include "runtime/text/encoding.h"
 
 namespace zq {
 
@@ -24,6 +25,7 @@ inline constexpr TResStringRec _SNormalizeFailure{65529, u"Failed to normalize t
 inline constexpr TResStringRec _SEncodingNotSupported{65530, u"The specified encoding is not supported!"};
 
 ZQ_API void Start();
+ZQ_API void Stop();
 }  // namespace uZqTypes
 
 // ---- Encodings and code pages ---------------------------------------------------------------------------------------
@@ -164,58 +166,6 @@ using enum TZqNullableBool;
 
 // ---- Type kinds -----------------------------------------------------------------------------------------------------
 
-enum class TZqMainTypeKind : Byte {
-  mtkUnknown,
-  mtkInteger,
-  mtkFloat,
-  mtkString,
-  mtkBoolean,
-  mtkDateTime,
-  mtkArray,
-  mtkStructure,
-  mtkOther
-};
-using enum TZqMainTypeKind;
-
-enum class TZqTypeKind : Byte {
-  rtkUnknown,
-  rtkByte,
-  rtkWord,
-  rtkLongWord,
-  rtkUInt64,
-  rtkShortInt,
-  rtkSmallInt,
-  rtkLongInt,
-  rtkInt64,
-  rtkSingle,
-  rtkDouble,
-  rtkExtended,
-  rtkChar,
-  rtkAChar,
-  rtkWChar,
-  rtkString,
-  rtkAString,
-  rtkWString,
-  rtkBoolean,
-  rtkEnumeration,
-  rtkSet,
-  rtkDate,
-  rtkTime,
-  rtkDatetime,
-  rtkVariant,
-  rtkArray,
-  rtkDynArray,
-  rtkRecord,
-  rtkObject,
-  rtkInterface,
-  rtkPointer,
-  rtkMethod,
-  rtkProcedure,
-  rtkException,
-  rtkClass,
-  rtkClassRef
-};
-using enum TZqTypeKind;
 using TZqSimpleTypeKind = TSubrange<rtkByte, rtkVariant>;
 using TZqCompoundTypeKind = TSubrange<rtkArray, rtkObject>;
 using TZqOtherTypeKind = TSubrange<rtkInterface, rtkClassRef>;

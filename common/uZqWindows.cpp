@@ -8,13 +8,13 @@
 #include "runtime/core/exceptions.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
-#include "runtime/text/local_time.h"
 #include "runtime/platform/environment_service.h"
 #include "runtime/platform/file_service.h"
 #include "runtime/platform/shell_service.h"
 #include "runtime/platform/version_service.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/format.h"
+#include "runtime/text/local_time.h"
 
 namespace zq {
 

@@ -6,9 +6,9 @@
 #include <tuple>
 #include <utility>
 
-#include "runtime/values/variants.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/format_settings.h"
+#include "runtime/values/variants.h"
 #include "tests/support/support.h"
 
 namespace zq {

@@ -3,8 +3,8 @@
 #include <limits>
 
 #include "runtime/platform/clock_service.h"
-#include "runtime/text/local_time.h"
 #include "runtime/text/datetime.h"
+#include "runtime/text/local_time.h"
 #include "tests/support/raised.h"
 #include "tests/support/support.h"
 

@@ -7,11 +7,11 @@
 #include <optional>
 
 #include "runtime/core/exceptions.h"
-#include "runtime/values/variants.h"
 #include "runtime/text/casing.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/format.h"
 #include "runtime/text/numbers.h"
+#include "runtime/values/variants.h"
 #include "tests/support/environment_scope.h"
 #include "tests/support/raised.h"
 #include "tests/support/support.h"

@@ -109,6 +109,63 @@ TEST(AppenderFile, BlankNameOrNoLayoutGivesNoOutput) {
 }
 
 // Gives its texts away before it returns them.
+// Takes itself off its appender before it makes its line.
+class TOwnBytes : public Implements<TZqSimpleLayout, IZqLogByteLayout> {
+ public:
+  using Implements::Implements;
+  void Initialize(TZqLogBase* ALogBase) override { FAppender = Supports<IZqLogAppenderEx>(ALogBase).Get(); }
+  void AppendLine(utf8::TBuffer& ALine, const UnicodeString&, TZqLogLevel, const UnicodeString& ALogMessage, PZqDataRec,
+      TZqLogIndent) override {
+    if (ALogMessage == u"last") FAppender->SetLayout(IntfRef<IZqLogLayout>());
+    ALine.Append(FPrefix + ALogMessage);
+  }
+
+ protected:
+  ~TOwnBytes() override { FPrefix = u"freed "; }
+
+ private:
+  UnicodeString FPrefix = u"bytes ";
+  IZqLogAppenderEx* FAppender = nullptr;
+};
+
+// Wraps a simple layout and shows that one's component.
+class TWrapping : public Implements<TInterfacedObject, IZqLogLayout> {
+ public:
+  UnicodeString GetName() const override { return u"wrapping"; }
+  TComponent* Component() override { return FInner->Component(); }
+  UnicodeString GetHeader() override { return FInner->GetHeader(); }
+  UnicodeString GetFooter() override { return FInner->GetFooter(); }
+  UnicodeString FormatLine(
+      const UnicodeString&, TZqLogLevel, const UnicodeString& ALogMessage, PZqDataRec, TZqLogIndent) override {
+    return ALogMessage == u"none" ? u"" : u"wrapped " + ALogMessage;
+  }
+
+ protected:
+  ~TWrapping() override = default;
+
+ private:
+  IntfRef<IZqLogLayout> FInner = IntfRef<IZqLogBase>(New<TZqSimpleLayout>(Logger(), u"")).As<IZqLogLayout>();
+};
+
+TEST(AppenderFile, ALayoutIsHeardInItsOwnWay) {
+  TFileFixture Fixture;
+  const auto Appender = Fixture.File.As<IZqLogAppenderEx>();
+  const auto LastLine = [&](const char16_t* AMessage) {
+    Fixture.Log->Info(AMessage);
+    const TLines Lines = SplitLines(Fixture.Folder.Read("app.log"));
+    return Lines[Lines.size() - 2];
+  };
+  Appender->SetLayout(IntfRef<IZqLogLayout>(New<TWrapping>()));
+  EXPECT_EQ(LastLine(u"ä"), "wrapped ä");
+  EXPECT_EQ(LastLine(u"none"), "wrapped ä");
+  Appender->SetLayout(TZqLogBaseClass::Of<TZqSimpleLayout>());
+  EXPECT_TRUE(LastLine(u"plain").ends_with(" - plain"));
+  Appender->SetLayout(TZqLogBaseClass::Of<TOwnBytes>());
+  EXPECT_EQ(LastLine(u"2"), "bytes 2");
+  Fixture.Log->Info(u"last");  // goes nowhere: the file was closed from within
+  EXPECT_EQ(Fixture.Folder.Read("app.log").find("last"), std::string::npos);
+}
+
 class TTalkingLayout : public TZqSimpleLayout {
  public:
   using TZqSimpleLayout::TZqSimpleLayout;

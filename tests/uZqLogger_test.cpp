@@ -6,10 +6,11 @@
 #include <thread>
 
 #include "common/rZqCommon.h"
-#include "runtime/values/typeinfo.h"
+#include "common/uZqSysUtils.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/format.h"
 #include "runtime/text/numbers.h"
+#include "runtime/values/typeinfo.h"
 #include "tests/support/logging.h"
 #include "tests/support/raised.h"
 
@@ -482,6 +483,18 @@ TEST(LogPackage, StartsOnceHoweverOftenAndStopsWithTheLast) {
   const TLoggerFixture Fixture(u"p");
   EXPECT_EQ(GetPackageInfoTable().Units.front().Name, std::u16string_view(u"uZqSysUtils"));
   for (const PTypeInfo Type : GetPackageInfoTable().Types) EXPECT_NE(GetEnumName(Type, 1), u"1");
+}
+
+TEST(LogPackage, AModuleStartedByItselfKeepsWhatItHas) {
+  ZqRegisterExceptionClass(u"package", 1, EZqExceptionClass::Of<EZqException>());
+  const auto Appender = IntfRef<IZqLogAppender>(New<TZqFileAppender>(Logger(), u"own"));
+  for (const bool Starting : {true, false}) {
+    for (const TPackageUnit& Unit : GetPackageInfoTable().Units)
+      if (Unit.Start != nullptr) (Starting ? Unit.Start : Unit.Stop)();
+    EXPECT_TRUE(ZqGetExceptionClass(u"package", 1));
+    EXPECT_EQ(LiveAppenders().size(), 1U);
+    EXPECT_EQ(RegisteredAppenders()->Count(), 2);
+  }
 }
 
 TEST(LogPackage, StopWritesTheFootersOfTheRootsAppenders) {

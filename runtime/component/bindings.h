@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "runtime/component/component.h"
+#include "runtime/component/create_options.h"
 #include "runtime/core/delegates.h"
 #include "runtime/core/interfaces.h"
 #include "runtime/values/variants.h"
@@ -17,14 +18,6 @@ namespace zq {
 struct ZQ_API EBindingError : Exception {
   using Exception::Exception;
 };
-
-enum class TCreateOption : std::uint8_t {
-  coNotifyOutput,  ///< a write tells the expressions that depend on the property written
-  coEvaluate,      ///< the value is carried over once when the binding is made
-};
-using enum TCreateOption;
-using TCreateOptions = TSet<TCreateOption>;
-inline constexpr TCreateOptions cDefaultCreateOptions{coNotifyOutput, coEvaluate};
 
 /// An object and the name that it bears in expressions.
 struct TBindingAssociation {

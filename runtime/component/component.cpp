@@ -84,16 +84,16 @@ void TComponent::AfterConstruction() {
 
 void TComponent::BeforeDestruction() {
   MarkDestroying(true);
-  try {
-    while (!FComponents.empty()) FComponents.back()->Free();
-    TellWatchers();
-    if (FOwner != nullptr) FOwner->RemoveComponent(this);
-  } catch (...) {
-    MarkDestroying(false);
-    throw;
-  }
+  while (!FComponents.empty()) FComponents.back()->Free();
+  TellWatchers();
+  if (FOwner != nullptr) FOwner->RemoveComponent(this);
   Unlink();
   Implements::BeforeDestruction();
+}
+
+void TComponent::EndRefused() noexcept {
+  MarkDestroying(false);
+  Implements::EndRefused();
 }
 
 void TComponent::MarkDestroying(bool AOn) noexcept {

@@ -5,13 +5,15 @@
 #include <memory>
 #include <vector>
 
-#include "runtime/component/persistent.h"
 #include "runtime/core/delegates.h"
 #include "runtime/core/interfaces.h"
+#include "runtime/core/persistent.h"
 
 namespace zq {
 
 class TComponent;
+class TReader;
+class TWriter;
 
 enum class TOperation : std::uint8_t { opInsert, opRemove };
 using enum TOperation;
@@ -99,6 +101,7 @@ class ZQ_API TComponent : public Implements<TPersistent, IInterface> {
   ~TComponent() override;
   void AfterConstruction() override;
   void BeforeDestruction() override;
+  void EndRefused() noexcept override;
   /// AComponent came to this owner, or one that this component owns or asked about is going. Must not raise.
   virtual void Notification(TComponent*, TOperation) {}
   /// The component has been read from a stream: clears csLoading.

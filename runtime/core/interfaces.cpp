@@ -24,13 +24,7 @@ Integer TInterfacedObject::_AddRef() { return FRefCount.fetch_add(1, std::memory
 
 Integer TInterfacedObject::_Release() {
   const Integer Result = FRefCount.fetch_sub(1, std::memory_order_acq_rel) - 1;
-  if (Result != 0 || FEnding.exchange(true, std::memory_order_acq_rel)) return Result;
-  try {
-    Free();
-  } catch (...) {  // refused: it lives on, and the next last reference tries again
-    FEnding.store(false, std::memory_order_release);
-    throw;
-  }
+  if (Result == 0 && !FEnding.exchange(true, std::memory_order_acq_rel)) Free();
   return Result;
 }
 
@@ -43,6 +37,12 @@ void TInterfacedObject::BeforeDestruction() {
   if (RefCount() != 0) throw Exception(ClassName() + u" is freed while it is referenced");
   FEnding.store(true, std::memory_order_release);  // also of one that is freed by hand
   TObject::BeforeDestruction();
+}
+
+// The next last reference tries again.
+void TInterfacedObject::EndRefused() noexcept {
+  FEnding.store(false, std::memory_order_release);
+  TObject::EndRefused();
 }
 
 bool TContainedObject::GetInterface(const TGUID& AIID, void** AObj) { return AnswerRoot(this, AIID, AObj); }

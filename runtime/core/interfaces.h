@@ -164,6 +164,7 @@ class ZQ_API TInterfacedObject : public TObject, public virtual IInterface {
   void AfterConstruction() override;
   /// Raises Exception while the count is not 0.
   void BeforeDestruction() override;
+  void EndRefused() noexcept override;
 
  private:
   std::atomic<Integer> FRefCount = 1;  // the construction's own count, so that a reference in a constructor is no end

@@ -63,6 +63,16 @@ bool TClass::InheritsFrom(TClass AClass) const noexcept {
   return FInfo != nullptr && AClass.FInfo != nullptr && Derives(*FInfo, *AClass.FInfo);
 }
 
+void TObject::Free() {
+  try {
+    BeforeDestruction();
+  } catch (...) {
+    EndRefused();
+    throw;
+  }
+  delete this;
+}
+
 bool TObject::GetInterface(const TGUID&, void** AObj) {
   *AObj = nullptr;
   return false;

@@ -50,10 +50,7 @@ class ZQ_API TObject {
   TObject& operator=(const TObject&) = delete;
 
   /// Ends an object that New made. Raises what BeforeDestruction raises; the object is alive then.
-  void Free() {
-    BeforeDestruction();
-    delete this;
-  }
+  void Free();
 
   [[nodiscard]] TClass ClassType() const noexcept { return TClass(typeid(*this)); }
   [[nodiscard]] UnicodeString ClassName() const { return ClassType().ClassName(); }
@@ -72,6 +69,9 @@ class ZQ_API TObject {
   virtual ~TObject() = default;
   virtual void AfterConstruction() {}  ///< The first place where a call reaches the final class's override.
   virtual void BeforeDestruction() {}  ///< The last such place. An override ends with its parent's.
+  /// BeforeDestruction has raised and the object lives on: puts back what its end had changed by then. An override ends
+  /// with its parent's.
+  virtual void EndRefused() noexcept {}
 
  private:
   template <std::derived_from<TObject> T, class... TArgs>
