@@ -193,6 +193,34 @@ TEST(AppenderFile, LayoutThatLogsAndClosesFromItsHeaderAndFooterLosesNoLine) {
   EXPECT_EQ(Fixture.Folder.Read("app.log"), "in header\r\nheader\r\nx\r\nin footer\r\nfooter");
 }
 
+class TReluctant : public TZqFileAppender {
+ public:
+  using TZqFileAppender::TZqFileAppender;
+  static inline bool Refuses = false;
+
+ protected:
+  ~TReluctant() override = default;
+  void BeforeDestruction() override {
+    TZqFileAppender::BeforeDestruction();
+    if (Refuses) throw EInvalidOperation(u"not yet");
+  }
+};
+
+TEST(AppenderFile, ARefusedEndLeavesTheAppenderListedAndItsCountToEndIt) {
+  const TLoggerFixture Fixture;
+  auto Appender = Fixture.Log->GetAppenders()->Add(TZqLogBaseClass::Of<TReluctant>());
+  auto* const Object = dynamic_cast<TReluctant*>(Appender->Component());
+  Fixture.Log->ClearAppenders();
+  TReluctant::Refuses = true;
+  EXPECT_THROW(Appender.Reset(), EInvalidOperation);
+  TReluctant::Refuses = false;
+  EXPECT_EQ(LiveAppenders(), std::vector<TZqLogBase*>{Object});
+  EXPECT_FALSE(Object->ComponentState().Contains(csDestroying));
+  Appender = Object;
+  Appender.Reset();
+  EXPECT_TRUE(LiveAppenders().empty());
+}
+
 TEST(AppenderFile, MakesFoldersAndTakesNamesThatAreNoText) {
   TFileFixture Fixture;
   Fixture.File->SetFileName(Fixture.Folder.File("new") + u"/sub\\a\xDCFF.log");

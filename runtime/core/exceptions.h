@@ -157,7 +157,7 @@ class ZQ_API ExceptionRef {
 
   explicit operator bool() const noexcept { return FHeld != nullptr; }
   /// The object; nullptr when the exception held is none of the Exception family.
-  [[nodiscard]] Exception* Get() const noexcept { return FObject; }
+  [[nodiscard]] Exception* Get() const noexcept ZQ_LIFETIMEBOUND { return FObject; }
   Exception* operator->() const noexcept { return FObject; }
   /// The message, also of one that is not of the family.
   [[nodiscard]] UnicodeString Message() const;

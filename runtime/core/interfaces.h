@@ -42,9 +42,14 @@ template <class I>
   requires(I::IID == I::Parent::IID)
 struct BearerOf<I> : BearerOf<typename I::Parent> {};
 
+namespace detail {
+// Direct base of the classes that Implements makes, and of no other: how the parent of a class is told from them.
+struct ZQ_API TGivesInterfaces {};
+}  // namespace detail
+
 /// TBase and the interfaces I..., with the answers to GetInterface for them and their parents.
 template <class TBase, class... I>
-class Implements : public TBase, public virtual I... {
+class Implements : public TBase, public virtual I..., private virtual detail::TGivesInterfaces {
  public:
   using TBase::TBase;
 
@@ -110,7 +115,7 @@ class IntfRef {
     if (I* const Dropped = std::exchange(FPtr, nullptr)) Dropped->_Release();
   }
   /// Not counted; for a call, not to keep.
-  [[nodiscard]] I* Get() const noexcept { return FPtr; }
+  [[nodiscard]] I* Get() const noexcept ZQ_LIFETIMEBOUND { return FPtr; }
   I* operator->() const noexcept { return FPtr; }
   I& operator*() const noexcept { return *FPtr; }
   explicit operator bool() const noexcept { return FPtr != nullptr; }

@@ -6,6 +6,7 @@
 #include <new>
 
 #include "runtime/core/exceptions.h"
+#include "runtime/core/interfaces.h"
 
 namespace zq {
 
@@ -48,7 +49,6 @@ UnicodeString TClass::ClassName() const {
 }
 
 TClass TClass::ClassParent() const noexcept {
-  constexpr std::string_view Implements = "N2zq10ImplementsI";  // a class only in C++: it gives one its interfaces
   TClass Result;
   if (FInfo == nullptr) return Result;
   AnyBase(*FInfo, [&](const std::type_info& AParent) {
@@ -56,7 +56,9 @@ TClass TClass::ClassParent() const noexcept {
     Result = TClass(AParent);
     return true;
   });
-  return std::string_view(Result.Info().name()).starts_with(Implements) ? Result.ClassParent() : Result;
+  // Implements is a class only in C++: the one behind it is the parent.
+  const auto IsMark = [](const std::type_info& ABase) { return ABase == typeid(detail::TGivesInterfaces); };
+  return AnyBase(Result.Info(), IsMark) ? Result.ClassParent() : Result;
 }
 
 bool TClass::InheritsFrom(TClass AClass) const noexcept {

@@ -42,25 +42,27 @@ class ZQ_API UnicodeString {
   [[nodiscard]] char16_t operator[](Integer AIndex) const noexcept {
     return FText[static_cast<std::size_t>(AIndex - 1)];
   }
-  [[nodiscard]] char16_t& operator[](Integer AIndex) noexcept { return FText[static_cast<std::size_t>(AIndex - 1)]; }
+  [[nodiscard]] char16_t& operator[](Integer AIndex) noexcept ZQ_LIFETIMEBOUND {
+    return FText[static_cast<std::size_t>(AIndex - 1)];
+  }
   /// ACount characters from AIndex on, clipped at the end; empty for a count of 0 or less.
   [[nodiscard]] UnicodeString Copy(Integer AIndex, Integer ACount) const;
   /// Place of the first ASub, from 1; 0 if absent. An empty ASub is nowhere.
   [[nodiscard]] Integer Pos(std::u16string_view ASub) const noexcept;
 
-  [[nodiscard]] const char16_t* c_str() const noexcept { return FText.c_str(); }
-  [[nodiscard]] const char16_t* data() const noexcept { return FText.data(); }
-  [[nodiscard]] char16_t* data() noexcept { return FText.data(); }
+  [[nodiscard]] const char16_t* c_str() const noexcept ZQ_LIFETIMEBOUND { return FText.c_str(); }
+  [[nodiscard]] const char16_t* data() const noexcept ZQ_LIFETIMEBOUND { return FText.data(); }
+  [[nodiscard]] char16_t* data() noexcept ZQ_LIFETIMEBOUND { return FText.data(); }
   [[nodiscard]] std::size_t size() const noexcept { return FText.size(); }
-  [[nodiscard]] std::u16string_view View() const noexcept { return FText; }
+  [[nodiscard]] std::u16string_view View() const noexcept ZQ_LIFETIMEBOUND { return FText; }
   /// The string inside, for code that works on it with the standard library.
-  [[nodiscard]] std::u16string& Str() noexcept { return FText; }
-  [[nodiscard]] const std::u16string& Str() const noexcept { return FText; }
-  operator std::u16string_view() const noexcept { return FText; }
-  [[nodiscard]] auto begin() const noexcept { return FText.begin(); }
-  [[nodiscard]] auto end() const noexcept { return FText.end(); }
-  [[nodiscard]] auto begin() noexcept { return FText.begin(); }
-  [[nodiscard]] auto end() noexcept { return FText.end(); }
+  [[nodiscard]] std::u16string& Str() noexcept ZQ_LIFETIMEBOUND { return FText; }
+  [[nodiscard]] const std::u16string& Str() const noexcept ZQ_LIFETIMEBOUND { return FText; }
+  operator std::u16string_view() const noexcept ZQ_LIFETIMEBOUND { return FText; }
+  [[nodiscard]] auto begin() const noexcept ZQ_LIFETIMEBOUND { return FText.begin(); }
+  [[nodiscard]] auto end() const noexcept ZQ_LIFETIMEBOUND { return FText.end(); }
+  [[nodiscard]] auto begin() noexcept ZQ_LIFETIMEBOUND { return FText.begin(); }
+  [[nodiscard]] auto end() noexcept ZQ_LIFETIMEBOUND { return FText.end(); }
 
   UnicodeString& operator+=(const UnicodeString& AText) { return Append(AText.FText); }
   UnicodeString& operator+=(std::u16string_view AText) { return Append(AText); }
@@ -125,17 +127,19 @@ class ZQ_API RawByteString {
   void SetLength(Integer ALength) { FBytes.resize(ALength < 0 ? 0U : static_cast<std::size_t>(ALength)); }
   /// AIndex from 1 to Length; not checked.
   [[nodiscard]] char operator[](Integer AIndex) const noexcept { return FBytes[static_cast<std::size_t>(AIndex - 1)]; }
-  [[nodiscard]] char& operator[](Integer AIndex) noexcept { return FBytes[static_cast<std::size_t>(AIndex - 1)]; }
-  [[nodiscard]] const char* c_str() const noexcept { return FBytes.c_str(); }
-  [[nodiscard]] const char* data() const noexcept { return FBytes.data(); }
-  [[nodiscard]] char* data() noexcept { return FBytes.data(); }
+  [[nodiscard]] char& operator[](Integer AIndex) noexcept ZQ_LIFETIMEBOUND {
+    return FBytes[static_cast<std::size_t>(AIndex - 1)];
+  }
+  [[nodiscard]] const char* c_str() const noexcept ZQ_LIFETIMEBOUND { return FBytes.c_str(); }
+  [[nodiscard]] const char* data() const noexcept ZQ_LIFETIMEBOUND { return FBytes.data(); }
+  [[nodiscard]] char* data() noexcept ZQ_LIFETIMEBOUND { return FBytes.data(); }
   [[nodiscard]] std::size_t size() const noexcept { return FBytes.size(); }
-  [[nodiscard]] std::string_view View() const noexcept { return FBytes; }
-  [[nodiscard]] std::string& Str() noexcept { return FBytes; }
-  [[nodiscard]] const std::string& Str() const noexcept { return FBytes; }
-  operator std::string_view() const noexcept { return FBytes; }
-  [[nodiscard]] auto begin() const noexcept { return FBytes.begin(); }
-  [[nodiscard]] auto end() const noexcept { return FBytes.end(); }
+  [[nodiscard]] std::string_view View() const noexcept ZQ_LIFETIMEBOUND { return FBytes; }
+  [[nodiscard]] std::string& Str() noexcept ZQ_LIFETIMEBOUND { return FBytes; }
+  [[nodiscard]] const std::string& Str() const noexcept ZQ_LIFETIMEBOUND { return FBytes; }
+  operator std::string_view() const noexcept ZQ_LIFETIMEBOUND { return FBytes; }
+  [[nodiscard]] auto begin() const noexcept ZQ_LIFETIMEBOUND { return FBytes.begin(); }
+  [[nodiscard]] auto end() const noexcept ZQ_LIFETIMEBOUND { return FBytes.end(); }
 
   friend bool operator==(const RawByteString& A, const RawByteString& B) noexcept { return A.FBytes == B.FBytes; }
   friend bool operator==(const RawByteString& A, std::string_view B) noexcept { return A.FBytes == B; }
@@ -198,7 +202,7 @@ class ShortString {
       : FLength(static_cast<unsigned char>(AText.size() < 255 ? AText.size() : 255)) {
     for (std::size_t i = 0; i < FLength; ++i) FText[i] = AText[i];
   }
-  [[nodiscard]] constexpr std::string_view View() const noexcept { return {FText, FLength}; }
+  [[nodiscard]] constexpr std::string_view View() const noexcept ZQ_LIFETIMEBOUND { return {FText, FLength}; }
   [[nodiscard]] constexpr Integer Length() const noexcept { return FLength; }
   [[nodiscard]] UnicodeString ToString() const { return UnicodeString::FromUTF8(View()); }
   friend constexpr bool operator==(const ShortString& A, const ShortString& B) noexcept { return A.View() == B.View(); }

@@ -61,7 +61,7 @@ class TBuffer {
     std::memcpy(FBytes.get() + FSize, ABytes.data(), ABytes.size());
     FSize += ABytes.size();
   }
-  [[nodiscard]] std::string_view View() const noexcept { return {FBytes.get(), FSize}; }
+  [[nodiscard]] std::string_view View() const noexcept ZQ_LIFETIMEBOUND { return {FBytes.get(), FSize}; }
   [[nodiscard]] bool IsEmpty() const noexcept { return FSize == 0; }
   [[nodiscard]] std::size_t Room() const noexcept { return FRoom; }
 

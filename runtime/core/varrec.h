@@ -59,21 +59,23 @@ struct TVarRec {
   noexcept : Kind(vtExtended), VExtended(AValue.Value) {}
   TVarRec(char16_t AValue) noexcept : Kind(vtWideChar), VWideChar(AValue) {}
   TVarRec(char AValue) noexcept : Kind(vtAnsiChar), VAnsiChar(AValue) {}
-  TVarRec(const UnicodeString& AValue) noexcept : Kind(vtWideText), VWideText(AValue.View()) {}
-  TVarRec(std::u16string_view AValue) noexcept : Kind(vtWideText), VWideText(AValue) {}
-  TVarRec(const std::u16string& AValue) noexcept : Kind(vtWideText), VWideText(AValue) {}
-  TVarRec(const char16_t* AValue) noexcept : Kind(vtWideText), VWideText(AValue == nullptr ? u"" : AValue) {}
+  TVarRec(const UnicodeString& AValue ZQ_LIFETIMEBOUND) noexcept : Kind(vtWideText), VWideText(AValue.View()) {}
+  TVarRec(std::u16string_view AValue ZQ_LIFETIMEBOUND) noexcept : Kind(vtWideText), VWideText(AValue) {}
+  TVarRec(const std::u16string& AValue ZQ_LIFETIMEBOUND) noexcept : Kind(vtWideText), VWideText(AValue) {}
+  TVarRec(const char16_t* AValue ZQ_LIFETIMEBOUND) noexcept
+      : Kind(vtWideText), VWideText(AValue == nullptr ? u"" : AValue) {}
   // Bytes without a code page of their own are in the process's; UTF-8 comes as UTF8String.
-  TVarRec(const RawByteString& AValue) noexcept
+  TVarRec(const RawByteString& AValue ZQ_LIFETIMEBOUND) noexcept
       : Kind(vtAnsiText), CodePage(AValue.CodePage()), VAnsiText(AValue.View()) {}
-  TVarRec(std::string_view AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue) {}
-  TVarRec(const std::string& AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue) {}
-  TVarRec(const char* AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue == nullptr ? "" : AValue) {}
-  TVarRec(const ShortString& AValue) noexcept : Kind(vtAnsiText), VAnsiText(AValue.View()) {}
-  ZQ_API TVarRec(const Variant& AValue) noexcept;
-  TVarRec(const TObject* AValue) noexcept : Kind(vtObject), VObject(AValue) {}
+  TVarRec(std::string_view AValue ZQ_LIFETIMEBOUND) noexcept : Kind(vtAnsiText), VAnsiText(AValue) {}
+  TVarRec(const std::string& AValue ZQ_LIFETIMEBOUND) noexcept : Kind(vtAnsiText), VAnsiText(AValue) {}
+  TVarRec(const char* AValue ZQ_LIFETIMEBOUND) noexcept
+      : Kind(vtAnsiText), VAnsiText(AValue == nullptr ? "" : AValue) {}
+  TVarRec(const ShortString& AValue ZQ_LIFETIMEBOUND) noexcept : Kind(vtAnsiText), VAnsiText(AValue.View()) {}
+  ZQ_API TVarRec(const Variant& AValue ZQ_LIFETIMEBOUND) noexcept;
+  TVarRec(const TObject* AValue ZQ_LIFETIMEBOUND) noexcept : Kind(vtObject), VObject(AValue) {}
   TVarRec(TClass AValue) noexcept : Kind(vtClass), VClass(AValue) {}
-  TVarRec(const void* AValue) noexcept : Kind(vtPointer), VPointer(AValue) {}
+  TVarRec(const void* AValue ZQ_LIFETIMEBOUND) noexcept : Kind(vtPointer), VPointer(AValue) {}
 
   TKind Kind;
   Byte Width = 8;     ///< of VInteger's own type, in bytes

@@ -10,7 +10,9 @@ namespace zq {
 
 /// How numbers, dates and times are written and read. The defaults are those of the C locale.
 ///
-/// In the four formats "/" stands for DateSeparator and ":" for TimeSeparator; the letters are those of FormatDateTime.
+/// In the four formats "/" stands for DateSeparator and ":" for TimeSeparator; the letters are those of FormatDateTime,
+/// which takes d m y h n s z t c and a/p for its own in either case and copies all else. What is to stand as it is goes
+/// into quotes: yyyy-mm-dd"T"hh:nn:ss. Without them that T would be the short time.
 struct TFormatSettings {
   Char DecimalSeparator = u'.';
   Char ThousandSeparator = u',';

@@ -60,7 +60,7 @@ class ZQ_API TValue {
   [[nodiscard]] PTypeInfo GetTypeInfo() const noexcept { return FType; }
   [[nodiscard]] TTypeKind GetTypeKind() const noexcept { return FType == nullptr ? tkUnknown : FType->Kind; }
   /// The storage of the value, valid until the value changes or goes; nullptr without a type.
-  [[nodiscard]] const void* GetReferenceToRawData() const noexcept;
+  [[nodiscard]] const void* GetReferenceToRawData() const noexcept ZQ_LIFETIMEBOUND;
 
   /// Of integers, characters, enumerations and sets (their lowest 32 elements); of UInt64 the bits.
   [[nodiscard]] Int64 AsOrdinal() const;

@@ -158,7 +158,7 @@ class ZQ_API Variant {
   [[nodiscard]] TVarType Type() const noexcept { return FType; }
   /// Element of an array with one dimension, by its index; valid as long as the array. Raises EVariantTypeCast for what
   /// is no array, EVariantBadIndex.
-  [[nodiscard]] const Variant& operator[](Integer AIndex) const;
+  [[nodiscard]] const Variant& operator[](Integer AIndex) const ZQ_LIFETIMEBOUND;
 
   friend ZQ_API std::partial_ordering operator<=>(const Variant& A, const Variant& B);
   friend bool operator==(const Variant& A, const Variant& B) { return std::is_eq(A <=> B); }
@@ -249,7 +249,8 @@ class ZQ_API Variant {
 [[nodiscard]] ZQ_API Integer VarArrayLowBound(const Variant& AArray, Integer ADimension);
 [[nodiscard]] ZQ_API Integer VarArrayHighBound(const Variant& AArray, Integer ADimension);
 /// One index for each dimension. Raises as the bounds do.
-[[nodiscard]] ZQ_API const Variant& VarArrayGet(const Variant& AArray, std::initializer_list<Integer> AIndices);
+[[nodiscard]] ZQ_API const Variant& VarArrayGet(
+    const Variant& AArray ZQ_LIFETIMEBOUND, std::initializer_list<Integer> AIndices);
 /// Stores AValue as the array's element type.
 ZQ_API void VarArrayPut(Variant& AArray, const Variant& AValue, std::initializer_list<Integer> AIndices);
 
