@@ -1,6 +1,6 @@
 #include "common/rZqCommon.h"
 
-#include <ranges>
+#include <iterator>
 
 #include "common/uZqClasses.h"
 #include "common/uZqLogAppenders.h"
@@ -34,8 +34,8 @@ void Initialize() {
 }
 
 void Finalize() {
-  for (const TPackageUnit& Unit : std::views::reverse(cUnits))
-    if (Unit.Stop != nullptr) Unit.Stop();
+  for (auto Unit = std::rbegin(cUnits); Unit != std::rend(cUnits); ++Unit)
+    if (Unit->Stop != nullptr) Unit->Stop();
 }
 
 const TPackageInfo& GetPackageInfoTable() {
