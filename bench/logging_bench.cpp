@@ -22,6 +22,7 @@
 #include "common/uZqLogAppenders.h"
 #include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
+#include "runtime/core/utf8.h"
 
 namespace {
 
@@ -57,7 +58,7 @@ struct TFolder {
 /// root.bench.line, whose messages reach one rolling appender on the root logger.
 struct TLogging {
   explicit TLogging(Cardinal AMaxSize = 0, Word ABackups = 5) {
-    const auto Appender = Logger()->GetAppenders()->Add(
+    Appender = Logger()->GetAppenders()->Add(
         TZqLogBaseClass::Of<TZqRollingFileAppender>(), TZqLogBaseClass::Of<TZqSimpleLayout>());
     const auto File = Appender.As<IZqRollingFileAppender>();
     File->SetFileName(FromUTF8(Folder.Path + "/app.log"));
@@ -67,6 +68,7 @@ struct TLogging {
   }
   ~TLogging() { Logger()->ClearAppenders(); }
   TFolder Folder;
+  IntfRef<IZqLogAppender> Appender;
   IntfRef<IZqLogger> Log;
 };
 
@@ -125,6 +127,63 @@ void LineByLoggerToOneWrite(benchmark::State& AState) {
   AState.counters["allocations"] = static_cast<double>(Allocated) / static_cast<double>(cLines * Ratios.size());
 }
 BENCHMARK(LineByLoggerToOneWrite)->Unit(benchmark::kMillisecond)->Iterations(101);
+
+// Layouts of a host that make the line of the simple one.
+class THostTextLayout : public Implements<TZqLogBase, IZqLogLayout> {
+ public:
+  using Implements::Implements;
+  UnicodeString GetHeader() override { return {}; }
+  UnicodeString GetFooter() override { return {}; }
+  UnicodeString FormatLine(const UnicodeString& ALoggerName, TZqLogLevel, const UnicodeString& ALogMessage, PZqDataRec,
+      TZqLogIndent) override {
+    return u"2021-12-23 10:53:18:123 - Info " + ALoggerName + u" - " + ALogMessage;
+  }
+
+ protected:
+  ~THostTextLayout() override = default;
+};
+class THostByteLayout : public Implements<THostTextLayout, IZqLogByteLayout> {
+ public:
+  using Implements::Implements;
+  void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel, const UnicodeString& ALogMessage,
+      PZqDataRec, TZqLogIndent) override {
+    ALine.AppendBytes("2021-12-23 10:53:18:123 - Info ");
+    ALine.Append(ALoggerName);
+    ALine.AppendBytes(" - ");
+    ALine.Append(ALogMessage);
+  }
+
+ protected:
+  ~THostByteLayout() override = default;
+};
+
+// A line by a host's layout against the same line by the simple one: time to time.
+void HostLayoutToSimple(benchmark::State& AState, TZqLogBaseClass ALayout) {
+  constexpr std::size_t cLines = 5000;
+  const TLogging Simple;
+  const auto Host = New<TZqFileAppender>(Logger(), u"host");
+  const IntfRef<IZqFileAppender> File(Host);
+  File->SetFileName(FromUTF8(Simple.Folder.Path + "/host.log"));
+  Host->SetLayout(ALayout);
+  const UnicodeString Message = cMessage;
+  std::vector<double> Ratios;
+  for (auto _ : AState) {
+    const double Own = Seconds([&] { Lines(cLines, [&] { Simple.Log->Info(Message); }); });
+    Logger()->ClearAppenders();
+    Logger()->AddAppender(IntfRef<IZqLogAppender>(Host));
+    const double Hosts = Seconds([&] { Lines(cLines, [&] { Simple.Log->Info(Message); }); });
+    Logger()->ClearAppenders();
+    Logger()->AddAppender(Simple.Appender);
+    Ratios.push_back(Hosts / Own);
+  }
+  AState.counters["ratio"] = Median(Ratios);
+}
+BENCHMARK_CAPTURE(HostLayoutToSimple, bytes, TZqLogBaseClass::Of<THostByteLayout>())
+    ->Unit(benchmark::kMillisecond)
+    ->Iterations(101);
+BENCHMARK_CAPTURE(HostLayoutToSimple, text, TZqLogBaseClass::Of<THostTextLayout>())
+    ->Unit(benchmark::kMillisecond)
+    ->Iterations(101);
 
 // Threads on one appender, against the same bytes written under one std::mutex: lines per second to lines per second.
 void ThreadsOnOneAppenderToOneMutex(benchmark::State& AState) {
