@@ -8,10 +8,10 @@
 #include "runtime/core/exceptions.h"
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
-#include "runtime/values/variants.h"
 #include "runtime/core/varrec.h"
 #include "runtime/io/streams.h"
 #include "runtime/text/format.h"
+#include "runtime/values/variants.h"
 
 /// Texts, exceptions with codes and small utilities. All but the registry of exception classes may run on any thread.
 namespace zq {

@@ -12,6 +12,7 @@
 namespace zq {
 
 class TObject;
+struct EInvalidOperation;  // runtime/core/exceptions.h has it
 
 /// Names a class by C++'s type identity, which holds across shared libraries. The empty one names none.
 class ZQ_API TClass {

@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "runtime/core/api.h"
+#include "runtime/core/exceptions.h"
 #include "runtime/core/objects.h"
 #include "runtime/core/strings.h"
 

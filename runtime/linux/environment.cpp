@@ -1,8 +1,7 @@
-#include "runtime/platform/environment_service.h"
-
 #include <cstdlib>
 
 #include "runtime/core/utf8.h"
+#include "runtime/platform/environment_service.h"
 
 namespace zq {
 

@@ -1,4 +1,4 @@
-#include "runtime/platform/file_service.h"
+#include "runtime/io/files.h"
 
 #include <fcntl.h>
 #include <sys/file.h>
@@ -10,9 +10,9 @@
 #include <filesystem>
 #include <string_view>
 
-#include "runtime/io/files.h"
 #include "runtime/io/paths.h"
 #include "runtime/linux/system_files.h"
+#include "runtime/platform/file_service.h"
 #include "runtime/text/numbers.h"
 
 namespace zq {

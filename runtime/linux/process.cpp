@@ -1,11 +1,10 @@
-#include "runtime/platform/process_facts.h"
-
 #include <sys/utsname.h>
 
 #include <string>
 #include <string_view>
 
 #include "runtime/linux/system_files.h"
+#include "runtime/platform/process_facts.h"
 
 namespace zq {
 

@@ -1,11 +1,10 @@
-#include "runtime/platform/registry_service.h"
-
 #include <algorithm>
 #include <memory>
 #include <string>
 #include <string_view>
 
 #include "runtime/linux/system_files.h"
+#include "runtime/platform/registry_service.h"
 
 namespace zq {
 

@@ -1,11 +1,10 @@
-#include "runtime/platform/resource_service.h"
-
 #include <dlfcn.h>
 #include <sys/auxv.h>
 
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
 #include "runtime/io/streams.h"
+#include "runtime/platform/resource_service.h"
 
 namespace zq {
 

@@ -1,5 +1,3 @@
-#include "runtime/platform/shell_service.h"
-
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -16,9 +14,10 @@
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
 #include "runtime/io/text_file.h"
-#include "runtime/text/local_time.h"
 #include "runtime/linux/system_files.h"
+#include "runtime/platform/shell_service.h"
 #include "runtime/text/datetime.h"
+#include "runtime/text/local_time.h"
 
 namespace zq {
 

@@ -1,5 +1,3 @@
-#include "runtime/platform/user_service.h"
-
 #include <pwd.h>
 #include <unistd.h>
 
@@ -8,6 +6,7 @@
 #include <vector>
 
 #include "runtime/linux/system_files.h"
+#include "runtime/platform/user_service.h"
 
 namespace zq {
 

@@ -1,8 +1,8 @@
-#include "runtime/platform/version_service.h"
-
 #include <sys/utsname.h>
 
 #include <cstdio>
+
+#include "runtime/platform/version_service.h"
 
 namespace zq {
 

@@ -4,8 +4,8 @@
 #include <chrono>
 #include <optional>
 
-#include "runtime/text/local_time.h"
 #include "runtime/text/casing.h"
+#include "runtime/text/local_time.h"
 
 namespace zq {
 

@@ -82,9 +82,9 @@ ZQ_API void DecodeTime(TDateTime AValue, Word& AHour, Word& AMinute, Word& ASeco
 ///   t tt c ddddd dddddd  short time, long time, date with the time if there is one, short date, long date
 ///   "text" 'text'        as it is
 ///
-/// Every other character is copied, ":" and "/" too. A letter of the table that is to stand for itself goes into quotes:
-/// yyyy-mm-dd"T"hh:nn:ss, where an unquoted T would write the short time. Without settings these go by FormatSettings(). They and the next
-/// ones raise EConvertError for a moment before year 1 or behind 9999.
+/// Every other character is copied, ":" and "/" too. A letter of the table that is to stand for itself goes into
+/// quotes: yyyy-mm-dd"T"hh:nn:ss, where an unquoted T would write the short time. Without settings these go by
+/// FormatSettings(). They and the next ones raise EConvertError for a moment before year 1 or behind 9999.
 [[nodiscard]] ZQ_API UnicodeString FormatDateTime(const UnicodeString& APattern, TDateTime AValue);
 [[nodiscard]] ZQ_API UnicodeString FormatDateTime(
     const UnicodeString& APattern, TDateTime AValue, const TFormatSettings& ASettings);

@@ -2,6 +2,7 @@
 
 #include <span>
 
+#include "runtime/core/exceptions.h"
 #include "runtime/core/strings.h"
 #include "runtime/core/varrec.h"
 #include "runtime/text/format_settings.h"

@@ -7,8 +7,8 @@
 #include <typeindex>
 #include <unordered_map>
 
-#include "runtime/values/values.h"
 #include "runtime/text/numbers.h"
+#include "runtime/values/values.h"
 
 namespace zq {
 

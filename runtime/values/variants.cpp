@@ -4,11 +4,11 @@
 #include <limits>
 #include <optional>
 
-#include "runtime/values/typeinfo.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/format_settings.h"
 #include "runtime/text/numbers.h"
+#include "runtime/values/typeinfo.h"
 
 namespace zq {
 
