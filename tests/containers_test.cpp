@@ -1,14 +1,11 @@
 #include <gtest/gtest.h>
 
-#include <functional>
-#include <thread>
 #include <tuple>
 
 #include "runtime/containers/collection.h"
 #include "runtime/containers/lists.h"
 #include "runtime/io/string_list.h"
 #include "runtime/text/encoding.h"
-#include "tests/support/raised.h"
 #include "tests/support/support.h"
 
 namespace zq {
@@ -88,12 +85,9 @@ TEST(Lists, AnInterfaceListGoesByTheObjectAndHoldsACount) {
 
 TEST(ThreadList, ThreadsAddEachItemOnceAndTheOwnerMayNest) {
   TThreadListOf<int> List;
-  std::vector<std::jthread> Threads(4);
-  for (auto& Thread : Threads)
-    Thread = std::jthread([&List] {
-      for (int i = 0; i < 200; ++i) List.Add(i);
-    });
-  Threads.clear();
+  OnThreads(4, [&](int) {
+    for (int i = 0; i < 200; ++i) List.Add(i);
+  });
   const auto Locked = List.Locked();
   List.Remove(0);
   EXPECT_EQ(Locked->Count(), 199);

@@ -13,7 +13,6 @@
 #include "runtime/core/exceptions.h"
 #include "runtime/core/objects.h"
 #include "tests/plugin/plugin.h"
-#include "tests/support/raised.h"
 #include "tests/support/support.h"
 
 namespace zq {

@@ -14,7 +14,6 @@
 #include "runtime/io/streams.h"
 #include "runtime/io/text_file.h"
 #include "runtime/text/encoding.h"
-#include "tests/support/raised.h"
 #include "tests/support/support.h"
 
 namespace zq {

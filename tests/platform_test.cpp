@@ -7,7 +7,6 @@
 #include "runtime/platform/clock_service.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/local_time.h"
-#include "tests/support/environment_scope.h"
 #include "tests/support/scripted_registry.h"
 #include "tests/support/support.h"
 

@@ -10,6 +10,7 @@
 
 #include "runtime/sync/event.h"
 #include "runtime/sync/thread.h"
+#include "tests/support/support.h"
 
 namespace zq {
 namespace {
@@ -164,23 +165,19 @@ TEST(SyncQueue, QueuedCallsRunInOrderAndARaiseLeavesTheRest) {
 TEST(LockMonitor, KeepsThreadsApartAndNests) {
   const TSimpleEvent Object, Other;
   Integer Guarded = 0, Interlocked = 0;
-  std::vector<TThreadHandle> Threads;
   TMonitor::Enter(&Object);
-  for (int t = 0; t < 4; ++t)
-    Threads.push_back(BeginThread([&] {
-      EXPECT_FALSE(TMonitor::Enter(&Object, 5));
-      EXPECT_THROW(TMonitor::Exit(&Object), EThread);
-      for (int i = 0; i < 500; ++i) {
-        TMonitor::Enter(&Other);
-        EXPECT_TRUE(TMonitor::TryEnter(&Other));
-        ++Guarded;
-        TMonitor::Exit(&Other);
-        TMonitor::Exit(&Other);
-        TInterlocked::Increment(Interlocked);
-      }
-      return 0;
-    }));
-  for (const auto& Thread : Threads) Thread->Ended().WaitFor();
+  OnThreads(4, [&](int) {
+    EXPECT_FALSE(TMonitor::Enter(&Object, 5));
+    EXPECT_THROW(TMonitor::Exit(&Object), EThread);
+    for (int i = 0; i < 500; ++i) {
+      TMonitor::Enter(&Other);
+      EXPECT_TRUE(TMonitor::TryEnter(&Other));
+      ++Guarded;
+      TMonitor::Exit(&Other);
+      TMonitor::Exit(&Other);
+      TInterlocked::Increment(Interlocked);
+    }
+  });
   TMonitor::Exit(&Object);
   EXPECT_EQ(std::pair(Guarded, Interlocked), std::pair(2000, 2000));
 }

@@ -5,7 +5,6 @@
 #include "runtime/platform/clock_service.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/local_time.h"
-#include "tests/support/raised.h"
 #include "tests/support/support.h"
 
 namespace zq {

@@ -2,18 +2,14 @@
 
 #include <cmath>
 #include <cstdlib>
-#include <filesystem>
 #include <limits>
 #include <optional>
 
-#include "runtime/core/exceptions.h"
 #include "runtime/text/casing.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/format.h"
 #include "runtime/text/numbers.h"
 #include "runtime/values/variants.h"
-#include "tests/support/environment_scope.h"
-#include "tests/support/raised.h"
 #include "tests/support/support.h"
 
 // With LOCPATH set the system's newlocale leaks the search path that it makes of it.

@@ -2,13 +2,10 @@
 
 #include <gtest/gtest.h>
 
-#include <string>
 #include <thread>
 #include <utility>
-#include <vector>
 
 #include "runtime/values/typeinfo.h"
-#include "tests/support/raised.h"
 #include "tests/support/support.h"
 
 namespace zq {

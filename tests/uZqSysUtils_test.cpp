@@ -9,7 +9,6 @@
 #include "runtime/text/datetime.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/local_time.h"
-#include "tests/support/raised.h"
 #include "tests/support/scripted_registry.h"
 #include "tests/support/support.h"
 

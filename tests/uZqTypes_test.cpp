@@ -13,7 +13,6 @@
 #include "runtime/io/streams.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/format_settings.h"
-#include "tests/support/raised.h"
 #include "tests/support/support.h"
 
 namespace zq {

@@ -16,8 +16,6 @@
 #include "runtime/platform/version_service.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/local_time.h"
-#include "tests/support/environment_scope.h"
-#include "tests/support/raised.h"
 #include "tests/support/scripted_registry.h"
 #include "tests/support/support.h"
 

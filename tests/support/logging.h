@@ -1,9 +1,6 @@
 #pragma once
 
-#include <functional>
 #include <mutex>
-#include <string>
-#include <vector>
 
 #include "common/uZqLogAppenders.h"
 #include "common/uZqLogLayouts.h"
@@ -19,16 +16,24 @@ class TNotingAppender : public Implements<TInterfacedObject, IZqLogAppender> {
   UnicodeString GetName() const override { return u"noting"; }
   TComponent* Component() override { return nullptr; }
   void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
-      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override {
+    {
+      const std::lock_guard Guard(FLock);
+      Sender = ASender;
+      Indent = ALogIndent;
+      FNotes.push_back((ALoggerName + u" " + ZqLogLevels[ALogLevel] + u" " + ALogMessage).ToUTF8());
+    }
+    if (OnWrite) OnWrite(AValue);
+  }
   void Close() override {}
-  [[nodiscard]] std::vector<std::string> Notes() const;
+  [[nodiscard]] std::vector<std::string> Notes() const {
+    const std::lock_guard Guard(FLock);
+    return FNotes;
+  }
 
   std::function<void(PZqDataRec)> OnWrite;
   UnicodeString Sender;
   TZqLogIndent Indent = liIndentNone;
-
- protected:
-  ~TNotingAppender() override = default;
 
  private:
   mutable std::mutex FLock;
@@ -37,7 +42,10 @@ class TNotingAppender : public Implements<TInterfacedObject, IZqLogAppender> {
 
 /// A logger of its own below the root, at llAll, whose messages go no further up; the root is left as it was found.
 struct TLoggerFixture {
-  explicit TLoggerFixture(const char16_t* AName = u"test");
+  explicit TLoggerFixture(const char16_t* AName = u"test") : Log(Logger()->GetLogger(AName)) {
+    Log->SetLevel(llAll);
+    Log->SetAdditive(false);
+  }
   IntfRef<IZqLogger> Log;
 };
 

@@ -6,6 +6,7 @@
 #include <algorithm>
 #include <fstream>
 #include <iterator>
+#include <thread>
 
 namespace zq {
 
@@ -45,6 +46,27 @@ void TTempFolder::Write(std::string_view AName, std::string_view AContent) const
 }
 
 std::string TTempFolder::Read(std::string_view AName) const { return ReadFile(FPath / AName); }
+
+TEnvironmentScope::TEnvironmentScope(const char* AName, const std::string& AValue) : FName(AName) {
+  if (const char* const Saved = ::getenv(AName)) FSaved = Saved;
+  ::setenv(AName, AValue.c_str(), 1);
+}
+
+TEnvironmentScope::~TEnvironmentScope() { FSaved ? ::setenv(FName, FSaved->c_str(), 1) : ::unsetenv(FName); }
+
+void OnThreads(int ACount, const std::function<void(int)>& ABody) {
+  std::vector<std::jthread> Threads;
+  for (int i = 0; i < ACount; ++i) Threads.emplace_back(ABody, i);
+}
+
+UnicodeString RaisedBy(const std::function<void()>& AAction) {
+  try {
+    AAction();
+  } catch (const Exception& e) {
+    return e.ClassName() + u": " + e.Message();
+  }
+  return u"nothing";
+}
 
 std::string ReadFile(const std::filesystem::path& APath) {
   std::ifstream Stream(APath, std::ios::binary);

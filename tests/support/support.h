@@ -1,13 +1,14 @@
 #pragma once
 
-#include <cstdint>
 #include <filesystem>
+#include <functional>
+#include <optional>
 #include <ostream>
 #include <string>
 #include <string_view>
 #include <vector>
 
-#include "runtime/core/strings.h"
+#include "runtime/core/exceptions.h"
 
 namespace zq {
 
@@ -38,6 +39,23 @@ class TTempFolder {
   std::filesystem::path FPath;
 };
 
+/// Sets a variable of the environment for a scope.
+class TEnvironmentScope {
+ public:
+  TEnvironmentScope(const char* AName, const std::string& AValue);
+  TEnvironmentScope(const TEnvironmentScope&) = delete;
+  TEnvironmentScope& operator=(const TEnvironmentScope&) = delete;
+  ~TEnvironmentScope();
+
+ private:
+  const char* FName;
+  std::optional<std::string> FSaved;
+};
+
+/// Runs ABody with the numbers below ACount, each on a thread of its own, and waits for their ends.
+void OnThreads(int ACount, const std::function<void(int)>& ABody);
+/// Class and message of what AAction raises, as "EClass: message"; "nothing" if it raises nothing.
+[[nodiscard]] UnicodeString RaisedBy(const std::function<void()>& AAction);
 [[nodiscard]] std::string ReadFile(const std::filesystem::path& APath);
 [[nodiscard]] std::vector<std::string> SplitLines(std::string_view AText);  // at CR LF; the last one has none
 
