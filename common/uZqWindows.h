@@ -84,9 +84,10 @@ ZQ_API void ZqCreateShortcut(const UnicodeString& ATarget, const UnicodeString& 
 /// The system as a code: 601 and above is one with the services of its sixth generation; Linux is 621. Raises
 /// Exception.
 [[nodiscard]] ZQ_API Word ZqGetWindowsVersion();
-/// Path of the shell folder with that number, made if it isn't there. Raises Exception ("Invalid pidl").
+/// Path of the shell folder with that number, made if it isn't there; on Linux the user's own ones (home, desktop,
+/// documents, music, pictures, videos, templates) are named, not made. Raises Exception ("Invalid pidl").
 [[nodiscard]] ZQ_API UnicodeString ZqGetShellFolder(Integer ACsidl);
-/// The user's folder for documents, made if it isn't there.
+/// The user's folder for documents. On Linux it may not be there.
 [[nodiscard]] ZQ_API UnicodeString ZqGetMyDocumentsFolder();
 
 }  // namespace zq

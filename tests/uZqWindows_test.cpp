@@ -234,15 +234,21 @@ TEST(ShellFolders, ATreeGoesWithoutWhatItsLinksLeadToEvenIfTheShellFails) {
   EXPECT_EQ(Shell.Calls, (std::vector<std::pair<Cardinal, Word>>{{4, 0x0610}, {3, 0x0454}, {3, 0x0414}, {3, 0x0414}}));
 }
 
-TEST(ShellFolders, FollowTheUsersChoiceAndAreMade) {
+TEST(ShellFolders, FollowTheUsersChoiceAndThoseOfProgramsAreMade) {
   const TTempFolder Home;
-  const TEnvironmentScope Values[] = {{"HOME", Home.Path().string() + "/"},
+  const TEnvironmentScope Values[] = {{"HOME", Home.Path().string() + "/"}, {"XDG_CACHE_HOME", ""},
       {"XDG_DATA_HOME", Home.Path().string() + "/data"}, {"XDG_CONFIG_HOME", "relative is no choice"}};
-  EXPECT_TRUE(ZqGetShellFolder(46) == Home.File("data") && fs::is_directory(Home.Path() / "data"));
-  EXPECT_EQ(ZqGetMyDocumentsFolder(), Home.File("Documents"));
-  fs::create_directory(Home.Path() / ".config");
+  const std::pair<Integer, const char*> cUsers[] = {{0, "Desktop"}, {5, "Documents"}, {13, "Music"}, {14, "Videos"},
+      {16, "Desktop"}, {21, "Templates"}, {39, "Pictures"}};
+  const std::pair<Integer, const char*> cPrograms[] = {{2, "data/applications"}, {7, ".config/autostart"},
+      {20, "data/fonts"}, {26, ".config"}, {28, "data"}, {32, ".cache"}, {35, "data"}, {46, "data"}};
+  for (const auto& [Csidl, Name] : cUsers) EXPECT_EQ(ZqGetShellFolder(Csidl), Home.File(Name));
+  EXPECT_EQ(Home.Names(), std::vector<std::string>());
+  for (const auto& [Csidl, Name] : cPrograms)
+    EXPECT_TRUE(ZqGetShellFolder(Csidl) == Home.File(Name) && fs::is_directory(Home.Path() / Name)) << Name;
   Home.Write(".config/user-dirs.dirs", "# XDG_DOCUMENTS_DIR=\"/no\"\nXDG_DOCUMENTS_DIR=\"$HOME/Bob's\\ Docs/\"\n");
   EXPECT_EQ(ZqGetMyDocumentsFolder(), Home.File("Bob's Docs"));
+  EXPECT_EQ(Home.Names(), (std::vector<std::string>{".cache", ".config", "data"}));
   EXPECT_EQ(RaisedBy([] { (void)ZqGetShellFolder(12345); }), u"Exception: Invalid pidl");
 }
 

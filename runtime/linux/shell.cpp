@@ -6,7 +6,7 @@
 #include <cerrno>
 #include <charconv>
 #include <filesystem>
-#include <optional>
+#include <iterator>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -88,19 +88,22 @@ std::string UserFolder(std::string_view AVariable) {
   return Value.starts_with('/') ? Value : std::string();
 }
 
-std::string PathOf(const TShellFolder& AFolder) {
-  if (AFolder.Variable == nullptr) return HomeFolder();
-  const std::string_view Variable = AFolder.Variable;
-  std::string Path;
-  if (Variable.ends_with("_DIR") && EnvironmentText(AFolder.Variable).empty()) Path = UserFolder(Variable);
-  if (Path.empty()) Path = XdgFolder(AFolder.Variable, AFolder.Usual);
-  return Path + AFolder.Below;
+// Its place is the user's to choose, and so is whether it exists.
+bool IsUsersOwn(const TShellFolder& AFolder) {
+  return AFolder.Variable == nullptr || std::string_view(AFolder.Variable).ends_with("_DIR");
 }
 
-std::optional<UnicodeString> FindShellFolder(Integer ACsidl) {
-  for (const TShellFolder& Folder : cShellFolders)
-    if (Folder.Csidl == ACsidl) return FromSystemPath(PathOf(Folder));
-  return std::nullopt;
+UnicodeString PathOf(const TShellFolder& AFolder) {
+  if (AFolder.Variable == nullptr) return FromSystemPath(HomeFolder());
+  std::string Path;
+  if (IsUsersOwn(AFolder) && EnvironmentText(AFolder.Variable).empty()) Path = UserFolder(AFolder.Variable);
+  if (Path.empty()) Path = XdgFolder(AFolder.Variable, AFolder.Usual);
+  return FromSystemPath(Path + AFolder.Below);
+}
+
+const TShellFolder* FindShellFolder(Integer ACsidl) noexcept {
+  const auto* const Found = std::ranges::find(cShellFolders, ACsidl, &TShellFolder::Csidl);
+  return Found == std::end(cShellFolders) ? nullptr : Found;
 }
 
 // ----------------------------------------------------------------------------------------------------------- Trash
@@ -314,17 +317,19 @@ class TDesktopEntry : public TShellLink {
 class TLinuxShell final : public TShellService {
  public:
   bool SHGetSpecialFolderPath(Integer ACsidl, bool ACreate, UnicodeString& APath) override {
-    const auto Found = FindShellFolder(ACsidl);
-    if (!Found || (ACreate && !ForceDirectories(*Found))) return false;
-    APath = *Found;
+    const TShellFolder* const Folder = FindShellFolder(ACsidl);
+    if (Folder == nullptr) return false;
+    const UnicodeString Path = PathOf(*Folder);
+    if (ACreate && !IsUsersOwn(*Folder) && !ForceDirectories(Path)) return false;
+    APath = Path;
     return true;
   }
 
   bool SHGetMalloc() override { return true; }
 
   TItemList SHGetSpecialFolderLocation(Integer ACsidl) override {
-    const auto Found = FindShellFolder(ACsidl);
-    return Found ? new UnicodeString(*Found) : nullptr;
+    const TShellFolder* const Folder = FindShellFolder(ACsidl);
+    return Folder == nullptr ? nullptr : new UnicodeString(PathOf(*Folder));
   }
 
   bool SHGetPathFromIDList(TItemList AList, UnicodeString& APath) override {

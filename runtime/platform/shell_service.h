@@ -43,7 +43,9 @@ class ZQ_API TShellService {
   static TServiceSlot<TShellService> Slot;
 
   /// Path of the shell folder with that number; with ACreate it is made if it isn't there. On Linux the XDG folders: a
-  /// program's files for all users (46) lie in the user's data folder, which is always writable.
+  /// program's files for all users (46) lie in the user's data folder, which is always writable. Only what belongs to
+  /// programs is made there (data, settings, cache, applications, autostart, fonts); the user's own folders (home,
+  /// desktop, documents, music, pictures, videos, templates) are named and left to the user.
   [[nodiscard]] virtual bool SHGetSpecialFolderPath(Integer ACsidl, bool ACreate, UnicodeString& APath) = 0;
   /// The shell's allocator is there.
   [[nodiscard]] virtual bool SHGetMalloc() = 0;
