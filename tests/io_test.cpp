@@ -2,24 +2,23 @@
 #include <sys/resource.h>
 
 #include <csignal>
-#include <filesystem>
 #include <fstream>
 #include <map>
 #include <set>
 
-#include "common/uZqSysUtils.h"
-#include "runtime/core/exceptions.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
 #include "runtime/io/streams.h"
 #include "runtime/io/text_file.h"
 #include "runtime/text/encoding.h"
+#include "tests/fakes/resources.h"
 #include "tests/support/support.h"
 
 namespace zq {
 namespace {
 
 namespace fs = std::filesystem;
+using testing::Eq, testing::Return;
 
 // -------------------------------------------------------------------------------------------------------- Paths
 
@@ -254,20 +253,14 @@ TEST(Streams, ShareModesKeepOutThoseWhoAskForOneToo) {
   }
 }
 
-TEST(Streams, ResourcesLieBesideTheirModule) {
-  const fs::path Folder = ToSystemPath(ParamStr(0)) + ".resources";
-  fs::create_directories(Folder / "RCDATA");
-  std::ofstream(Folder / "RCDATA/Logo.png") << "PNG";
-  std::ofstream(Folder / "RCDATA/7") << "seven";
-  TResourceStream Logo(MainInstance(), u"LOGO.PNG", RT_RCDATA), ById(MainInstance(), 7, u"rcdata");
-  EXPECT_EQ(Content(Logo) + Content(ById), "PNGseven");
+TEST(Streams, AResourceIsReadOnlyAndIsMissedByName) {
+  TScriptedResources Resources;
+  EXPECT_CALL(Resources, LoadResource(HInstance(), Eq(u"Logo"), Eq(u"#10"))).WillOnce(Return(TBytes{'P', 'N', 'G'}));
+  EXPECT_CALL(Resources, LoadResource(MainInstance(), Eq(u"#7"), Eq(u"text"))).WillOnce(Return(std::nullopt));
+  TResourceStream Logo(HInstance(), u"Logo", RT_RCDATA);
+  EXPECT_EQ(Content(Logo), "PNG");
   EXPECT_THROW(Logo.Write("x", 1), EStreamError);
-  EXPECT_THROW(TResourceStream(MainInstance(), u"none", RT_RCDATA), EResNotFound);
-  EXPECT_FALSE(Service<TResourceService>().FindResource(MainInstance(), u"../RCDATA", RT_RCDATA));
-  EXPECT_EQ(ZqGetResource(u"logo.png", RT_RCDATA)->Size(), 3) << "of the program, as the library has none";
-  const UnicodeString Raised = RaisedBy([] { (void)ZqGetResource(u"LOGO", RT_RCDATA); });
-  EXPECT_TRUE(Raised.Pos(u": There is no resource with the name: LOGO") > 1 && !ZqFindResource(u"LOGO", RT_RCDATA));
-  fs::remove_all(Folder);
+  EXPECT_EQ(RaisedBy([] { TResourceStream(MainInstance(), 7, u"text"); }), u"EResNotFound: Resource #7 not found");
 }
 
 }  // namespace

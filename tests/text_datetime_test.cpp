@@ -2,9 +2,9 @@
 
 #include <limits>
 
-#include "runtime/platform/clock_service.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/local_time.h"
+#include "tests/fakes/clock.h"
 #include "tests/support/support.h"
 
 namespace zq {
@@ -92,14 +92,8 @@ TEST(TextDateFormat, WritesEveryLetterAndCopiesTheRest) {
   EXPECT_LT(DateToStr(Evening, S).Length(), 100);
 }
 
-struct TFixedClock : TClockService {
-  Int64 UtcMicroseconds() override { return 1640000000000000; }  // 2021-12-20
-  Integer UtcOffsetSeconds(Int64) override { return 0; }
-};
-
 TEST(TextDateParse, ReadsInTheOrderOfTheShortDate) {
-  TFixedClock Clock;
-  const TPlatformOverride<TClockService> Fixed(Clock);
+  const TScriptedClock In2021;
   const std::tuple<const char16_t*, Char, const char16_t*, const char16_t*> cCases[] = {
       {u"yyyy-mm-dd", u'-', u"2021-12-23", u"2021-12-23"}, {u"dd-MM-yyyy", u'-', u"23-12-2021", u"2021-12-23"},
       {u"d/M/yy", u'/', u" 3/2/21 ", u"2021-02-03"}, {u"M/d/yyyy", u'/', u"2 / 3 / 2021", u"2021-02-03"},
@@ -139,6 +133,49 @@ TEST(TextDateParse, RefusesTheRest) {
   for (const char16_t* const Text :
       {u"", u"2021-12-23T10:30", u"2021-12-23 24:00", u"10:30 2021-12-23", u"2021-13-01 10:30"})
     EXPECT_EQ(Refusal(StrToDateTime, Text), u"date and time");
+}
+
+// ---------------------------------------------------------------------------------------------------- Local time
+
+TEST(TextLocalTime, NowIsTheLocalTimeCutToMilliseconds) {
+  const std::tuple<Int64, Integer, const char16_t*> Cases[] = {
+      {1709251199999999, 0, u"2024-02-29 23:59:59:999"},     // never shown as the next day
+      {1709251199999999, 3600, u"2024-03-01 00:59:59:999"},  // the local date decides
+      {1709251200000000, -18000, u"2024-02-29 19:00:00:000"}, {-1, 0, u"1969-12-31 23:59:59:999"}};
+  for (const auto& [Microseconds, Offset, Want] : Cases) {
+    const TScriptedClock Clock(Microseconds, Offset);
+    EXPECT_EQ(Shown(Now()), Want);
+    EXPECT_EQ(Shown(Date().Value + Time().Value), Want);
+  }
+}
+
+TEST(TextLocalTime, MillisecondsSurviveTheDouble) {
+  EXPECT_EQ(UnixMillisecondsToDateTime(0).Value, 25569.0);
+  EXPECT_EQ(UnixMillisecondsToDateTime(-2209161600000 + 21600000).Value, 0.25);
+  EXPECT_EQ(UnixMillisecondsToDateTime(-2209161600000 - 64800000).Value, -1.25);  // 1899-12-29 06:00
+  for (const Int64 Value : {Int64{1}, Int64{-1}, Int64{1709251199999}, Int64{-2209161600001}, Int64{-5000000000123}})
+    EXPECT_EQ(DateTimeToUnixMilliseconds(UnixMillisecondsToDateTime(Value)), Value);
+}
+
+TDateTime At(Word AMonth, Word ADay, Word AHour, Word AMinute) {
+  return EncodeDate(2024, AMonth, ADay) + EncodeTime(AHour, AMinute, 0, 0);
+}
+
+TEST(TextLocalTime, UniversalTimeOfEveryHourOfTheClock) {
+  const TZoneScope Zone("CET-1CEST,M3.5.0,M10.5.0/3");
+  const TTimeZone& Local = TTimeZone::Local();
+  const std::tuple<TDateTime, bool, const char16_t*> Cases[] = {{At(7, 1, 12, 0), false, u"2024-07-01 10:00:00:000"},
+      {At(1, 1, 0, 30), true, u"2023-12-31 23:30:00:000"},
+      {At(10, 27, 2, 30), false, u"2024-10-27 01:30:00:000"},  // shown twice
+      {At(10, 27, 2, 30), true, u"2024-10-27 00:30:00:000"}, {At(10, 27, 20, 0), false, u"2024-10-27 19:00:00:000"},
+      {At(3, 31, 2, 30), false, u"2024-03-31 01:30:00:000"},  // left out
+      {At(3, 31, 20, 0), false, u"2024-03-31 18:00:00:000"}};
+  for (const auto& [Moment, ForceDaylight, Utc] : Cases) {
+    EXPECT_EQ(Shown(Local.ToUniversalTime(Moment, ForceDaylight)), Utc);
+    EXPECT_EQ(Shown(Local.ToLocalTime(Local.ToUniversalTime(Moment, ForceDaylight))),
+        Shown(Moment == At(3, 31, 2, 30) ? At(3, 31, 3, 30) : Moment));
+  }
+  EXPECT_EQ(Local.UtcOffset(At(7, 1, 12, 0)), 7200);
 }
 
 }  // namespace

@@ -11,6 +11,7 @@
 #include <set>
 
 #include "runtime/text/numbers.h"
+#include "tests/fakes/clock.h"
 #include "tests/support/logging.h"
 
 namespace zq {
@@ -24,7 +25,6 @@ const std::string cTime = "2021-12-23 10:53:18:123";
 
 TEST(LayoutSimple, MakesTheToldLine) {
   TScriptedClock Clock;
-  const TPlatformOverride<TClockService> Override(Clock);
   const auto Layout = IntfRef<IZqLogBase>(New<TZqSimpleLayout>(Logger(), u"l")).As<IZqLogLayout>();
   const auto Line = [&](TZqLogLevel ALevel, PZqDataRec AValue, TZqLogIndent AIndent) {
     return Layout->FormatLine(u"root.a", ALevel, u"x", AValue, AIndent).ToUTF8();
@@ -47,8 +47,7 @@ TEST(LayoutSimple, MakesTheToldLine) {
 // ---------------------------------------------------------------------------------------- file appender
 
 struct AppenderFile : testing::Test, TLoggerFixture {
-  TScriptedClock Clock;
-  const TPlatformOverride<TClockService> Override{Clock};
+  const TScriptedClock Clock;
   const TTempFolder Folder;
   const IntfRef<IZqFileAppender> File = AddFile(Log, Folder.File("app.log"));
 };

@@ -4,16 +4,20 @@
 
 #include "runtime/containers/lists.h"
 #include "runtime/io/string_list.h"
-#include "runtime/platform/clock_service.h"
-#include "runtime/platform/desktop_service.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/encoding.h"
-#include "runtime/text/local_time.h"
-#include "tests/support/scripted_registry.h"
-#include "tests/support/support.h"
+#include "tests/fakes/clock.h"
+#include "tests/fakes/desktop.h"
+#include "tests/fakes/files.h"
+#include "tests/fakes/process.h"
+#include "tests/fakes/registry.h"
+#include "tests/fakes/resources.h"
+#include "tests/fakes/users.h"
 
 namespace zq {
 namespace {
+
+using testing::_, testing::DoAll, testing::Eq, testing::Return, testing::SetArgReferee;
 
 // ---- Coded exceptions ----------------------------------------------------------------------------------------------
 
@@ -22,10 +26,6 @@ struct EShop : EZqException {
 };
 struct EShopClosed : EZqAbort {
   using EZqAbort::EZqAbort;
-};
-
-struct TOpenDesktop : TDesktopService {
-  bool FindWindow(const char16_t*, const char16_t*) override { return true; }
 };
 
 TEST(ExceptionRegistry, FindsByGroupAndCodeAndRefusesAnotherClassForThem) {
@@ -42,8 +42,9 @@ TEST(ExceptionRegistry, FindsByGroupAndCodeAndRefusesAnotherClassForThem) {
   for (const char16_t* const Group : {u"shop", u""})
     EXPECT_GT(RaisedBy([&] { ZqRegisterExceptionClass(Group, 1, EZqAbortClass::Of<EShopClosed>()); }).Pos(Clash), 1);
   ZqRegisterExceptionClass(u"", 1, EZqExceptionClass::Of<EShop>());
-  TOpenDesktop Desktop;  // the development environment is open, which lets a clash pass
-  const TPlatformOverride<TDesktopService> Fake(Desktop);
+  TScriptedDesktop Desktop;  // the development environment is open, which lets a clash pass
+  EXPECT_CALL(Desktop, FindWindow(_, testing::IsNull())).Times(3).WillRepeatedly(Return(false));
+  EXPECT_CALL(Desktop, FindWindow(_, testing::NotNull())).WillOnce(Return(true));
   EXPECT_NO_THROW(ZqRegisterExceptionClass(u"shop", 1, EZqAbortClass::Of<EShopClosed>()));
   EXPECT_EQ(ZqGetExceptionClass(u"shop", 1), ExceptionClass::Of<EShop>());
   EXPECT_EQ(uZqSysUtils::ExceptionClassList->Count(), 2);
@@ -80,20 +81,12 @@ TEST(CharCase, OfEveryModeInBothWidths) {
   EXPECT_EQ(ZqCharCase(u"\U00010428\U00010428", rcUpperCamelCase), u"\U00010400\U00010428");
 }
 
-struct TTurnOfTheYear : TClockService {  // 2021-12-31 23:30 UTC, an hour later on the local clock
-  Int64 UtcMicroseconds() override { return 1640993400LL * 1000000; }
-  Integer UtcOffsetSeconds(Int64) override { return 3600; }
-};
-
 TEST(StringIncrement, AndAgeGoByTheLocalYear) {
-  TTurnOfTheYear Clock;
-  const TPlatformOverride<TClockService> Fake(Clock);
-  TTimeZone::Refresh();
+  const TScriptedClock Clock(1640993400LL * 1000000, 3600);  // 2022-01-01 00:30, still 2021 by UTC
   EXPECT_EQ(ZqStringIncrement(u"", 5) + ZqStringIncrement(u" \t ", -3), u"202200001202200001");
   EXPECT_EQ(ZqAge(EncodeDate(2000, 1, 1)), 22);
   EXPECT_EQ(ZqAge(EncodeDate(2000, 1, 2)), 21);
   EXPECT_EQ(ZqAge(0) + ZqAge(-20000), 0);
-  TTimeZone::Refresh();
 }
 
 TEST(StringIncrement, CountsTheDigitsAtTheEnd) {
@@ -200,7 +193,6 @@ TEST(Bits, CountFromOne) {
 
 TEST(MimeType, IsReadUnderTheLowerCaseExtension) {
   TScriptedRegistry Registry;
-  const TPlatformOverride<TRegistryService> Fake(Registry);
   Registry.Keys[u"HKCR\\.txt"][u"Content Type"] = {REG_SZ, {'t', 0, '/', 0, 'p', 0, 0, 0}};
   EXPECT_EQ(ZqGetFileMimeType(u"dir.d/A.TXT") + ZqGetFileMimeType(u"dir.d/noext"), u"t/p");
 }
@@ -228,7 +220,49 @@ TEST(BitnessOfAFile, IsReadFromItsHeaders) {
     EXPECT_FALSE(Is64Bit(No));
   for (const std::size_t Size : {63U, 375U}) EXPECT_THROW(Is64Bit(ProgramFile(0x8664).substr(0, Size)), EReadError);
   EXPECT_FALSE(Is64BitFile(u"sh")) << "found along the search path";
-  EXPECT_THROW(std::ignore = Is64BitFile(Folder.File("none")), EFOpenError);
+  TScriptedFiles Files;
+  EXPECT_CALL(Files, SearchPath(Eq(u"no/file"))).WillOnce(Return(u""));
+  EXPECT_EQ(RaisedBy([] { (void)Is64BitFile(u"no/file"); }),
+      u"EFOpenError: Cannot open file \"no/file\". No such file or directory");
+}
+
+TEST(Resources, OfTheLibraryGoBeforeThoseOfTheProgram) {
+  TScriptedResources System;
+  const testing::InSequence InThisOrder;
+  for (const HINST Module : {HInstance(), MainInstance()})
+    EXPECT_CALL(System, FindResource(Module, Eq(u"LOGO"), Eq(u"#10"))).WillOnce(Return(false));
+  EXPECT_EQ(RaisedBy([] { (void)ZqGetResource(u"LOGO", RT_RCDATA); }),
+      u"Exception: There is no resource with the name: LOGO");
+  for (const HINST Module : {HInstance(), MainInstance()})
+    EXPECT_CALL(System, FindResource(Module, Eq(u"LOGO"), Eq(u"#10"))).WillOnce(Return(Module == MainInstance()));
+  EXPECT_CALL(System, LoadResource(MainInstance(), Eq(u"LOGO"), Eq(u"#10"))).WillOnce(Return(TBytes{'P', 'N', 'G'}));
+  EXPECT_EQ(ZqGetResource(u"LOGO", RT_RCDATA)->Size(), 3);
+}
+
+TEST(ProcessFacts, ThatTheSystemDoesNotTellAreNot) {
+  TScriptedProcess System;
+  for (const std::optional<bool> Told : {std::optional<bool>(), {false}, {true}}) {
+    EXPECT_CALL(System, IsWow64Process).WillOnce(Return(Told));
+    EXPECT_CALL(System, IsDebuggerPresent).WillOnce(Return(Told));
+    EXPECT_EQ(IsWow64(), Told == true);
+    EXPECT_EQ(ZqIsDebuggerPresent(), Told == true);
+  }
+}
+
+TEST(UserAndComputer, EachStepThatFailsIsNamed) {
+  TScriptedUsers System;
+  EXPECT_CALL(System, LookupTokenUser).WillOnce(DoAll(SetArgReferee<0>(u"bob"), SetArgReferee<1>(u"shop")));
+  UnicodeString Text;
+  EXPECT_EQ(ZqGetUserName(Text) + u"@" + Text, u"bob@shop");
+  EXPECT_CALL(System, LoadNetApi).WillOnce(Return(false)).WillRepeatedly(Return(true));
+  EXPECT_CALL(System, HasServerGetInfo).WillOnce(Return(false)).WillRepeatedly(Return(true));
+  EXPECT_CALL(System, NetServerGetInfo).WillOnce(Return(5)).WillOnce(DoAll(SetArgReferee<0>(u"till"), Return(0)));
+  for (const char16_t* const Want :
+      {u"EAssertionFailed: The ZqGetComputerDescription is not supported by your version of Windows (common/uZqSys",
+          u"Exception: Failed to locate API funtion.", u"Exception: Failed to execute the NetServerGetInfo funtion.",
+          u"nothing"})
+    EXPECT_EQ(RaisedBy([&] { Text = ZqGetComputerDescription(); }).Pos(Want), 1);
+  EXPECT_EQ(Text, u"till");
 }
 
 }  // namespace

@@ -3,26 +3,25 @@
 #include <gtest/gtest.h>
 
 #include <chrono>
-#include <filesystem>
-#include <map>
-#include <optional>
 #include <set>
 
 #include "runtime/com/registry.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
 #include "runtime/io/streams.h"
-#include "runtime/platform/shell_service.h"
-#include "runtime/platform/version_service.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/local_time.h"
-#include "tests/support/scripted_registry.h"
-#include "tests/support/support.h"
+#include "tests/fakes/environment.h"
+#include "tests/fakes/files.h"
+#include "tests/fakes/registry.h"
+#include "tests/fakes/shell.h"
+#include "tests/fakes/version.h"
 
 namespace zq {
 namespace {
 
 namespace fs = std::filesystem;
+using testing::_, testing::DoAll, testing::Eq, testing::Return, testing::SetArgReferee;
 
 // -------------------------------------------------------------------------------------------------- Environment
 
@@ -30,16 +29,13 @@ TEST(EnvironmentVars, BothFormsExpandInTheirOrder) {
   const TEnvironmentScope Values[] = {{"ZQ_T", "/tmp"}, {"ZQ_IN", "$(ZQ_T)/in"}, {"ZQ_PC", "%ZQ_T%"}, {"ZQ_EMPTY", ""},
       {"ZQ_A", "$(ZQ_B)"}, {"ZQ_B", "$(ZQ_A)"}, {"ZQ_BIG", "$(ZQ_BIG)$(ZQ_BIG)"}, {"ZQ_LONG", std::string(5000, 'x')},
       {"ZQ_FF", "\xFF"}};
-  const std::map<UnicodeString, UnicodeString> Cases = {{u"$(ZQ_T)-$(zq_t)", u"/tmp-/tmp"}, {u"$(ZQ_IN)", u"/tmp/in"},
-      {u"$(ZQ_PC)+%ZQ_IN%", u"/tmp+$(ZQ_T)/in"}, {u"a)$(ZQ_T)b)", u"a)/tmpb)"}, {u"%ZQ_EMPTY%", u""},
-      {u"%ZQ_NO%ZQ_T%", u"%ZQ_NO/tmp"}, {u"%ZQ_NO%|100%", u"%ZQ_NO%|100%"}, {u"%%", u"%%"}, {u"%ZQ_T", u"%ZQ_T"},
-      {u"%ZQ_FF%", UnicodeString(u'\xDCFF')}};
+  const std::pair<const char16_t*, UnicodeString> Cases[] = {{u"$(ZQ_T)-$(zq_t)", u"/tmp-/tmp"},
+      {u"$(ZQ_IN)", u"/tmp/in"}, {u"$(ZQ_PC)+%ZQ_IN%", u"/tmp+$(ZQ_T)/in"}, {u"a)$(ZQ_T)b)", u"a)/tmpb)"},
+      {u"%ZQ_EMPTY%", u""}, {u"%ZQ_NO%ZQ_T%", u"%ZQ_NO/tmp"}, {u"%ZQ_NO%|100%", u"%ZQ_NO%|100%"}, {u"%%", u"%%"},
+      {u"%ZQ_T", u"%ZQ_T"}, {u"%ZQ_FF%", UnicodeString(u'\xDCFF')}};
   for (const auto& [Text, Result] : Cases) EXPECT_EQ(ZqExpandEnvVarsAndStrings(Text), Result);
   EXPECT_EQ(ZqGetEnvironmentVar(u"ZQ_LONG").Length(), 5000);
-  const UnicodeString Missing = u"Exception: There is no Environment Variable with the name ";
-  EXPECT_EQ(RaisedBy([] { (void)ZqExpandEnvVarsAndStrings(u"x$(ZQ_T"); }), Missing);
-  EXPECT_EQ(RaisedBy([] { (void)ZqGetEnvironmentVar(u"ZQ_EMPTY"); }), Missing + u"ZQ_EMPTY");
-  for (const char16_t* const Text : {u"$(ZQ_NO)", u"$(ZQ_A)", u"$(ZQ_BIG)"})
+  for (const char16_t* const Text : {u"$(ZQ_EMPTY)", u"$(ZQ_A)", u"$(ZQ_BIG)"})
     EXPECT_THROW((void)ZqExpandEnvVarsAndStrings(Text), Exception);
   const TEnvironmentScope Name("ZQ_NAME", "x.log");
   const UnicodeString Here = GetCurrentDir();
@@ -47,6 +43,16 @@ TEST(EnvironmentVars, BothFormsExpandInTheirOrder) {
   EXPECT_EQ(ZqExpandFileName(u"sub/../$(ZQ_NAME)"), ExtractFilePath(ParamStr(0)) + u"x.log");
   EXPECT_EQ(ZqExpandFileName(u"/a/../%ZQ_NAME%"), u"/x.log");
   EXPECT_TRUE(GetCurrentDir() == u"/" && SetCurrentDir(Here));
+}
+
+TEST(EnvironmentVars, AMissingOneIsNamedOrStaysAsItStands) {
+  TScriptedEnvironment System;
+  EXPECT_CALL(System, GetEnvironmentVariable).WillRepeatedly(Return(std::nullopt));
+  EXPECT_CALL(System, GetEnvironmentVariable(Eq(u"a"))).WillRepeatedly(Return(u"%b%$(c)"));
+  EXPECT_EQ(ZqExpandEnvVarsAndStrings(u"%a%%b%"), u"%b%$(c)%b%");
+  const UnicodeString Missing = u"Exception: There is no Environment Variable with the name ";
+  EXPECT_EQ(RaisedBy([] { (void)ZqExpandEnvVarsAndStrings(u"$(a)"); }), Missing + u"c");
+  EXPECT_EQ(RaisedBy([] { (void)ZqExpandEnvVarsAndStrings(u"%b%$(a"); }), Missing);
 }
 
 // ---------------------------------------------------------------------------------------------------- Path text
@@ -81,11 +87,7 @@ TEST(FileFacts, TellSizeStateUseAndLocalTimesOfTwoSeconds) {
   EXPECT_TRUE(ZqFileIsReadOnly(File));
   EXPECT_EQ(RaisedBy([&] { (void)ZqGetShortFileName(None); }), u"Exception: Failed to determine the short filename!");
 
-  const struct TZone {
-    ~TZone() { TTimeZone::Refresh(); }
-    const TEnvironmentScope Name{"TZ", "XXX-2"};
-  } Zone;
-  TTimeZone::Refresh();
+  const TZoneScope Zone("XXX-2");
   EXPECT_NEAR(ZqGetFileCreated(File), Now(), 5 / 86400.0);
   const std::chrono::sys_seconds Time{std::chrono::seconds(1709251199)};  // 2024-02-29 23:59:59 UTC
   fs::last_write_time(Folder.Path() / "file", std::chrono::file_clock::from_sys(Time));
@@ -96,6 +98,25 @@ TEST(FileFacts, TellSizeStateUseAndLocalTimesOfTwoSeconds) {
   const FILETIME Back = ZqDateTimeToFileTime(36526.0 + 1 / 86400.0);
   EXPECT_EQ(std::pair(Back.dwLowDateTime, Back.dwHighDateTime), std::pair(0x256D4000U + 10000000U, 0x01BF53EBU));
   EXPECT_THROW((void)ZqDateTimeToFileTime(1e300), EConvertError);
+}
+
+TEST(FileFacts, RefusedByTheSystemAreTold) {
+  const TTempFolder Folder({"file"});
+  TScriptedFiles System;
+  EXPECT_CALL(System, OpensExclusively(Folder.File("file"))).WillOnce(Return(false)).WillOnce(Return(true));
+  EXPECT_CALL(System, GetShortPathName(Eq(u"file"))).WillOnce(Return(u"")).WillOnce(Return(u"FILE~1"));
+  for (const bool Refused : {true, false}) {
+    EXPECT_EQ(ZqFileIsInUse(Folder.File("file")), Refused);
+    EXPECT_EQ(RaisedBy([] { EXPECT_EQ(ZqGetShortFileName(u"file"), u"FILE~1"); }),
+        Refused ? u"Exception: Failed to determine the short filename!" : u"nothing");
+  }
+  for (const Integer Length : {0, 261, 260}) {
+    EXPECT_CALL(System, GetTempPath).WillRepeatedly(Return(StringOfChar(u'/', Length)));
+    EXPECT_EQ(RaisedBy([&] { EXPECT_EQ(ZqGetTempDirectory().Length(), Length); }),
+        Length == 260 ? u"nothing" : u"Exception: Can't determine name temp directory");
+  }
+  EXPECT_CALL(System, GetTempFileName(StringOfChar(u'/', 260), Eq(u"Ast"), _)).Times(65534).WillRepeatedly(Return(u""));
+  EXPECT_EQ(RaisedBy([] { (void)ZqCreateTempDirectory(); }), u"Exception: Failed to create a temporary directory!");
 }
 
 // ------------------------------------------------------------------------------------------------------ Folders
@@ -130,23 +151,13 @@ TEST(Shortcuts, LeadBackToTheirTargets) {
   EXPECT_EQ(Folder.Read("link.desktop"),
       "[Desktop Entry]\nType=Application\nName=link\nComment=The shell\nExec=\"/bin/s%%h\" -c 'echo \\\\n 5%%'\n");
   EXPECT_EQ(ZqGetTargetFromShortcut(Folder.File("none.desktop")), u"");
+  EXPECT_NO_THROW(ZqCreateShortcut(u"/bin/sh", Folder.File("none/link.desktop"), u"", u""));
+  TScriptedShell Shell;
+  EXPECT_CALL(Shell, CreateShellLink).WillOnce(testing::Throw(EOSError(u"no links", 1)));
+  EXPECT_THROW(ZqCreateShortcut(u"/bin/sh", Folder.File("link.desktop"), u"", u""), EOSError);
 }
 
 // ------------------------------------------------------------------------------- System version, shell folders
-
-struct TScriptedVersion : TVersionService {
-  bool HasKernel() override { return Kernel; }
-  bool KernelExports(const char16_t* AName) override { return Exports.contains(AName); }
-  bool GetVersionEx(TOSVersionInfo& AInfo) override {
-    return AInfo = Info.value_or(TOSVersionInfo{}), Info.has_value();
-  }
-  Integer GetSystemMetrics(Integer AIndex) override { return AIndex == 89 ? Metrics : -1; }
-  TSystemRelease Release() override { return {}; }
-  bool Kernel = true;
-  std::set<UnicodeString> Exports;
-  std::optional<TOSVersionInfo> Info;
-  Integer Metrics = 0;
-};
 
 TEST(SystemVersion, NumbersDecideByTheTableAndWithoutThemTheFirstExport) {
   // Major, minor, service pack and product type, one more export, metrics, value of the registry: the version.
@@ -159,51 +170,35 @@ TEST(SystemVersion, NumbersDecideByTheTableAndWithoutThemTheFirstExport) {
       {{6, 3, 0, 1}, u"", 0, u"6.3", 630}, {{6, 3, 0, 1}, u"", 0, u"6.30", 621}, {{6, 3, 0, 3}, u"", 0, u"6.3", 620},
       {{10, 0, 0, 1}, u"", 0, u"6.3", 621}, {{10, 0, 0, 3}, u"", 0, u"6.3", 620}, {{4, 0, 0, 1}, u"", 0, u"6.3", 621}};
   EXPECT_EQ(ZqGetWindowsVersion(), 621);
-  TScriptedVersion Version;
+  TScriptedVersion System;
   TScriptedRegistry Registry;
-  const TPlatformOverride<TVersionService> FakeVersion(Version);
-  const TPlatformOverride<TRegistryService> FakeRegistry(Registry);
+  std::set<UnicodeString> Exports;
+  EXPECT_CALL(System, HasKernel).WillRepeatedly(Return(true));
+  EXPECT_CALL(System, KernelExports).WillRepeatedly([&](const char16_t* AName) { return Exports.contains(AName); });
   TRegistry Values;
   Values.SetRootKey(HKEY_LOCAL_MACHINE);
   for (const auto& [Info, Export, Metrics, Current, Code] : Cases) {
-    Version.Exports = {u"GetVersionExA", Export, u"Beep"};
-    std::tie(Version.Info, Version.Metrics) = std::tie(Info, Metrics);
+    Exports = {u"GetVersionExA", Export, u"Beep"};
+    EXPECT_CALL(System, GetVersionEx).WillOnce(DoAll(SetArgReferee<0>(Info), Return(true)));
+    EXPECT_CALL(System, GetSystemMetrics(89)).WillRepeatedly(Return(Metrics));
     if (*Current != 0 && Values.OpenKey(u"\\SOFTWARE\\Microsoft\\Windows NT\\CurrentVersion", true))
       Values.WriteString(u"CurrentVersion", Current);
     EXPECT_EQ(ZqGetWindowsVersion(), Code) << Info.MajorVersion << '.' << Info.MinorVersion;
   }
-  Version = {};
+  Exports.clear();  // without GetVersionExA the version isn't asked for
   EXPECT_EQ(RaisedBy([] { (void)ZqGetWindowsVersion(); }), u"Exception: Failed to determine the version of the OS!");
-  Version.Info = {10, 0, 0, 1};  // not asked without GetVersionExA
   const std::pair<const char16_t*, Word> Probes[] = {{u"Beep", 3}, {u"ConnectNamedPipe", 14},
       {u"GetDiskFreeSpaceEx", 5}, {u"IsDebuggerPresent", 7}, {u"GetThreadPriorityBoost", 16}, {u"OpenThread", 11}};
   for (const auto& [Name, Code] : Probes) {  // each goes before those already there
-    Version.Exports.insert(Name);
+    Exports.insert(Name);
     EXPECT_EQ(ZqGetWindowsVersion(), Code);
   }
-  Version.Info.reset();
-  Version.Exports.insert(u"GetVersionExA");
+  Exports.insert(u"GetVersionExA");
+  EXPECT_CALL(System, GetVersionEx).WillOnce(Return(false));
   EXPECT_EQ(ZqGetWindowsVersion(), 11);
-  Version.Kernel = false;
+  EXPECT_CALL(System, HasKernel).WillOnce(Return(false));
   EXPECT_EQ(RaisedBy([] { (void)ZqGetWindowsVersion(); }), u"Exception: Failed to load Kernel32.dll!");
 }
-
-// A shell that refuses every operation.
-struct TRefusingShell : TShellService {
-  bool SHGetSpecialFolderPath(Integer, bool, UnicodeString&) override { return false; }
-  bool SHGetMalloc() override { return true; }
-  TItemList SHGetSpecialFolderLocation(Integer) override { return &Held; }
-  bool SHGetPathFromIDList(TItemList, UnicodeString& APath) override { return ++Held, APath = u"/listed", true; }
-  void FreeIDList(TItemList AList) override { Held -= AList == &Held ? 1 : 100; }
-  Integer SHFileOperation(Cardinal AFunc, const UnicodeString& AFrom, const UnicodeString& ATo, Word AFlags) override {
-    Calls.emplace_back(AFunc, AFlags);
-    EXPECT_TRUE(AFrom.View().ends_with(std::u16string_view(u"\0\0", 2)) && (AFunc == FO_RENAME) == !ATo.IsEmpty());
-    return 5;
-  }
-  std::unique_ptr<TShellLink> CreateShellLink() override { return nullptr; }
-  int Held = 0;
-  std::vector<std::pair<Cardinal, Word>> Calls;
-};
 
 // A folder "tree" with files, folders and a link that leads out to "kept/file".
 void GrowTree(const TTempFolder& AFolder) {
@@ -222,16 +217,34 @@ TEST(ShellFolders, ATreeGoesWithoutWhatItsLinksLeadToEvenIfTheShellFails) {
   EXPECT_FALSE(ZqRemoveDir(Folder.File("tree"), false) || ZqRemoveDir(u" ", false));
   EXPECT_FALSE(ZqRemoveDir(Folder.File("kept/.//"), false));
   GrowTree(Folder);
-  TRefusingShell Shell;
-  const TPlatformOverride<TShellService> Fake(Shell);
+  const auto List = [&](const char* AName) { return Folder.File(AName) + std::u16string_view(u"\0\0", 2); };
+  TScriptedShell Shell;
+  const testing::InSequence InThisOrder;
+  EXPECT_CALL(Shell, SHFileOperation(4, List("tree"), List("new"), 0x0610)).WillOnce(Return(5));
+  EXPECT_CALL(Shell, SHFileOperation(3, List("tree"), Eq(u""), 0x0454)).WillOnce(Return(5));
+  EXPECT_CALL(Shell, SHFileOperation(3, List("tree"), Eq(u""), 0x0414)).WillOnce(Return(5));
+  EXPECT_CALL(Shell, SHFileOperation(3, List("link"), Eq(u""), 0x0414)).WillOnce(Return(5));
   EXPECT_FALSE(ZqRenameFolder(Folder.File("tree"), Folder.File("new")));
   EXPECT_TRUE(ZqRemoveDir(Folder.File("tree"), true));
   EXPECT_FALSE(ZqRemoveDir(Folder.File("tree"), false) || fs::exists(Folder.Path() / "tree"));
   fs::create_directory_symlink(Folder.Path() / "kept", Folder.Path() / "link");
   EXPECT_TRUE(ZqRemoveDir(Folder.File("link/"), false));
   EXPECT_EQ(Folder.Read("kept/file"), "x");
-  EXPECT_TRUE(ZqGetShellFolder(5) == u"/listed" && Shell.Held == 0);  // by way of the item list, which is freed
-  EXPECT_EQ(Shell.Calls, (std::vector<std::pair<Cardinal, Word>>{{4, 0x0610}, {3, 0x0454}, {3, 0x0414}, {3, 0x0414}}));
+}
+
+TEST(ShellFolders, ComeByWayOfTheItemListWhereTheirPathIsRefused) {
+  TScriptedShell Shell;
+  int Item = 0;
+  EXPECT_CALL(Shell, SHGetSpecialFolderPath(5, true, _)).WillRepeatedly(Return(false));
+  EXPECT_CALL(Shell, SHGetMalloc).WillOnce(Return(false)).WillRepeatedly(Return(true));
+  EXPECT_CALL(Shell, SHGetSpecialFolderLocation(5)).WillOnce(Return(nullptr)).WillRepeatedly(Return(&Item));
+  EXPECT_CALL(Shell, SHGetPathFromIDList(nullptr, _)).WillOnce(Return(false));
+  const auto Listed = DoAll(SetArgReferee<1>(u"/listed"), Return(true));
+  EXPECT_CALL(Shell, SHGetPathFromIDList(&Item, _)).WillOnce(Return(false)).WillOnce(Listed);
+  EXPECT_CALL(Shell, FreeIDList(&Item)).Times(2);
+  EXPECT_EQ(ZqGetMyDocumentsFolder(), u"") << "no allocator";
+  for (const char16_t* const Want : {u"Exception: Invalid pidl", u"Exception: Invalid pidl", u"nothing"})
+    EXPECT_EQ(RaisedBy([] { EXPECT_EQ(ZqGetMyDocumentsFolder(), u"/listed"); }), Want);
 }
 
 TEST(ShellFolders, FollowTheUsersChoiceAndThoseOfProgramsAreMade) {

@@ -5,7 +5,6 @@
 #include "common/uZqLogAppenders.h"
 #include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
-#include "runtime/platform/clock_service.h"
 #include "tests/support/support.h"
 
 namespace zq {
@@ -47,14 +46,6 @@ struct TLoggerFixture {
     Log->SetAdditive(false);
   }
   IntfRef<IZqLogger> Log;
-};
-
-/// Stands at 2021-12-23 10:53:18.123 UTC, which is local time too, until the test moves it.
-class TScriptedClock : public TClockService {
- public:
-  Int64 UtcMicroseconds() override { return Microseconds; }
-  Integer UtcOffsetSeconds(Int64) override { return 0; }
-  Int64 Microseconds = 1640256798123000;
 };
 
 /// A file appender on ALog with the simple layout.

@@ -8,6 +8,8 @@
 #include <iterator>
 #include <thread>
 
+#include "runtime/text/local_time.h"
+
 namespace zq {
 
 void PrintTo(const UnicodeString& AText, std::ostream* AStream) { *AStream << "u\"" << AText.ToUTF8() << '"'; }
@@ -53,6 +55,10 @@ TEnvironmentScope::TEnvironmentScope(const char* AName, const std::string& AValu
 }
 
 TEnvironmentScope::~TEnvironmentScope() { FSaved ? ::setenv(FName, FSaved->c_str(), 1) : ::unsetenv(FName); }
+
+TZoneScope::TZoneScope(const char* AZone) : Variable("TZ", AZone) { TTimeZone::Refresh(); }
+
+TZoneScope::~TZoneScope() { TTimeZone::Refresh(); }
 
 void OnThreads(int ACount, const std::function<void(int)>& ABody) {
   std::vector<std::jthread> Threads;

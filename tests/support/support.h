@@ -52,6 +52,13 @@ class TEnvironmentScope {
   std::optional<std::string> FSaved;
 };
 
+/// A time zone of the system for a scope.
+struct TZoneScope {
+  explicit TZoneScope(const char* AZone);
+  ~TZoneScope();
+  const TEnvironmentScope Variable;
+};
+
 /// Runs ABody with the numbers below ACount, each on a thread of its own, and waits for their ends.
 void OnThreads(int ACount, const std::function<void(int)>& ABody);
 /// Class and message of what AAction raises, as "EClass: message"; "nothing" if it raises nothing.

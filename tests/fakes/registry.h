@@ -4,18 +4,18 @@
 
 #include <map>
 #include <tuple>
-#include <utility>
 
 #include "runtime/platform/registry_service.h"
 
 namespace zq {
 
-/// A registry in memory. Paths begin with their root: "HKLM\A\B". Closing a key that isn't open fails the test.
-class TScriptedRegistry : public TRegistryService {
+/// A registry in memory, in its seam as long as it lives. Paths begin with their root: "HKLM\A\B". Closing a key that
+/// isn't open fails the test, and so does any other use of one.
+class TScriptedRegistry final : public TRegistryService {
  public:
   Integer RegOpenKeyEx(HKEY AKey, const UnicodeString& ASubKey, Cardinal, HKEY& AResult) override {
     const UnicodeString Path = Open.at(AKey) + u"\\" + ASubKey;
-    if (Keys.count(Path) == 0) return ERROR_FILE_NOT_FOUND;
+    if (!Keys.contains(Path)) return ERROR_FILE_NOT_FOUND;
     Open[AResult = ++FLast] = Path;
     return ERROR_SUCCESS;
   }
@@ -25,7 +25,7 @@ class TScriptedRegistry : public TRegistryService {
   }
   Integer RegQueryValueEx(HKEY AKey, const UnicodeString& AName, Cardinal& AType, TBytes& AData) override {
     const auto& Values = Keys[Open.at(AKey)];
-    if (Values.count(AName) == 0) return ERROR_FILE_NOT_FOUND;
+    if (!Values.contains(AName)) return ERROR_FILE_NOT_FOUND;
     std::tie(AType, AData) = Values.at(AName);
     return ERROR_SUCCESS;
   }
@@ -41,6 +41,7 @@ class TScriptedRegistry : public TRegistryService {
 
  private:
   HKEY FLast = 100;
+  const TPlatformOverride<TRegistryService> FSeat{*this};
 };
 
 }  // namespace zq
