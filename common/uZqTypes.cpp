@@ -23,9 +23,6 @@ namespace zq {
 namespace {
 
 constexpr Word cUtf16LE = 1200;
-constexpr Word cUtf16BE = 1201;
-constexpr Word cUtf32LE = 12000;
-constexpr Word cUtf32BE = 12001;
 constexpr Word cUtf8 = 65001;
 
 struct TFlags {
@@ -33,22 +30,12 @@ struct TFlags {
   Cardinal FromUnicode;
 };
 
-// Code page 0 goes by the page that it stands for: the page decides which flags it bears.
+// Code page 0 goes by the page that it stands for: the page decides which flags it bears. UTF-8 would take some, but is
+// given none.
 TFlags FlagsOf(Word ACodePage) noexcept {
-  switch (const Word Page = ACodePage == 0 ? GetACP() : ACodePage) {
-    case 42:
-    case 50220:
-    case 50221:
-    case 50222:
-    case 50225:
-    case 50227:
-    case 50229:
-    case 65000:
-    case cUtf8: return {0, 0};
-    default:
-      if (Page >= 57002 && Page <= 57011) return {0, 0};
-      return {MB_ERR_INVALID_CHARS, WC_COMPOSITECHECK | WC_DEFAULTCHAR | WC_SEPCHARS | WC_DISCARDNS};
-  }
+  const TCodePage* const Page = FindCodePage(ActualCodePage(ACodePage));
+  if (Page != nullptr && (Page->TakesNoFlags() || Page->Kind == TPageKind::Utf8)) return {0, 0};
+  return {MB_ERR_INVALID_CHARS, WC_COMPOSITECHECK | WC_DEFAULTCHAR | WC_SEPCHARS | WC_DISCARDNS};
 }
 
 const Byte* BytesOf(const RawByteString& AText) noexcept { return reinterpret_cast<const Byte*>(AText.data()); }
@@ -134,8 +121,8 @@ RawByteString FromUtf16(const UnicodeString& AText, Word ACodePage) {
 }  // namespace
 
 RawByteString TZqEncoding::ConvertB(const void* ABuffer, NativeUInt ABufSize, Word ABufCodePage, Word AResultCodePage) {
-  Assert(AResultCodePage != cUtf16LE && AResultCodePage != cUtf16BE && AResultCodePage != cUtf32LE &&
-         AResultCodePage != cUtf32BE);
+  const TCodePage* const ResultPage = FindCodePage(AResultCodePage);
+  Assert(ResultPage == nullptr || ResultPage->UnitSize() == 1);
   RawByteString Result;
   if (ABufCodePage == AResultCodePage) {
     Result.Str().assign(static_cast<const char*>(ABuffer), ABufSize);
@@ -157,75 +144,16 @@ UnicodeString TZqEncoding::ConvertB(const void* ABuffer, NativeUInt ABufSize, Wo
   return Result;
 }
 
-namespace {
-
-struct TCodePageName {
-  Word CodePage;
-  const char16_t* Name;
-};
-
-// Both lookups take the first row that fits: in the first block one name per number, then the further names by which a
-// number is found. The blanks at the end of two of them belong there.
-constexpr TCodePageName cCodePageNames[] = {{37, u"IBM037"}, {437, u"IBM437"}, {500, u"IBM500"}, {708, u"ASMO-708"},
-    {709, u"ASMO-709"}, {710, u"DOS-710"}, {720, u"DOS-720"}, {737, u"ibm737"}, {775, u"ibm775"}, {850, u"ibm850"},
-    {852, u"ibm852"}, {855, u"IBM855"}, {857, u"ibm857"}, {858, u"IBM00858"}, {860, u"IBM860"}, {861, u"ibm861"},
-    {862, u"DOS-862"}, {863, u"IBM863"}, {864, u"IBM864"}, {865, u"IBM865"}, {866, u"cp866"}, {869, u"ibm869"},
-    {870, u"IBM870"}, {874, u"windows-874"}, {875, u"cp875"}, {932, u"shift_jis"}, {936, u"gb2312"},
-    {949, u"ks_c_5601-1987"}, {950, u"big5"}, {1026, u"IBM1026"}, {1047, u"IBM01047"}, {1140, u"IBM01140"},
-    {1141, u"IBM01141"}, {1142, u"IBM01142"}, {1143, u"IBM01143"}, {1144, u"IBM01144"}, {1145, u"IBM01145"},
-    {1146, u"IBM01146"}, {1147, u"IBM01147"}, {1148, u"IBM01148"}, {1149, u"IBM01149"}, {1200, u"utf-16"},
-    {1201, u"unicodeFFFE"}, {1250, u"windows-1250"}, {1251, u"windows-1251"}, {1252, u"windows-1252"},
-    {1253, u"windows-1253"}, {1254, u"windows-1254"}, {1255, u"windows-1255"}, {1256, u"windows-1256"},
-    {1257, u"windows-1257"}, {1258, u"windows-1258"}, {1361, u"Johab"}, {10000, u"macintosh"},
-    {10001, u"x-mac-japanese"}, {10002, u"x-mac-chinesetrad"}, {10003, u"x-mac-korean"}, {10004, u"x-mac-arabic"},
-    {10005, u"x-mac-hebrew"}, {10006, u"x-mac-greek"}, {10007, u"x-mac-cyrillic"}, {10008, u"x-mac-chinesesimp"},
-    {10010, u"x-mac-romanian"}, {10017, u"x-mac-ukrainian"}, {10021, u"x-mac-thai"}, {10029, u"x-mac-ce"},
-    {10079, u"x-mac-icelandic"}, {10081, u"x-mac-turkish"}, {10082, u"x-mac-croatian"}, {12000, u"utf-32"},
-    {12001, u"utf-32BE"}, {20000, u"x-Chinese_CNS"}, {20001, u"x-cp20001"}, {20002, u"x_Chinese-Eten"},
-    {20003, u"x-cp20003"}, {20004, u"x-cp20004"}, {20005, u"x-cp20005"}, {20105, u"x-IA5"}, {20106, u"x-IA5-German"},
-    {20107, u"x-IA5-Swedish"}, {20108, u"x-IA5-Norwegian"}, {20127, u"us-ascii"}, {20261, u"x-cp20261"},
-    {20269, u"x-cp20269"}, {20273, u"IBM273"}, {20277, u"IBM277"}, {20278, u"IBM278"}, {20280, u"IBM280"},
-    {20284, u"IBM284"}, {20285, u"IBM285"}, {20290, u"IBM290"}, {20297, u"IBM297"}, {20420, u"IBM420"},
-    {20423, u"IBM423"}, {20424, u"IBM424"}, {20833, u"x-EBCDIC-KoreanExtended"}, {20838, u"IBM-Thai"},
-    {20866, u"koi8-r"}, {20871, u"IBM871"}, {20880, u"IBM880"}, {20905, u"IBM905"}, {20924, u"IBM00924"},
-    {20932, u"EUC-JP"}, {20936, u"x-cp20936"}, {20949, u"x-cp20949"}, {21025, u"cp1025"}, {21866, u"koi8-u"},
-    {28591, u"iso-8859-1"}, {28592, u"iso-8859-2"}, {28593, u"iso-8859-3"}, {28594, u"iso-8859-4"},
-    {28595, u"iso-8859-5"}, {28596, u"iso-8859-6"}, {28597, u"iso-8859-7"}, {28598, u"iso-8859-8"},
-    {28599, u"iso-8859-9"}, {28603, u"iso-8859-13"}, {28605, u"iso-8859-15"}, {29001, u"x-Europa"},
-    {38598, u"iso-8859-8-i"}, {50220, u"iso-2022-jp"}, {50221, u"csISO2022JP"}, {50222, u"iso-2022-jp"},
-    {50225, u"iso-2022-kr"}, {50227, u"x-cp50227"}, {51932, u"euc-jp"}, {51936, u"EUC-CN"}, {51949, u"euc-kr"},
-    {52936, u"hz-gb-2312"}, {54936, u"GB18030"}, {57002, u"x-iscii-de"}, {57003, u"x-iscii-be"}, {57004, u"x-iscii-ta"},
-    {57005, u"x-iscii-te"}, {57006, u"x-iscii-as"}, {57007, u"x-iscii-or"}, {57008, u"x-iscii-ka"},
-    {57009, u"x-iscii-ma"}, {57010, u"x-iscii-gu"}, {57011, u"x-iscii-pa"}, {65000, u"utf-7"}, {65001, u"utf-8"},
-
-    {866, u"ibm866"}, {932, u"cseucpkdfmtjapanese"}, {932, u"csshiftjis"},
-    {932, u"extended_unix_code_packed_format_for_japanese"}, {932, u"ms_kanji "}, {932, u"shift-jis"}, {932, u"x-euc"},
-    {932, u"x-euc-jp"}, {932, u"x-sjis"}, {936, u"chinese"}, {936, u"csgb2312 "}, {936, u"csiso58gb231280"},
-    {936, u"gb_2312-80"}, {936, u"iso-ir-58"}, {949, u"cseuckr"}, {949, u"csksc56011987"}, {949, u"iso-ir-149"},
-    {949, u"korean"}, {949, u"ks-c-5601"}, {949, u"ks-c-5601-1987"}, {949, u"ks_c_5601"}, {949, u"ks_c_5601-1989"},
-    {949, u"ksc-5601"}, {949, u"ksc5601"}, {949, u"ksc_5601"}, {950, u"csbig5"}, {950, u"x-x-big5"}, {1200, u"ucs-2"},
-    {1200, u"iso-10646-ucs-2"}, {1250, u"x-cp1250"}, {1251, u"x-cp1251"}, {1252, u"ansi_x3.4-1968"},
-    {1252, u"ansi_x3.4-1986"}, {1252, u"ascii"}, {1252, u"cp367"}, {1252, u"cp819"}, {1252, u"csascii"},
-    {1252, u"ibm367"}, {1252, u"ibm819"}, {1252, u"iso-ir-100"}, {1252, u"iso-ir-6"}, {1252, u"iso646-us"},
-    {1252, u"iso8859-1"}, {1252, u"iso_646.irv:1991"}, {1252, u"iso_8859-1"}, {1252, u"iso_8859-1:1987"},
-    {1252, u"latin1"}, {1252, u"us"}, {1255, u"csisolatinhebrew"}, {1255, u"hebrew"}, {1255, u"iso-ir-138"},
-    {1255, u"iso_8859-8"}, {1255, u"iso_8859-8:1988"}, {20866, u"cskoi8r"}, {28592, u"csisolatin2"},
-    {28592, u"iso-ir-101"}, {28592, u"iso8859-2"}, {28592, u"iso_8859-2"}, {28592, u"iso_8859-2:1987"}, {28592, u"l2"},
-    {28592, u"latin2"}, {50225, u"csiso2022kr"}};
-
-}  // namespace
-
 Word ZqCodePage(const UnicodeString& AName) {
   if (AName.IsEmpty()) return 0;
-  for (const TCodePageName& Row : cCodePageNames)
-    if (SameText(Row.Name, AName)) return Row.CodePage;
+  if (const TCodePage* const Page = FindCodePage(AName)) return Page->Number;
   throw Exception(u"No CodePage ID found for %s!", {AName});
 }
 
 UnicodeString ZqCodePage(Word ACodePage) {
-  for (const TCodePageName& Row : cCodePageNames)
-    if (Row.CodePage == ACodePage) return Row.Name;
-  throw Exception(u"No CodePage Name found for %d!", {ACodePage});
+  const TCodePage* const Page = FindCodePage(ACodePage);
+  if (Page == nullptr || Page->Name().empty()) throw Exception(u"No CodePage Name found for %d!", {ACodePage});
+  return Page->Name();
 }
 
 namespace {
@@ -235,26 +163,9 @@ struct TDetected {
   Integer MarkSize;
 };
 
-struct TMark {
-  std::span<const Byte> Bytes;
-  Word CodePage;
-};
-
-// In order: the mark of UTF-32 little-endian begins with that of UTF-16.
-constexpr TMark cMarks[] = {
-    {cZqUTF32BE, cUtf32BE},
-    {cZqUTF32LE, cUtf32LE},
-    {cZqUTF8, cUtf8},
-    {cZqUTF16BE, cUtf16BE},
-    {cZqUTF16LE, cUtf16LE},
-};
-
 TDetected Detect(std::span<const Byte> ABytes) noexcept {
-  for (const TMark& Mark : cMarks) {
-    const std::size_t Size = Mark.Bytes.size();
-    if (ABytes.size() >= Size && std::ranges::equal(Mark.Bytes, ABytes.first(Size)))
-      return {Mark.CodePage, static_cast<Integer>(Size)};
-  }
+  if (const TCodePage* const Page = FindCodePageByMark(ABytes))
+    return {Page->Number, static_cast<Integer>(Page->Mark.size())};
   if (ABytes.size() >= 3 && ABytes[0] != 0 && ABytes[1] == 0) return {cUtf16LE, 0};
   return {0, 0};
 }

@@ -9,6 +9,7 @@
 #include "runtime/core/exceptions.h"
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
+#include "runtime/text/code_pages.h"
 #include "runtime/text/encoding.h"
 #include "runtime/values/typeinfo.h"
 #include "runtime/values/values.h"
@@ -31,11 +32,11 @@ ZQ_API void Stop();
 // ---- Encodings and code pages ---------------------------------------------------------------------------------------
 // A code page is a plain number. Given to a conversion, 0 is the process's ANSI code page.
 
-inline constexpr std::array<Byte, 3> cZqUTF8{0xEF, 0xBB, 0xBF};
-inline constexpr std::array<Byte, 2> cZqUTF16BE{0xFE, 0xFF};
-inline constexpr std::array<Byte, 2> cZqUTF16LE{0xFF, 0xFE};
-inline constexpr std::array<Byte, 4> cZqUTF32BE{0x00, 0x00, 0xFE, 0xFF};
-inline constexpr std::array<Byte, 4> cZqUTF32LE{0xFF, 0xFE, 0x00, 0x00};
+inline constexpr std::array<Byte, 3> cZqUTF8 = cUTF8Mark;
+inline constexpr std::array<Byte, 2> cZqUTF16BE = cUTF16BEMark;
+inline constexpr std::array<Byte, 2> cZqUTF16LE = cUTF16LEMark;
+inline constexpr std::array<Byte, 4> cZqUTF32BE = cUTF32BEMark;
+inline constexpr std::array<Byte, 4> cZqUTF32LE = cUTF32LEMark;
 
 /// Conversions between bytes of a code page and UTF-16, for any number of threads.
 ///

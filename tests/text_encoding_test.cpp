@@ -3,6 +3,7 @@
 #include <map>
 #include <thread>
 
+#include "runtime/text/code_pages.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/format.h"
 #include "tests/support/support.h"
@@ -55,6 +56,64 @@ TEST(TextEncoding, ExactlyThesePagesHaveNoCharacterData) {
   EXPECT_EQ(Refused, cWithout);
 }
 
+// A unit that takes as many bytes as any; the last such, which is none of ASCII.
+std::u16string LongestUnit(Word ACodePage, int& ALength) {
+  std::u16string Result;
+  ALength = 0;
+  for (unsigned i = 1; i <= 0xFFFF; ++i) {
+    const auto Unit = static_cast<char16_t>(i);
+    const int Length = WideCharToMultiByte(ACodePage, 0, &Unit, 1, nullptr, 0);
+    if (Length >= ALength) Result = Unit, ALength = Length;
+  }
+  return Result;
+}
+
+// The converters' own answers: a foreign front keeps the rest from the short way that ASCII takes.
+void CheckAscii(const TCodePage& APage, const std::string& AForeign, const std::u16string& AForeignText) {
+  std::string Ascii;
+  for (char c = 0x10; c > 0; ++c) Ascii += c;
+  const bool Kept = Encoded(APage.Number, std::u16string(Ascii.begin(), Ascii.end())) == Ascii;
+  EXPECT_EQ(Kept, APage.Ascii < TAsciiUse::Guarded);
+  if (APage.Ascii == TAsciiUse::Foreign) return;
+  if (APage.Ascii == TAsciiUse::Guarded) Ascii = " AZaz09,.-()/:?";
+  const std::u16string Text(Ascii.begin(), Ascii.end());
+  const std::string Front = APage.Kind == TPageKind::SingleByte ? "\xFF" : AForeign;
+  EXPECT_TRUE(Encoded(APage.Number, AForeignText + Text).ends_with(Ascii));
+  EXPECT_TRUE(Decoded(APage.Number, Front + Ascii).ends_with(Text));
+}
+
+TEST(TextEncoding, EachRowTellsOfItsPageWhatTheConversionsDo) {
+  using enum TPageKind;
+  for (const TCodePage& Page : CodePages()) {
+    if (!Page.IsServed()) continue;
+    SCOPED_TRACE(Page.Number);
+    const bool Shifts = Page.Kind >= Hz && Page.Kind <= Utf7;
+    int Length = 0;
+    const std::u16string Unit = LongestUnit(Page.Number, Length);
+    const std::string Once = Encoded(Page.Number, Unit);
+    EXPECT_EQ(Page.BytesPerUnit, Length);
+    EXPECT_LE(Encoded(Page.Number, u"😀").size(), 2 * Once.size());
+    EXPECT_EQ(Page.Kind == SingleByte, Length == 1);
+    EXPECT_EQ(Shifts, Encoded(Page.Number, Unit + Unit).size() < 2 * Once.size());
+    EXPECT_EQ(Page.UnitSize(), Page.Kind < Utf16 ? 1 : Once.size());
+    const std::u16string_view All = u"é漢😀\uE000क\xFFFD";
+    EXPECT_EQ(Page.IsUnicode(), Decoded(Page.Number, Encoded(Page.Number, All)) == All);
+    EXPECT_EQ(std::string(Page.Mark.begin(), Page.Mark.end()), Page.Kind < Utf8 ? "" : Encoded(Page.Number, u"\uFEFF"));
+    CheckAscii(Page, Once, Unit);
+  }
+}
+
+TEST(TextEncoding, ExactlyThesePagesTakeNoFlags) {
+  std::vector<Word> Refusing;
+  for (const TCodePage& Page : CodePages()) {
+    const bool Taken = WideCharToMultiByte(Page.Number, WC_DEFAULTCHAR, u"a", 1, nullptr, 0) != 0;
+    EXPECT_TRUE(Taken || !Page.IsServed() || GetLastError() == ERROR_INVALID_FLAGS) << Page.Number;
+    if (Page.IsServed() ? !Taken : Page.TakesNoFlags()) Refusing.push_back(Page.Number);
+  }
+  EXPECT_EQ(Refusing, (std::vector<Word>{42, 50220, 50221, 50222, 50225, 50227, 50229, 57002, 57003, 57004, 57005,
+                          57006, 57007, 57008, 57009, 57010, 57011, 65000, 65001}));
+}
+
 TEST(TextEncoding, EveryPageWritesAndReadsItsScript) {
   const std::map<std::u16string, std::vector<Word>> cTexts = {
       {u"Straße Ñandú", {437, 850, 858, 1252, 1254, 10000, 28591, 28605, 37, 500, 1047, 1140, 1148, 20273, 20284}},
@@ -84,7 +143,7 @@ TEST(TextEncoding, MapsAsThePagesOfThePlatformDo) {
       {437, "\x1A\x7F\x1C\x80\x1A\x7F\x1C", u"\x1A\x7F\x1C\u00C7\x1A\x7F\x1C"}, {37, "\xC1\x4A", u"A\u00A2"},
       {1201, {"\0A\x20\xAC", 4}, u"A€"}, {12000, {"A\0\0\0\0\xF6\x01\0", 8}, u"A😀"},
       {65001, "\xE2\x82\xAC\xF0\x9F\x98\x80", u"€😀"}, {65000, "a+IKw-", u"a€"}, {52936, "ab~{VP~}", u"ab中"},
-      {50220, "\x1B$B$\"\x1B(B", u"あ"}, {54936, "\x81\x30\x81\x30", u"\x80"}};
+      {50220, "\x1B$B$\"\x1B(B", u"あ"}, {50225, "\x1B$)CA", u"A"}, {54936, "\x81\x30\x81\x30", u"\x80"}};
   for (const auto& [Page, Bytes, Text] : cCases) {
     EXPECT_EQ(UnicodeString(Decoded(Page, Bytes)), Text) << Page;
     EXPECT_EQ(Encoded(Page, Text), Bytes) << Page;

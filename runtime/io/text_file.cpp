@@ -12,6 +12,7 @@
 #include "runtime/core/utf8.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
+#include "runtime/text/code_pages.h"
 #include "runtime/text/encoding.h"
 
 namespace zq {
@@ -23,8 +24,10 @@ constexpr std::string_view cLineEnd = "\r\n";
 constexpr std::size_t cOnStack = 2048;
 constexpr std::size_t cKeptRoom = 1 << 20;
 
-// At most this many bytes for one unit; the stateful code pages put an escape sequence on either side of it.
-constexpr std::size_t MaxBytesPerUnit(Word ACodePage) noexcept { return ACodePage == cUTF8 ? 3 : 10; }
+std::size_t MaxBytesPerUnit(Word ACodePage) noexcept {
+  const TCodePage* const Page = FindCodePage(ActualCodePage(ACodePage));
+  return Page == nullptr ? 1 : Page->BytesPerUnit;  // what has no row, the conversion refuses
+}
 
 // Bytes written to ADest, which has ARoom; 0 for a text that the code page's converter refuses.
 std::size_t EncodeTo(char* ADest, std::size_t ARoom, std::u16string_view AText, Word ACodePage) {

@@ -15,167 +15,24 @@
 #include <string>
 
 #include "runtime/core/utf8.h"
+#include "runtime/text/code_pages.h"
 #include "runtime/text/numbers.h"
 
 namespace zq {
 
-// --------------------------------------------------------------------------------------------- code page table
+// --------------------------------------------------------------------------------------------- character data
 
 namespace {
 
-// What a page has in common with ASCII, and the width of its code units.
-enum TShape : Byte {
-  Ascii,         // bytes below 80 at the front of a text are ASCII, both ways
-  AsciiRotated,  // likewise, but its table has 1A, 1C and 7F the way that old hosts had them: 7F, 1A, 1C
-  Guarded,       // likewise as long as none of them shifts or quotes
-  Foreign,       // nothing
-  Utf8,
-  Utf16,
-  Utf32
-};
-
-struct TPage {
-  Word Number;
-  TShape Shape;
-  const char* Converter;
-};
-
-constexpr Word cHz = 52936;
-
-// By number. Of several tables for a page these are the ones with its mappings of the platform's own, user-defined
-// ranges and C1 controls included. 708 is served by the table of the standard that it follows, 57006 by that of the
-// script that it shares, 50221 by one that shifts its half-width letters in with SO.
-constexpr TPage cPages[] = {
-    {37, Foreign, "ibm-37_P100-1995"},
-    {437, AsciiRotated, "ibm-437_P100-1995"},
-    {500, Foreign, "ibm-500_P100-1995"},
-    {708, Ascii, "ibm-1089_P100-1995"},
-    {720, AsciiRotated, "ibm-720_P100-1997"},
-    {737, AsciiRotated, "ibm-737_P100-1997"},
-    {775, AsciiRotated, "ibm-775_P100-1996"},
-    {850, AsciiRotated, "ibm-850_P100-1995"},
-    {852, AsciiRotated, "ibm-852_P100-1995"},
-    {855, AsciiRotated, "ibm-855_P100-1995"},
-    {857, AsciiRotated, "ibm-857_P100-1995"},
-    {858, AsciiRotated, "ibm-858_P100-1997"},
-    {860, AsciiRotated, "ibm-860_P100-1995"},
-    {861, AsciiRotated, "ibm-861_P100-1995"},
-    {862, AsciiRotated, "ibm-862_P100-1995"},
-    {863, AsciiRotated, "ibm-863_P100-1995"},
-    {864, AsciiRotated, "ibm-864_X110-1999"},
-    {865, AsciiRotated, "ibm-865_P100-1995"},
-    {866, AsciiRotated, "ibm-866_P100-1995"},
-    {869, AsciiRotated, "ibm-869_P100-1995"},
-    {870, Foreign, "ibm-870_P100-1995"},
-    {874, Ascii, "windows-874-2000"},
-    {875, Foreign, "ibm-875_P100-1995"},
-    {932, AsciiRotated, "ibm-943_P15A-2003"},
-    {936, Ascii, "windows-936-2000"},
-    {949, Ascii, "windows-949-2000"},
-    {950, Ascii, "windows-950-2000"},
-    {1026, Foreign, "ibm-1026_P100-1995"},
-    {1047, Foreign, "ibm-1047_P100-1995"},
-    {1140, Foreign, "ibm-1140_P100-1997"},
-    {1141, Foreign, "ibm-1141_P100-1997"},
-    {1142, Foreign, "ibm-1142_P100-1997"},
-    {1143, Foreign, "ibm-1143_P100-1997"},
-    {1144, Foreign, "ibm-1144_P100-1997"},
-    {1145, Foreign, "ibm-1145_P100-1997"},
-    {1146, Foreign, "ibm-1146_P100-1997"},
-    {1147, Foreign, "ibm-1147_P100-1997"},
-    {1148, Foreign, "ibm-1148_P100-1997"},
-    {1149, Foreign, "ibm-1149_P100-1997"},
-    {1200, Utf16, "UTF-16LE"},
-    {1201, Utf16, "UTF-16BE"},
-    {1250, Ascii, "ibm-5346_P100-1998"},
-    {1251, Ascii, "ibm-5347_P100-1998"},
-    {1252, Ascii, "ibm-5348_P100-1997"},
-    {1253, Ascii, "ibm-5349_P100-1998"},
-    {1254, Ascii, "ibm-5350_P100-1998"},
-    {1255, Ascii, "ibm-9447_P100-2002"},
-    {1256, Ascii, "ibm-9448_X100-2005"},
-    {1257, Ascii, "ibm-9449_P100-2002"},
-    {1258, Ascii, "ibm-5354_P100-1998"},
-    {10000, Ascii, "macos-0_2-10.2"},
-    {10006, Ascii, "macos-6_2-10.4"},
-    {10007, Ascii, "macos-7_3-10.2"},
-    {10017, Ascii, "macos-7_3-10.2"},
-    {10029, Ascii, "macos-29-10.2"},
-    {10081, Ascii, "macos-35-10.2"},
-    {12000, Utf32, "UTF-32LE"},
-    {12001, Utf32, "UTF-32BE"},
-    {20127, Ascii, "US-ASCII"},
-    {20273, Foreign, "ibm-273_P100-1995"},
-    {20277, Foreign, "ibm-277_P100-1995"},
-    {20278, Foreign, "ibm-278_P100-1995"},
-    {20280, Foreign, "ibm-280_P100-1995"},
-    {20284, Foreign, "ibm-284_P100-1995"},
-    {20285, Foreign, "ibm-285_P100-1995"},
-    {20290, Foreign, "ibm-290_P100-1995"},
-    {20297, Foreign, "ibm-297_P100-1995"},
-    {20420, Foreign, "ibm-420_X120-1999"},
-    {20424, Foreign, "ibm-424_P100-1995"},
-    {20838, Foreign, "ibm-838_P100-1995"},
-    {20866, Ascii, "ibm-878_P100-1996"},
-    {20871, Foreign, "ibm-871_P100-1995"},
-    {20932, Ascii, "euc-jp-2007"},
-    {20936, Ascii, "ibm-1383_P110-1999"},
-    {20949, Ascii, "ibm-970_P110_P110-2006_U2"},
-    {21025, Foreign, "ibm-1025_P100-1995"},
-    {21866, Ascii, "ibm-1168_P100-2002"},
-    {28591, Ascii, "ISO-8859-1"},
-    {28592, Ascii, "ibm-912_P100-1995"},
-    {28593, Ascii, "ibm-913_P100-2000"},
-    {28594, Ascii, "ibm-914_P100-1995"},
-    {28595, Ascii, "ibm-915_P100-1995"},
-    {28596, Ascii, "ibm-1089_P100-1995"},
-    {28597, Ascii, "ibm-9005_X110-2007"},
-    {28598, Ascii, "ibm-5012_P100-1999"},
-    {28599, Ascii, "ibm-920_P100-1995"},
-    {28603, Ascii, "ibm-921_P100-1995"},
-    {28605, Ascii, "ibm-923_P100-1998"},
-    {38598, Ascii, "ibm-5012_P100-1999"},
-    {50220, Guarded, "ISO_2022,locale=ja,version=0"},
-    {50221, Guarded, "ISO_2022,locale=ja,version=3"},
-    {50222, Guarded, "ISO_2022,locale=ja,version=3"},
-    {50225, Foreign, "ISO_2022,locale=ko,version=1"},
-    {50227, Guarded, "ISO_2022,locale=zh,version=0"},
-    {51932, Ascii, "euc-jp-2007"},
-    {51936, Ascii, "ibm-1383_P110-1999"},
-    {51949, Ascii, "ibm-970_P110_P110-2006_U2"},
-    {cHz, Guarded, "HZ"},
-    {54936, Ascii, "gb18030"},
-    {57002, Ascii, "ISCII,version=0"},
-    {57003, Ascii, "ISCII,version=1"},
-    {57004, Ascii, "ISCII,version=5"},
-    {57005, Ascii, "ISCII,version=6"},
-    {57006, Ascii, "ISCII,version=1"},
-    {57007, Ascii, "ISCII,version=4"},
-    {57008, Ascii, "ISCII,version=7"},
-    {57009, Ascii, "ISCII,version=8"},
-    {57010, Ascii, "ISCII,version=3"},
-    {57011, Ascii, "ISCII,version=2"},
-    {65000, Guarded, "UTF-7"},
-    {65001, Utf8, "UTF-8"},
-};
-static_assert(std::ranges::is_sorted(cPages, {}, &TPage::Number));
-
-const TPage* FindPage(Word ACodePage) noexcept {
-  const Word Number = ACodePage == 0 ? GetACP() : ACodePage;
-  const auto* const Found = std::ranges::lower_bound(cPages, Number, {}, &TPage::Number);
-  return Found != std::end(cPages) && Found->Number == Number ? Found : nullptr;
+// The page, if it has character data.
+const TCodePage* ServedPage(Word ACodePage) noexcept {
+  const TCodePage* const Page = FindCodePage(ActualCodePage(ACodePage));
+  return Page != nullptr && Page->IsServed() ? Page : nullptr;
 }
 
-std::size_t UnitSize(const TPage& APage) noexcept { return APage.Shape == Utf16 ? 2 : APage.Shape == Utf32 ? 4 : 1; }
-
-bool TakesNoFlags(Word ANumber) noexcept {
-  constexpr Word cNone[] = {50220, 50221, 50222, 50225, 50227, 65000};
-  return std::ranges::find(cNone, ANumber) != std::end(cNone) || (ANumber >= 57002 && ANumber <= 57011);
-}
-
-UConverter* OpenConverter(const TPage& APage) {
+UConverter* OpenConverter(const TCodePage& APage) {
   UErrorCode Error = U_ZERO_ERROR;
-  UConverter* const Result = ucnv_open(APage.Converter, &Error);
+  UConverter* const Result = ucnv_open(APage.Data.Name, &Error);
   return U_FAILURE(Error) ? nullptr : Result;
 }
 
@@ -192,7 +49,7 @@ class TConverters {
     for (const TSlot& Slot : FSlots) ucnv_close(Slot.Converter);
     ConvertersEnded = true;
   }
-  UConverter* Get(const TPage& APage) {
+  UConverter* Get(const TCodePage& APage) {
     for (const TSlot& Slot : FSlots)
       if (Slot.Page == &APage) {
         ucnv_reset(Slot.Converter);
@@ -208,7 +65,7 @@ class TConverters {
 
  private:
   struct TSlot {
-    const TPage* Page = nullptr;
+    const TCodePage* Page = nullptr;
     UConverter* Converter = nullptr;
   };
   std::array<TSlot, 4> FSlots;
@@ -222,7 +79,7 @@ struct TGiveBack {
   }
 };
 
-std::unique_ptr<UConverter, TGiveBack> ConverterOf(const TPage& APage) {
+std::unique_ptr<UConverter, TGiveBack> ConverterOf(const TCodePage& APage) {
   if (ConvertersEnded) return {OpenConverter(APage), {.Close = true}};
   thread_local TConverters Converters;
   return {Converters.Get(APage), {.Close = false}};
@@ -268,28 +125,41 @@ void Unrotate(TUnit* AText, int ACount, const char* AFrom, const char* ATo) noex
       }
 }
 
-bool IsGuarded(unsigned AUnit) noexcept {
-  return (AUnit < 0x20 && AUnit != 9 && AUnit != 10 && AUnit != 13) || AUnit == '+' || AUnit == '\\' || AUnit == '~' ||
-         AUnit >= 0x7F;
-}
+// What shifts or quotes in one guarded page or another.
+constexpr auto cGuarded = [] {
+  std::array<bool, 0x80> Result{};
+  for (unsigned i = 0; i < 0x20; ++i) Result[i] = i != 9 && i != 10 && i != 13;
+  for (const char c : {'+', '\\', '~', '\x7F'}) Result[static_cast<unsigned char>(c)] = true;
+  return Result;
+}();
 
 // Length of the front of a text that is the same in ASCII.
 template <class TUnit>
-std::size_t PlainRun(const TPage& APage, const TUnit* AText, std::size_t ALength) noexcept {
-  if (APage.Shape > Guarded) return 0;
+std::size_t PlainRun(const TCodePage& APage, const TUnit* AText, std::size_t ALength) noexcept {
+  if (APage.Ascii == TAsciiUse::Foreign) return 0;
   const std::size_t Run = utf8::AsciiRun(AText, ALength);
-  if (APage.Shape != Guarded) return Run;
-  return static_cast<std::size_t>(
-      std::find_if(AText, AText + Run, [](TUnit u) { return IsGuarded(static_cast<unsigned>(u)); }) - AText);
+  if (APage.Ascii != TAsciiUse::Guarded) return Run;
+  const auto* const Guarded =
+      std::find_if(AText, AText + Run, [](TUnit u) { return cGuarded[static_cast<unsigned char>(u)]; });
+  return static_cast<std::size_t>(Guarded - AText);
+}
+
+// The codecs of UTF-8 are the fastest to copy ASCII.
+char16_t* CopyPlain(const char* ASource, int ACount, char16_t* ADest) noexcept {
+  return ADest + utf8::Decode(ASource, static_cast<std::size_t>(ACount), ADest);
+}
+
+char* CopyPlain(const char16_t* ASource, int ACount, char* ADest) noexcept {
+  return ADest + utf8::Encode(ASource, static_cast<std::size_t>(ACount), ADest);
 }
 
 // Copies the plain run and has ARest convert what is behind it, into what is left of the destination.
 template <class TFrom, class TTo, class TRest>
-int AfterPlainRun(const TPage& APage, const TFrom* ASource, int ACount, TTo* ADest, int ACapacity, TRest ARest) {
+int AfterPlainRun(const TCodePage& APage, const TFrom* ASource, int ACount, TTo* ADest, int ACapacity, TRest ARest) {
   const auto Run = static_cast<int>(PlainRun(APage, ASource, static_cast<std::size_t>(ACount)));
   if (ADest != nullptr) {
     if (Run > ACapacity) return Refuse(ERROR_INSUFFICIENT_BUFFER);
-    ADest = std::transform(ASource, ASource + Run, ADest, [](TFrom u) { return static_cast<TTo>(u); });
+    ADest = CopyPlain(ASource, Run, ADest);
   }
   if (Run == ACount) return Run;
   const int Rest = ARest(ASource + Run, ACount - Run, ADest, ACapacity - Run);
@@ -330,7 +200,8 @@ void U_CALLCONV DecodeMalformed(const void* AStrict, UConverterToUnicodeArgs* AA
   ucnv_cbToUWriteUChars(AArgs, &cReplacement, 1, 0, AError);
 }
 
-int DecodeByTable(const TPage& APage, bool AStrict, const char* ASource, int ABytes, char16_t* ADest, int ADestChars) {
+int DecodeByTable(
+    const TCodePage& APage, bool AStrict, const char* ASource, int ABytes, char16_t* ADest, int ADestChars) {
   const auto Converter = ConverterOf(APage);
   if (Converter == nullptr) return Refuse(ERROR_INVALID_PARAMETER);
   UErrorCode Error = U_ZERO_ERROR;
@@ -340,7 +211,7 @@ int DecodeByTable(const TPage& APage, bool AStrict, const char* ASource, int ABy
     ucnv_toUnicode(Converter.get(), AAt, ALimit, &ASource, End, nullptr, true, AError);
   };
   const int Result = Pump(ADest, ADestChars, Step);
-  if (APage.Shape == AsciiRotated && ADest != nullptr && Result > 0)
+  if (APage.Ascii == TAsciiUse::Rotated && ADest != nullptr && Result > 0)
     Unrotate(ADest, Result, "\x1C\x7F\x1A", "\x1A\x1C\x7F");
   return Result;
 }
@@ -366,16 +237,16 @@ int DecodeUtf8(bool AStrict, const char* ASource, int ABytes, char16_t* ADest, i
   return static_cast<int>(utf8::Decode(ASource, Bytes, ADest));
 }
 
-int DecodeText(const TPage& APage, bool AStrict, const char* ASource, int ABytes, char16_t* ADest, int ADestChars) {
-  if (APage.Shape == Utf8) return DecodeUtf8(AStrict, ASource, ABytes, ADest, ADestChars);
+int DecodeText(const TCodePage& APage, bool AStrict, const char* ASource, int ABytes, char16_t* ADest, int ADestChars) {
+  if (APage.Kind == TPageKind::Utf8) return DecodeUtf8(AStrict, ASource, ABytes, ADest, ADestChars);
   return AfterPlainRun(
       APage, ASource, ABytes, ADest, ADestChars, [&](const char* AFrom, int ACount, char16_t* ATo, int ACapacity) {
         return DecodeByTable(APage, AStrict, AFrom, ACount, ATo, ACapacity);
       });
 }
 
-int BytesUpToZero(const TPage& APage, const char* ASource) noexcept {
-  switch (UnitSize(APage)) {
+int BytesUpToZero(const TCodePage& APage, const char* ASource) noexcept {
+  switch (APage.UnitSize()) {
     case 2: return TerminatedLength<char16_t>(ASource);
     case 4: return TerminatedLength<char32_t>(ASource);
     default: return TerminatedLength<char>(ASource);
@@ -387,10 +258,10 @@ int BytesUpToZero(const TPage& APage, const char* ASource) noexcept {
 int MultiByteToWideChar(
     Word ACodePage, Cardinal AFlags, const char* ASource, int ABytes, char16_t* ADest, int ADestChars) {
   constexpr Cardinal cKnown = 0x7U | MB_ERR_INVALID_CHARS;
-  const TPage* const Page = FindPage(ACodePage);
+  const TCodePage* const Page = ServedPage(ACodePage);
   if (Page == nullptr || !ValidArguments(ASource, ABytes, ADest, ADestChars))
     return Answer(Refuse(ERROR_INVALID_PARAMETER));
-  const Cardinal Allowed = TakesNoFlags(Page->Number) ? 0 : Page->Shape == Utf8 ? MB_ERR_INVALID_CHARS : cKnown;
+  const Cardinal Allowed = Page->TakesNoFlags() ? 0 : Page->Kind == TPageKind::Utf8 ? MB_ERR_INVALID_CHARS : cKnown;
   if ((AFlags & ~Allowed) != 0) return Answer(Refuse(ERROR_INVALID_FLAGS));
   const int Bytes = ABytes == -1 ? BytesUpToZero(*Page, ASource) : ABytes;
   return Answer(DecodeText(*Page, (AFlags & MB_ERR_INVALID_CHARS) != 0, ASource, Bytes, ADest, ADestChars));
@@ -427,13 +298,13 @@ void U_CALLCONV EncodeMissing(const void* AContext, UConverterFromUnicodeArgs* A
   }
 }
 
-int EncodeByTable(const TPage& APage, bool ABestFit, TSubstitute& ASubstitute, const char16_t* ASource, int AChars,
+int EncodeByTable(const TCodePage& APage, bool ABestFit, TSubstitute& ASubstitute, const char16_t* ASource, int AChars,
     char* ADest, int ADestBytes) {
   const auto Converter = ConverterOf(APage);
   if (Converter == nullptr) return Refuse(ERROR_INVALID_PARAMETER);
   UErrorCode Error = U_ZERO_ERROR;
-  ASubstitute.Rotated = APage.Shape == AsciiRotated;
-  ucnv_setFallback(Converter.get(), ABestFit);
+  ASubstitute.Rotated = APage.Ascii == TAsciiUse::Rotated;
+  ucnv_setFallback(Converter.get(), ABestFit ? 1 : 0);
   ucnv_setFromUCallBack(Converter.get(), EncodeMissing, &ASubstitute, nullptr, nullptr, &Error);
   const char16_t* const End = ASource + AChars;
   const auto Step = [&](char** AAt, const char* ALimit, UErrorCode* AError) {
@@ -445,7 +316,7 @@ int EncodeByTable(const TPage& APage, bool ABestFit, TSubstitute& ASubstitute, c
 }
 
 // The one converter that leaves its text shifted at the end: a line end makes it shift back.
-int EncodeHz(const TPage& APage, bool ABestFit, TSubstitute& ASubstitute, std::u16string_view AText, char* ADest,
+int EncodeHz(const TCodePage& APage, bool ABestFit, TSubstitute& ASubstitute, std::u16string_view AText, char* ADest,
     int ADestBytes) {
   const std::u16string Line = std::u16string(AText) + u'\n';
   const auto Chars = static_cast<int>(Line.size());
@@ -458,7 +329,7 @@ int EncodeHz(const TPage& APage, bool ABestFit, TSubstitute& ASubstitute, std::u
   return Size - 1;
 }
 
-bool PageHas(const TPage& APage, UChar32 AChar) {
+bool PageHas(const TCodePage& APage, UChar32 AChar) {
   TSubstitute Substitute{.Strict = true};
   const std::u16string Text = AChar > 0xFFFF ? std::u16string{U16_LEAD(AChar), U16_TRAIL(AChar)}
                                              : std::u16string(1, static_cast<char16_t>(AChar));
@@ -470,10 +341,14 @@ const UNormalizer2* Composer() noexcept {
   return unorm2_getNFCInstance(&Error);
 }
 
-bool IsMark(char16_t AChar) noexcept { return AChar >= 0x300 && unorm2_hasBoundaryBefore(Composer(), AChar) == 0; }
+constexpr bool MayBeMark(char16_t AChar) noexcept { return AChar >= 0x300; }
+bool IsMark(char16_t AChar) noexcept { return MayBeMark(AChar) && unorm2_hasBoundaryBefore(Composer(), AChar) == 0; }
+bool HasMarks(std::u16string_view AText) noexcept {
+  return std::ranges::any_of(AText, MayBeMark) && std::ranges::any_of(AText, IsMark);
+}
 
 // AText with each letter and the mark behind it as one character, where the page has that character.
-std::u16string ComposeFor(const TPage& APage, std::u16string_view AText) {
+std::u16string ComposeFor(const TCodePage& APage, std::u16string_view AText) {
   std::u16string Result;
   for (const char16_t c : AText) {
     const UChar32 Whole = Result.empty() || !IsMark(c) ? U_SENTINEL : unorm2_composePair(Composer(), Result.back(), c);
@@ -503,40 +378,36 @@ int EncodeUtf8(const char16_t* ASource, int AChars, char* ADest, int ADestBytes)
   return static_cast<int>(utf8::Encode(ASource, Chars, ADest));
 }
 
-int EncodeText(const TPage& APage, Cardinal AFlags, TSubstitute& ASubstitute, const char16_t* ASource, int AChars,
+int EncodeText(const TCodePage& APage, Cardinal AFlags, TSubstitute& ASubstitute, const char16_t* ASource, int AChars,
     char* ADest, int ADestBytes) {
   const bool Strict = (AFlags & WC_ERR_INVALID_CHARS) != 0;
   if (Strict && HasLoneSurrogate({ASource, static_cast<std::size_t>(AChars)}))
     return Refuse(ERROR_NO_UNICODE_TRANSLATION);
-  if (APage.Shape == Utf8) return EncodeUtf8(ASource, AChars, ADest, ADestBytes);
+  if (APage.Kind == TPageKind::Utf8) return EncodeUtf8(ASource, AChars, ADest, ADestBytes);
   const auto Rest = [&](const char16_t* AFrom, int ACount, char* ATo, int ACapacity) {
     const bool BestFit = (AFlags & WC_NO_BEST_FIT_CHARS) == 0;
-    if (APage.Number != cHz) return EncodeByTable(APage, BestFit, ASubstitute, AFrom, ACount, ATo, ACapacity);
+    if (APage.Kind != TPageKind::Hz) return EncodeByTable(APage, BestFit, ASubstitute, AFrom, ACount, ATo, ACapacity);
     return EncodeHz(APage, BestFit, ASubstitute, {AFrom, static_cast<std::size_t>(ACount)}, ATo, ACapacity);
   };
   return AfterPlainRun(APage, ASource, AChars, ADest, ADestBytes, Rest);
 }
 
-bool IsUnicode(const TPage& APage) noexcept {
-  return APage.Shape >= Utf8 || APage.Number == 54936 || APage.Number == 65000;
-}
-
-Cardinal AllowedEncodeFlags(const TPage& APage) noexcept {
+Cardinal AllowedEncodeFlags(const TCodePage& APage) noexcept {
   constexpr Cardinal cAny = WC_DISCARDNS | WC_SEPCHARS | WC_DEFAULTCHAR | WC_COMPOSITECHECK | WC_NO_BEST_FIT_CHARS;
-  if (TakesNoFlags(APage.Number)) return 0;
-  if (APage.Shape == Utf8) return WC_ERR_INVALID_CHARS;
-  return APage.Number == 54936 ? cAny | WC_ERR_INVALID_CHARS : cAny;
+  if (APage.TakesNoFlags()) return 0;
+  if (APage.Kind == TPageKind::Utf8) return WC_ERR_INVALID_CHARS;
+  return APage.Kind == TPageKind::Gb18030 ? cAny | WC_ERR_INVALID_CHARS : cAny;
 }
 
 int Encode(Word ACodePage, Cardinal AFlags, const char16_t* ASource, int AChars, char* ADest, int ADestBytes,
     TSubstitute& ASubstitute) {
-  const TPage* const Page = FindPage(ACodePage);
+  const TCodePage* const Page = ServedPage(ACodePage);
   if (Page == nullptr || !ValidArguments(ASource, AChars, ADest, ADestBytes)) return Refuse(ERROR_INVALID_PARAMETER);
   if ((AFlags & ~AllowedEncodeFlags(*Page)) != 0) return Refuse(ERROR_INVALID_FLAGS);
-  if (IsUnicode(*Page)) ASubstitute.Char = 0xFFFD;
+  if (Page->IsUnicode()) ASubstitute.Char = 0xFFFD;
   const int Chars = AChars == -1 ? TerminatedLength<char16_t>(ASource) / 2 : AChars;
   const std::u16string_view Text(ASource, static_cast<std::size_t>(Chars));
-  const bool Composes = (AFlags & WC_COMPOSITECHECK) != 0 && !IsUnicode(*Page) && std::ranges::any_of(Text, IsMark);
+  const bool Composes = (AFlags & WC_COMPOSITECHECK) != 0 && !Page->IsUnicode() && HasMarks(Text);
   if (!Composes) return EncodeText(*Page, AFlags, ASubstitute, ASource, Chars, ADest, ADestBytes);
   const std::u16string Composed = ComposeFor(*Page, Text);
   return EncodeText(*Page, AFlags, ASubstitute, Composed.data(), static_cast<int>(Composed.size()), ADest, ADestBytes);
@@ -580,8 +451,8 @@ Word CodePageOfCharset(const char* ACharset) noexcept {
   UErrorCode Error = U_ZERO_ERROR;
   const char* const Converter = ucnv_getAlias(ACharset, 0, &Error);
   if (U_FAILURE(Error) || Converter == nullptr || std::strcmp(Converter, "US-ASCII") == 0) return cUtf8;
-  for (const TPage& Page : cPages)
-    if (std::strcmp(Page.Converter, Converter) == 0) return Page.Number;
+  for (const TCodePage& Page : CodePages())
+    if (Page.Data.Source == TCharacterData::ICU && std::strcmp(Page.Data.Name, Converter) == 0) return Page.Number;
   return cUtf8;
 }
 
@@ -639,8 +510,8 @@ std::string Narrow(Word ACodePage, std::u16string_view AText) {
   });
 }
 
-const TPage& ServedPage(Word ACodePage) {
-  if (const TPage* const Page = FindPage(ACodePage)) return *Page;
+const TCodePage& RequiredPage(Word ACodePage) {
+  if (const TCodePage* const Page = ServedPage(ACodePage)) return *Page;
   throw EEncodingError(u"There is no character data for code page " + IntToStr(ACodePage));
 }
 
@@ -670,40 +541,34 @@ const TEncoding& TEncoding::ANSI() { return ProcessEncoding<0>(); }
 const TEncoding& TEncoding::ASCII() { return ProcessEncoding<20127>(); }
 
 std::unique_ptr<TEncoding> TEncoding::GetEncoding(Word ACodePage) {
-  ServedPage(ACodePage);
+  RequiredPage(ACodePage);
   return std::make_unique<TEncoding>(ACodePage);
 }
 
 UnicodeString TEncoding::GetEncodingName() const { return IntToStr(GetCodePage()) + u" (" + GetMIMEName() + u")"; }
 
 UnicodeString TEncoding::GetMIMEName() const {
-  const TPage& Page = ServedPage(FCodePage);
+  const TCodePage& Page = RequiredPage(FCodePage);
   for (const char* const Standard : {"MIME", "IANA"}) {
     UErrorCode Error = U_ZERO_ERROR;
-    if (const char* const Name = ucnv_getStandardName(Page.Converter, Standard, &Error))
+    if (const char* const Name = ucnv_getStandardName(Page.Data.Name, Standard, &Error))
       return UnicodeString::FromUTF8(Name);
   }
   return u"cp" + IntToStr(Page.Number);
 }
 
 TBytes TEncoding::GetPreamble() const {
-  switch (GetCodePage()) {
-    case 1200: return {0xFF, 0xFE};
-    case 1201: return {0xFE, 0xFF};
-    case 12000: return {0xFF, 0xFE, 0, 0};
-    case 12001: return {0, 0, 0xFE, 0xFF};
-    case 65001: return {0xEF, 0xBB, 0xBF};
-    default: return {};
-  }
+  const TCodePage* const Page = FindCodePage(GetCodePage());
+  return Page == nullptr ? TBytes() : TBytes(Page->Mark.begin(), Page->Mark.end());
 }
 
 TBytes TEncoding::GetBytes(const UnicodeString& AText) const {
-  const std::string Bytes = Narrow(ServedPage(FCodePage).Number, AText);
+  const std::string Bytes = Narrow(RequiredPage(FCodePage).Number, AText);
   return {Bytes.begin(), Bytes.end()};
 }
 
 UnicodeString TEncoding::GetString(const void* ABytes, std::size_t ACount) const {
-  return Widen(ServedPage(FCodePage).Number, {static_cast<const char*>(ABytes), ACount});
+  return Widen(RequiredPage(FCodePage).Number, {static_cast<const char*>(ABytes), ACount});
 }
 
 UnicodeString TEncoding::GetString(const TBytes& ABytes) const { return GetString(ABytes.data(), ABytes.size()); }

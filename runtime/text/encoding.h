@@ -50,6 +50,8 @@ ZQ_API int NormalizeString(int AForm, const char16_t* ASource, int AChars, char1
 /// 65001 where it names none, and what a TAnsiCodePageScope says while one lives.
 [[nodiscard]] ZQ_API Word GetACP() noexcept;
 
+[[nodiscard]] inline Word ActualCodePage(Word ACodePage) noexcept { return ACodePage == 0 ? GetACP() : ACodePage; }
+
 /// The code page of a charset that the system names; 65001 for ASCII and for one without character data.
 [[nodiscard]] ZQ_API Word CodePageOfCharset(const char* ACharset) noexcept;
 
@@ -88,7 +90,7 @@ class ZQ_API TEncoding : public TObject {
   [[nodiscard]] static std::unique_ptr<TEncoding> GetEncoding(Word ACodePage);
 
   [[nodiscard]] std::unique_ptr<TEncoding> Clone() const { return std::make_unique<TEncoding>(FCodePage); }
-  [[nodiscard]] Word GetCodePage() const noexcept { return FCodePage == 0 ? GetACP() : FCodePage; }
+  [[nodiscard]] Word GetCodePage() const noexcept { return ActualCodePage(FCodePage); }
   /// Number and name: "1252 (windows-1252)".
   [[nodiscard]] UnicodeString GetEncodingName() const;
   /// The preferred MIME name, else the registered one, else "cp" and the number.
