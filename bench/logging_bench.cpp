@@ -104,15 +104,22 @@ void OnThreads(std::size_t AThreads, auto ARun) {
   for (std::thread& Thread : Running) Thread.join();
 }
 
+template <class TMessage>
+TMessage MessageAs() {
+  if constexpr (std::same_as<TMessage, std::string>) return ToUTF8(cMessage);
+  else return cMessage;
+}
+
 // In these two cases both sides take turns, so that what the machine does meanwhile meets both. The counter is the
 // median of the rounds.
 
 // One log call that writes, against the same bytes, preformatted, through one write(2): time to time.
+template <class TMessage>
 void LineByLoggerToOneWrite(benchmark::State& AState) {
   constexpr std::size_t cLines = 5000;
   const TPlainFile File;
   const TLogging Logging;
-  const UnicodeString Message = cMessage;
+  const auto Message = MessageAs<TMessage>();
   Logging.Log->Info(Message);
   std::vector<double> Ratios;
   std::size_t Allocated = 0;
@@ -126,7 +133,14 @@ void LineByLoggerToOneWrite(benchmark::State& AState) {
   AState.counters["ratio"] = Median(Ratios);
   AState.counters["allocations"] = static_cast<double>(Allocated) / static_cast<double>(cLines * Ratios.size());
 }
-BENCHMARK(LineByLoggerToOneWrite)->Unit(benchmark::kMillisecond)->Iterations(101);
+BENCHMARK(LineByLoggerToOneWrite<UnicodeString>)
+    ->Name("LineByLoggerToOneWrite")
+    ->Unit(benchmark::kMillisecond)
+    ->Iterations(101);
+BENCHMARK(LineByLoggerToOneWrite<std::string>)
+    ->Name("Utf8LineByLoggerToOneWrite")
+    ->Unit(benchmark::kMillisecond)
+    ->Iterations(101);
 
 // Layouts of a host that make the line of the simple one.
 class THostTextLayout : public Implements<TZqLogBase, IZqLogLayout> {
@@ -221,17 +235,19 @@ void TwoRecursiveMutexPairs(benchmark::State& AState) {
     B.unlock();
   }
 }
+template <class TMessage>
 void CallBelowTheLevel(benchmark::State& AState) {
   const TLogging Logging;
   Logger()->SetLevel(llError);
-  const UnicodeString Message = cMessage;
+  const auto Message = MessageAs<TMessage>();
   const std::size_t Before = Allocations;
   for (auto _ : AState) Logging.Log->Info(Message);
   AState.counters["allocations"] = static_cast<double>(Allocations - Before) / static_cast<double>(AState.iterations());
   Logger()->SetLevel(llDebug);
 }
 BENCHMARK(TwoRecursiveMutexPairs)->Repetitions(5)->ReportAggregatesOnly();
-BENCHMARK(CallBelowTheLevel)->Repetitions(5)->ReportAggregatesOnly();
+BENCHMARK(CallBelowTheLevel<UnicodeString>)->Name("CallBelowTheLevel")->Repetitions(5)->ReportAggregatesOnly();
+BENCHMARK(CallBelowTheLevel<std::string>)->Name("Utf8CallBelowTheLevel")->Repetitions(5)->ReportAggregatesOnly();
 
 // 200,000 lines that roll at 1 MiB with 5 backups, against a loop that formats, writes and rolls the same way by hand.
 constexpr std::size_t cRollLines = 200000;

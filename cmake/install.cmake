@@ -8,7 +8,7 @@ install(EXPORT rZqCommonTargets NAMESPACE rZqCommon:: DESTINATION ${package_fold
 
 configure_package_config_file(cmake/rZqCommonConfig.cmake.in ${PROJECT_BINARY_DIR}/rZqCommonConfig.cmake
   INSTALL_DESTINATION ${package_folder} NO_SET_AND_CHECK_MACRO)
-write_basic_package_version_file(${PROJECT_BINARY_DIR}/rZqCommonConfigVersion.cmake COMPATIBILITY SameMinorVersion)
+write_basic_package_version_file(${PROJECT_BINARY_DIR}/rZqCommonConfigVersion.cmake COMPATIBILITY ${abi_compatibility})
 install(FILES ${PROJECT_BINARY_DIR}/rZqCommonConfig.cmake ${PROJECT_BINARY_DIR}/rZqCommonConfigVersion.cmake
   DESTINATION ${package_folder})
 

@@ -24,7 +24,7 @@ constexpr TPackageUnit cUnits[] = {
 };
 
 [[gnu::constructor]] void Load() { Initialize(); }
-[[gnu::destructor]] void Unload() { Finalize(); }
+[[gnu::destructor]] void Unload() { uZqLogger::EndProcess(); }
 
 }  // namespace
 

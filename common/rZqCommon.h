@@ -28,8 +28,9 @@ struct TPackageInfo {
 /// time.
 ZQ_API void Initialize();
 /// Stops the modules in the reverse order when it has been called as often as Initialize. Appenders that still hang on
-/// loggers write their footers here. No other thread may use the library any more. The end of the process
-/// does it: a library that was loaded stays until then.
+/// loggers write their footers here. No other thread may use the library any more. A library that was loaded stays to
+/// the end of the process, which closes every appender, so that its footer is written, and frees nothing: threads that
+/// run still may log.
 ZQ_API void Finalize();
 [[nodiscard]] ZQ_API const TPackageInfo& GetPackageInfoTable();
 

@@ -1,13 +1,17 @@
 #include "common/uZqLogAppenders.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <limits>
 #include <utility>
 
+#include "common/uZqLogger/walk.h"
 #include "common/uZqWindows.h"
 #include "runtime/core/start_count.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
+#include "runtime/platform/disk_service.h"
+#include "runtime/text/local_time.h"
 #include "runtime/text/numbers.h"
 
 namespace zq {
@@ -108,13 +112,28 @@ void TZqTextFile::Close() {
 
 // ---------------------------------------------------------------------------------------- TZqFileAppender
 
+namespace {
+
+// A folder of that name that can be made, in the common documents, or among temporary files where there are none; empty
+// where neither can be had.
+UnicodeString FolderFor(const UnicodeString& AHost) {
+  for (const auto Parent : {+[] { return ZqGetShellFolder(cCommonDocuments); }, +[] { return ZqGetTempDirectory(); }})
+    try {
+      const UnicodeString Folder = Parent();
+      const UnicodeString Result = IncludeTrailingBackslash(IncludeTrailingBackslash(Folder) + AHost);
+      if (!Folder.IsEmpty() && ForceDirectories(ExcludeTrailingBackslash(Result))) return Result;
+    } catch (const Exception&) {  // the next one
+    }
+  return {};
+}
+
+}  // namespace
+
 TZqFileAppender::TZqFileAppender(TZqLogger* ALogger, const UnicodeString& AName)
     : Implements(ALogger, AName), FFileName(ChangeFileExt(ParamStr(0), u".log")) {
   if (ZqGetWindowsVersion() < cVista) return;
   const UnicodeString Host = ChangeFileExt(ExtractFileName(ParamStr(0)), u"");
-  const UnicodeString Folder = IncludeTrailingBackslash(ZqGetShellFolder(cCommonDocuments)) + Host;
-  ForceDirectories(Folder);
-  FFileName = IncludeTrailingBackslash(Folder) + Host + FFileExt;
+  if (const UnicodeString Folder = FolderFor(Host); !Folder.IsEmpty()) FFileName = Folder + Host + FFileExt;
 }
 
 TFileName TZqFileAppender::GetFileName() const {
@@ -132,7 +151,8 @@ UnicodeString TZqFileAppender::GetFileExt() const {
   return FFileExt;
 }
 
-void TZqFileAppender::SetFileName(const TFileName& AValue) {
+void TZqFileAppender::SetFileName(const TText& AText) {
+  const TFileName AValue = AText.ToString();
   const TScope Scope(FLock);
   if (AValue == FFileName) return;
   Close();
@@ -167,17 +187,46 @@ void TZqFileAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
 }
 
 void TZqFileAppender::Initialize() {
+  const TZqLogWalk Walk;
   const TScope Scope(FLock);
+  OpenFile(FAppendExisting);
+}
+
+void TZqFileAppender::OpenFile(bool AAppend) {
   const TInitializing Initializing(*this);
   FFileStream.reset();
   if (IsBlank(FFileName)) return;
-  if (!FAppendExisting && FileExists(FFileName)) DeleteFile(FFileName);
+  if (!AAppend && FileExists(FFileName)) DeleteFile(FFileName);
+  FFailedAt = UtcMilliseconds();
   FFileStream = std::make_unique<TZqTextFile>(FFileName);
-  if (const auto Layout = FLayout) {
-    const UnicodeString Header = Layout->GetHeader();
-    if (!Header.IsEmpty() && FFileStream) FFileStream->WriteLn(Header);
-  }
+  if (!FFileStream->Claim()) ZqLogTrouble(this, u"The file is written by another appender too: " + FFileName);
+  if (FLayout) WriteHeader();
   TZqBaseAppender::Initialize();
+}
+
+namespace {
+
+// The file ends as ALayout ends one, whatever the time was.
+bool EndsWithFooter(const TFileName& AFileName, IZqLogLayout& ALayout) {
+  const auto IsDigit = [](char c) { return c >= '0' && c <= '9'; };
+  const std::string Footer = ALayout.GetFooter().ToUTF8();
+  std::string Tail(Footer.size(), '\0');
+  const Int64 Count = Service<TDiskService>().ReadTail(ToSystemPath(AFileName).c_str(), Tail.data(), Tail.size());
+  return Count == static_cast<Int64>(Tail.size()) &&
+         std::equal(Tail.begin(), Tail.end(), Footer.begin(),
+             [&](char a, char b) { return a == b || (IsDigit(a) && IsDigit(b)); });
+}
+
+}  // namespace
+
+// A header stands directly behind the footer of an earlier run, which has no line end, but on a line of its own behind
+// a line that was torn.
+void TZqFileAppender::WriteHeader() {
+  const auto Layout = FLayout;
+  const UnicodeString Header = Layout->GetHeader();
+  if (Header.IsEmpty() || !FFileStream) return;
+  if (FFileStream->IsTorn() && EndsWithFooter(FFileName, *Layout) && FFileStream) FFileStream->GoOnInLine();
+  if (FFileStream) FFileStream->WriteLn(Header);
 }
 
 ZQ_HOT bool TZqFileAppender::PrepareWrite() { return true; }
@@ -187,6 +236,8 @@ ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeSt
   const TScope Scope(FLock);
   if (!PrepareWrite()) return;
   TZqBaseAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+  if (!FFileStream && FInitialized) [[unlikely]]
+    Revive();
   if (!FLayout || !FFileStream) return;
   const TWriting Writing(*this);
   utf8::TBuffer Line = std::move(FSpareLine);  // a message from within the layout comes back here and finds none
@@ -200,22 +251,44 @@ ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeSt
   if (Line.Room() <= cKeptLine) FSpareLine = std::move(Line);
 }
 
+// After a roll that couldn't open its file.
+void TZqFileAppender::Revive() {
+  const Int64 Waited = UtcMilliseconds() - FFailedAt;
+  try {
+    if (FRetryInterval != 0 && (Waited < 0 || Waited >= Int64{FRetryInterval})) Initialize();
+    if (!FFileStream) ZqLogMessageLost(u"The file isn't open: " + FFileName);
+  } catch (const EInOutError& e) {
+    ZqLogMessageLost(e.Message());
+  }
+}
+
 void TZqFileAppender::EndFile() {
   struct TEnd {
     ~TEnd() { Stream.reset(); }
     std::unique_ptr<TZqTextFile>& Stream;
   } const End{FFileStream};
   const TInitializing Ending(*this);
-  const auto Layout = FFileStream ? FLayout : nullptr;
+  const auto Layout = FFileStream && !FFileStream->IsInherited() ? FLayout : nullptr;
   const UnicodeString Footer = Layout ? Layout->GetFooter() : u"";
   if (!Footer.IsEmpty() && FFileStream) FFileStream->Write(Footer);
 }
 
 void TZqFileAppender::Close() {
+  const TZqLogWalk Walk;
   const TScope Scope(FLock);
   if (FInitializing != 0) return;
   FInitialized = false;
   EndFile();
+}
+
+Cardinal TZqFileAppender::GetRetryInterval() const {
+  const TScope Scope(FLock);
+  return FRetryInterval;
+}
+
+void TZqFileAppender::SetRetryInterval(Cardinal AValue) {
+  const TScope Scope(FLock);
+  FRetryInterval = AValue;
 }
 
 // ---------------------------------------------------------------------------------------- TZqRollingFileAppender
@@ -255,61 +328,100 @@ bool TZqRollingFileAppender::IsOfSeries(const UnicodeString& AFileName) const {
          std::all_of(Number.begin(), Number.end(), [](Char c) { return c >= u'0' && c <= u'9'; });
 }
 
-std::vector<TZqRollingFileAppender::TEntry> TZqRollingFileAppender::ScanSeries() {
-  std::vector<TEntry> Result;
+// In order of their numbers, the log file first. False, with errno, where the folder couldn't be read to its end: what
+// was found then must not be taken for the series.
+bool TZqRollingFileAppender::ScanSeries(TSeries& ASeries) {
   TSearchRec Found;
-  for (int More = FindFirst(Folder() + Base() + u"*.*", faAnyFile, Found); More == 0; More = FindNext(Found))
+  int Code = FindFirst(Folder() + Base() + u"*.*", faAnyFile, Found);
+  for (; Code == 0; Code = FindNext(Found))
     if ((Found.Attr & faDirectory) == 0 && IsOfSeries(Found.Name))
-      Result.push_back({Found.Name, CreateFileInfo(Found.Name)});
+      ASeries.push_back({Found.Name, CreateFileInfo(Found.Name)});
   FindClose(Found);
   const UnicodeString LogFile = ExtractFileName(FFileName);
-  std::sort(Result.begin(), Result.end(), [&](const TEntry& A, const TEntry& B) {
+  std::sort(ASeries.begin(), ASeries.end(), [&](const TEntry& A, const TEntry& B) {
     if (A.Info->Index != B.Info->Index) return A.Info->Index < B.Info->Index;
     if ((A.Name == LogFile) != (B.Name == LogFile)) return A.Name == LogFile;
     return A.Name < B.Name;
   });
-  return Result;
+  errno = Code;
+  return Code == cNoMoreFiles || Code == ENOENT;
 }
 
-void TZqRollingFileAppender::Renumber(const TEntry& AEntry, std::size_t APosition) {
-  const UnicodeString Path = Folder(), Ext = ExtractFileExt(FFileName);  // FileExt may hold a dot of its own
-  const UnicodeString Name =
-      Base() + u"." + IntToStr(static_cast<Int64>(APosition) + 1) + AEntry.Info->FileNameRight + Ext;
-  if (Name == AEntry.Name) return;
-  if (FileExists(Path + Name)) DeleteFile(Path + Name);
-  RenameFile(Path + AEntry.Name, Path + Name);
+// Never onto what is there: that is no file of the series, or one that couldn't be moved.
+bool TZqRollingFileAppender::MoveTo(const TEntry& AEntry, std::size_t ANumber) {
+  const UnicodeString Name = Base() + u"." + IntToStr(static_cast<Int64>(ANumber)) + AEntry.Info->FileNameRight +
+                             ExtractFileExt(FFileName);  // FileExt may hold a dot of its own
+  return Name == AEntry.Name || RenameFile(Folder() + AEntry.Name, Folder() + Name);
 }
 
-// Entries that move down to close a gap go first, from the front; those that move up go from the back. So none is
-// renamed onto one that still waits for its turn.
+// Entries that move down to close a gap go first, from the front; those that move up go from the back, the log file as
+// the last. So none meets one that still waits for its turn, and where one can't be moved the log file stands under its
+// name.
+bool TZqRollingFileAppender::MoveUp() {
+  TSeries Series;
+  if (!ScanSeries(Series)) return false;
+  const auto MovesDown = [&](std::size_t i) { return Series[i].Info->Index > static_cast<Integer>(i) + 1; };
+  for (std::size_t i = 0; i < Series.size(); ++i)
+    if (MovesDown(i) && !MoveTo(Series[i], i + 1)) return false;
+  for (std::size_t i = Series.size(); i-- > 0;)
+    if (!MovesDown(i) && !MoveTo(Series[i], i + 1)) return false;
+  return true;
+}
+
+void TZqRollingFileAppender::Complain(const UnicodeString& AWhat) {
+  const UnicodeString Reason = SysErrorMessage(errno);
+  ZqLogTrouble(this, AWhat + u" " + FFileName + u": " + Reason);
+}
+
+// Makes room for the new file before it is begun, so the series is never longer than it may be; and only when all
+// before it have moved, so that a roll that fails costs no file. The open file stays open until it has its footer.
 void TZqRollingFileAppender::RollOver() {
+  const TZqLogWalk Walk;
   const TScope Scope(FLock);
-  if (FFileStream && FInitializing != 0) return;
+  if (FMaxBackupCount == 0 || (FFileStream && (FInitializing != 0 || FFileStream->IsInherited()))) return;
+  if (!MoveUp()) {
+    Complain(u"The roll failed:");
+    FFailedRoll = {FFileStream ? FFileStream->Size() : 0, UtcMilliseconds()};
+    if (!FFileStream && FInitializing == 0) OpenFile(true);
+    return;
+  }
+  FFailedRoll.reset();
   try {
     EndFile();
   } catch (const Exception&) {  // a footer that can't be written: the roll may be what makes room again
   }
-  const std::vector<TEntry> Series = ScanSeries();
-  const std::size_t Kept = std::min<std::size_t>(Series.size(), FMaxBackupCount);
-  const auto MovesDown = [&](std::size_t i) { return Series[i].Info->Index > static_cast<Integer>(i) + 1; };
-  for (std::size_t i = Series.size(); i-- > Kept;) DeleteFile(Folder() + Series[i].Name);
-  for (std::size_t i = 0; i < Kept; ++i)
-    if (MovesDown(i)) Renumber(Series[i], i);
-  for (std::size_t i = Kept; i-- > 0;)
-    if (!MovesDown(i)) Renumber(Series[i], i);
+  Prune(FMaxBackupCount - std::size_t{1});
   if (FInitializing == 0) Initialize();
   CheckBackupCount();
 }
 
+// The file that is open stays, whatever its place.
+void TZqRollingFileAppender::Prune(std::size_t AKept) {
+  TSeries Series;
+  if (!ScanSeries(Series)) return Complain(u"Backups could not be counted:");
+  const UnicodeString Open = FFileStream ? ExtractFileName(FFileName) : u"";
+  for (std::size_t i = Series.size(); i-- > AKept;)
+    if (Series[i].Name != Open && !DeleteFile(Folder() + Series[i].Name))
+      return Complain(u"A backup could not be deleted:");
+}
+
 void TZqRollingFileAppender::CheckBackupCount() {
+  const TZqLogWalk Walk;
   const TScope Scope(FLock);
-  const std::vector<TEntry> Series = ScanSeries();
-  for (std::size_t i = Series.size(); i-- > FMaxBackupCount;) DeleteFile(Folder() + Series[i].Name);
+  Prune(FMaxBackupCount);
+}
+
+bool TZqRollingFileAppender::IsRollDue() const {
+  constexpr Int64 cMinute = 60000;
+  if (FFileStream->IsInherited()) return false;
+  if (!FFailedRoll || FFileStream->Size() >= FFailedRoll->Size + FMaxFileSize) return true;
+  const Int64 Waited = UtcMilliseconds() - FFailedRoll->Time;
+  return Waited < 0 || Waited >= cMinute;
 }
 
 ZQ_HOT void TZqRollingFileAppender::CheckRollover() {
   const TScope Scope(FLock);
-  if (FFileStream && FMaxFileSize != 0 && FFileStream->Size() >= FMaxFileSize) RollOver();
+  if (FFileStream && FMaxFileSize != 0 && FFileStream->Size() >= FMaxFileSize && IsRollDue()) RollOver();
 }
 
 ZQ_HOT bool TZqRollingFileAppender::PrepareWrite() {
@@ -318,11 +430,14 @@ ZQ_HOT bool TZqRollingFileAppender::PrepareWrite() {
   return true;
 }
 
+// What a roll couldn't put away is continued.
 void TZqRollingFileAppender::Initialize() {
+  const TZqLogWalk Walk;
   const TScope Scope(FLock);
   const TInitializing Initializing(*this);
+  FFailedRoll.reset();
   if (!FFileStream && !FAppendExisting && FileExists(FFileName)) RollOver();
-  TZqFileAppender::Initialize();
+  OpenFile(true);
 }
 
 void TZqRollingFileAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
@@ -346,6 +461,7 @@ void TZqRollingFileAppender::SetMaxFileSize(Cardinal AValue) {
 }
 
 void TZqRollingFileAppender::SetMaxBackupCount(Word AValue) {
+  const TZqLogWalk Walk;
   const TScope Scope(FLock);
   FMaxBackupCount = AValue;
   if (AValue == 0) {

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <vector>
 
 #include "common/uZqLogger.h"
@@ -97,6 +98,14 @@ class ZQ_API TZqTextFile : public TObject {
   void Write(const UnicodeString& AValue);
   /// With CR LF behind it.
   void WriteLn(const UnicodeString& AValue);
+  /// The file ends in the middle of a line: what is written next begins with a line end, unless GoOnInLine says
+  /// otherwise.
+  [[nodiscard]] bool IsTorn() const noexcept { return FFile.IsTorn(); }
+  void GoOnInLine() noexcept { FFile.GoOnInLine(); }
+  /// Opened by the process that this one was forked from: its header and footer, and the file's name, are that one's.
+  [[nodiscard]] bool IsInherited() const noexcept { return FFile.IsInherited(); }
+  /// False where another writer of the file, of this process or of another, has claimed it before.
+  [[nodiscard]] bool Claim() { return FFile.Claim(); }
   /// UTF-8 as it is, line ends and all.
   void WriteBytes(std::string_view ABytes) {
     const TLockScope Scope(FCritSect);
@@ -117,7 +126,7 @@ struct ZQ_API IZqFileAppender : Extends<IZqLogAppender> {
   virtual UnicodeString GetFileExt() const = 0;
   /// Closes the present file. A name without extension gets FileExt, one with an extension changes it. With an empty
   /// name, or one of blanks, nothing is written. What Close raises leaves the name as it was.
-  virtual void SetFileName(const TFileName& AValue) = 0;
+  virtual void SetFileName(const TText& AValue) = 0;
   /// False: an existing file is not continued when it is opened.
   virtual void SetAppendExisting(bool AValue) = 0;
   /// Closes the present file and changes the extension of its name. The dot may be left out. What Close raises leaves
@@ -128,10 +137,22 @@ struct ZQ_API IZqFileAppender : Extends<IZqLogAppender> {
   ~IZqFileAppender() = default;
 };
 
+struct ZQ_API IZqFileAppenderEx : Extends<IZqFileAppender> {
+  static constexpr TGUID IID = "{6B1B7C1E-5A0D-4A7B-9B6F-0F5E6C0B5D21}"_guid;
+  /// Milliseconds after a roll that couldn't open its new file, until a message tries again to open it. 0: only Close
+  /// makes the appender try again.
+  virtual Cardinal GetRetryInterval() const = 0;
+  virtual void SetRetryInterval(Cardinal AValue) = 0;
+
+ protected:
+  ~IZqFileAppenderEx() = default;
+};
+
 /// Writes each message as a line into a UTF-8 text file, between a header and a footer.
 ///
+/// In a process that was forked off it goes on with its lines in the parent's file, which it neither ends nor rolls.
 /// By default the file is named after the host program and lies in a folder of that name below the common documents.
-class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppender> {
+class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppenderEx> {
  public:
   TZqFileAppender(TZqLogger* ALogger, const UnicodeString& AName);
 
@@ -153,12 +174,16 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
   UnicodeString GetFileExt() const override;
   void SetFileExt(const UnicodeString& AValue) override;
   void SetAppendExisting(bool AValue) override;
-  void SetFileName(const TFileName& AValue) override;
+  void SetFileName(const TText& AValue) override;
+  Cardinal GetRetryInterval() const override;
+  void SetRetryInterval(Cardinal AValue) override;
 
  protected:
   ~TZqFileAppender() override = default;
   // Begins each Write, under its lock; a message is dropped for false.
   virtual bool PrepareWrite();
+  // Opens the file, for Initialize: AAppend continues one that is there, otherwise it is deleted first.
+  void OpenFile(bool AAppend);
   // Writes the footer and closes the file, also when the footer fails, which raises then.
   void EndFile();
 
@@ -168,6 +193,11 @@ class ZQ_API TZqFileAppender : public Implements<TZqBaseAppender, IZqFileAppende
   UnicodeString FFileExt = u".log";
 
  private:
+  void WriteHeader();
+  void Revive();
+
+  Cardinal FRetryInterval = 0;
+  Int64 FFailedAt = 0;       // when a file couldn't be opened, as UtcMilliseconds
   utf8::TBuffer FSpareLine;  // room of the last line, for the next one
 };
 
@@ -181,7 +211,8 @@ struct ZQ_API IZqRollingFileAppender : Extends<IZqFileAppender> {
   /// Deletes what the series has beyond it at once; 0 ends the file without a footer and deletes it too.
   virtual void SetMaxBackupCount(Word AValue) = 0;
   /// Ends the file, renumbers the series and begins a new file. Raises EInOutError when that can't be opened; messages
-  /// go nowhere then until Close.
+  /// go nowhere then until Close, or until the retry interval is over. A series that can't be renumbered stays as far
+  /// as it is, and the log goes on in its file.
   virtual void RollOver() = 0;
 
  protected:
@@ -200,6 +231,9 @@ class ZQ_API TZqFileInfo : public TObject {
 
 /// Keeps the log file below a size: a file at the limit becomes "app.1.log", the backups before it move one up, and the
 /// series never has more than MaxBackupCount files. Other files beside it are left alone.
+///
+/// No file of the series is replaced, or deleted for another reason than that number. A roll that fails is told as a
+/// failure of the log and tried again when the file has grown by the limit once more, or after a minute.
 ///
 /// The roll takes place in the call that found the file too large; other threads that log wait for it.
 class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRollingFileAppender> {
@@ -235,8 +269,18 @@ class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRoll
     UnicodeString Name;
     std::unique_ptr<TZqFileInfo> Info;
   };
-  std::vector<TEntry> ScanSeries();
-  void Renumber(const TEntry& AEntry, std::size_t APosition);
+  using TSeries = std::vector<TEntry>;
+  struct TFailedRoll {
+    Int64 Size;  // of the file
+    Int64 Time;  // UtcMilliseconds
+  };
+  bool ScanSeries(TSeries& ASeries);
+  bool MoveTo(const TEntry& AEntry, std::size_t ANumber);
+  bool MoveUp();
+  void Prune(std::size_t AKept);
+  void Complain(const UnicodeString& AWhat);
+  [[nodiscard]] bool IsRollDue() const;
+  std::optional<TFailedRoll> FFailedRoll;  // of the file that is open
   [[nodiscard]] UnicodeString Folder() const;
   [[nodiscard]] UnicodeString Base() const;
 };

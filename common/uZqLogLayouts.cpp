@@ -1,6 +1,7 @@
 #include "common/uZqLogLayouts.h"
 
-#include <algorithm>
+#include <chrono>
+#include <cstdio>
 
 #include "runtime/core/start_count.h"
 #include "runtime/text/datetime.h"
@@ -12,7 +13,28 @@ namespace {
 
 constinit TStartCount Starts;
 constexpr std::u16string_view cIndentStep = u"  ";
-constexpr std::size_t cTimeLength = std::string_view("yyyy-mm-dd hh:mm:ss:zzz - ").size();
+
+// "yyyy-mm-dd hh:mm:ss" of a moment in whole seconds. A log goes on where the calendar of the runtime ends: the years
+// behind 9999 have five digits.
+std::string LocalText(Int64 AUtcMilliseconds) {
+  const std::chrono::sys_seconds Moment(std::chrono::seconds(LocalMilliseconds(AUtcMilliseconds) / 1000));
+  const auto Day = std::chrono::floor<std::chrono::days>(Moment);
+  const std::chrono::year_month_day Date(Day);
+  const std::chrono::hh_mm_ss Time(Moment - Day);
+  char Text[40];
+  const int Length = std::snprintf(Text, sizeof Text, "%04d-%02u-%02u %02d:%02d:%02d", static_cast<int>(Date.year()),
+      static_cast<unsigned>(Date.month()), static_cast<unsigned>(Date.day()), static_cast<int>(Time.hours().count()),
+      static_cast<int>(Time.minutes().count()), static_cast<int>(Time.seconds().count()));
+  return {Text, static_cast<std::size_t>(Length)};
+}
+
+UnicodeString NowText() {
+  try {
+    return DateTimeToStr(Now());
+  } catch (const EConvertError&) {
+    return FromUTF8(LocalText(UtcMilliseconds()));
+  }
+}
 
 void AppendAscii(utf8::TBuffer& ALine, std::string_view AText) { ALine.AppendBytes(AText); }
 void AppendAscii(UnicodeString& ALine, std::string_view AText) { ALine.Append(FromUTF8(AText)); }
@@ -27,9 +49,9 @@ bool TZqSimpleLayout::GetInterface(const TGUID& AIID, void** AObj) {
   return true;
 }
 
-UnicodeString TZqSimpleLayout::GetHeader() { return u"Log started on : " + DateTimeToStr(Now()); }
+UnicodeString TZqSimpleLayout::GetHeader() { return u"Log started on : " + NowText(); }
 
-UnicodeString TZqSimpleLayout::GetFooter() { return u"Log stopped on : " + DateTimeToStr(Now()); }
+UnicodeString TZqSimpleLayout::GetFooter() { return u"Log stopped on : " + NowText(); }
 
 void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
   if (ALogIndent == liIndentIncrease) FIndent += cIndentStep;
@@ -38,17 +60,15 @@ void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
 
 // Most lines come in the second of the one before: then the milliseconds alone are written anew, and nobody asks for
 // the time zone.
-ZQ_HOT const char* TZqSimpleLayout::TimeNow() {
+ZQ_HOT std::string_view TZqSimpleLayout::TimeNow() {
   const Int64 Milliseconds = UtcMilliseconds();
   if (Milliseconds < FSecond || Milliseconds > FSecond + 999) {
     const Int64 Second = Milliseconds - (Milliseconds % 1000 + 1000) % 1000;
-    const TDateTime Local = UnixMillisecondsToDateTime(LocalMilliseconds(Second));
-    const UnicodeString Text = FormatDateTime(u"yyyy-mm-dd hh:mm:ss:", Local);
-    std::copy(Text.begin(), Text.end(), FTime);
+    FTime = LocalText(Second) + ":zzz - ";
     FSecond = Second;
   }
   const auto Rest = static_cast<Integer>(Milliseconds - FSecond);
-  char* const Digits = FTime + cTimeLength - 6;
+  char* const Digits = FTime.data() + FTime.size() - 6;
   Digits[0] = static_cast<char>('0' + Rest / 100);
   Digits[1] = static_cast<char>('0' + Rest / 10 % 10);
   Digits[2] = static_cast<char>('0' + Rest % 10);
@@ -60,7 +80,7 @@ ZQ_HOT void TZqSimpleLayout::Compose(TLine& ALine, const UnicodeString& ALoggerN
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   ChangeIndent(ALogIndent);
   if (!FIndent.IsEmpty()) ALine.Append(FIndent);
-  AppendAscii(ALine, {TimeNow(), cTimeLength});
+  AppendAscii(ALine, TimeNow());
   ALine.Append(ZqLogLevels[ALogLevel]);
   AppendAscii(ALine, " ");
   ALine.Append(ALoggerName);

@@ -1,6 +1,8 @@
 #pragma once
 
 #include <limits>
+#include <string>
+#include <string_view>
 
 #include "common/uZqLogger.h"
 #include "runtime/core/utf8.h"
@@ -41,7 +43,7 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
   };
 
   void ChangeIndent(TZqLogIndent ALogIndent);
-  const char* TimeNow();
+  std::string_view TimeNow();
   template <class TLine>
   void Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
       PZqDataRec AValue, TZqLogIndent ALogIndent);
@@ -49,7 +51,7 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
   TByteLayout FByteLayout{*this};
   UnicodeString FIndent;
   Int64 FSecond = std::numeric_limits<Int64>::min();  // the one that FTime shows, in milliseconds, UTC
-  char FTime[27] = "yyyy-mm-dd hh:mm:ss:zzz - ";      // how the last line began
+  std::string FTime;                                  // how the last line began: "yyyy-mm-dd hh:mm:ss:zzz - "
 };
 
 namespace uZqLogLayouts {

@@ -3,10 +3,10 @@
 #include <algorithm>
 #include <atomic>
 #include <iterator>
-#include <set>
 #include <utility>
 
 #include "common/uZqLogAppenders.h"
+#include "common/uZqLogger/walk.h"
 #include "common/uZqSysUtils.h"
 #include "common/uZqTypes.h"
 #include "common/uZqWindows.h"
@@ -25,7 +25,7 @@ namespace zq {
 namespace {
 
 constexpr Cardinal cLockTries = 5001;  // one millisecond each
-constexpr Integer cMaxNesting = 4;     // of an appender that logs into its own logger, perhaps several lines for one
+constexpr Integer cMostWithin = 200;   // messages that appenders log into their own logger, out of one
 constexpr char16_t cAppenderListRequest[] = u".AppenderList.Remove";
 constexpr char16_t cLoggerListRequest[] = u".LoggerList.Remove";
 
@@ -75,8 +75,8 @@ TZqDataRec ExceptionRec(const Exception& AValue) {
   return Result;
 }
 
-UnicodeString MethodOf(const TObject* AObject, const UnicodeString& AMethodName) {
-  return AObject->ClassName() + u"." + AMethodName;
+UnicodeString MethodOf(const TObject* AObject, const TText& AMethodName) {
+  return AObject->ClassName() + u"." + AMethodName.ToString();
 }
 
 }  // namespace
@@ -202,6 +202,7 @@ TZqLogAppenderList::TItems TZqLogAppenderList::TakeItems(TLeaves ALeaves) {
   TItems Result(std::make_move_iterator(Kept), std::make_move_iterator(FList.end()));
   FList.erase(Kept, FList.end());
   FCount = static_cast<Integer>(FList.size());
+  for (const TItem& Item : Result) ForgetFailures(Item->Appender.Get());
   return Result;
 }
 
@@ -335,7 +336,7 @@ Integer TZqLogger::_Release() {
     FRefCount.fetch_sub(1, std::memory_order_acq_rel);
     throw;
   }
-  if (Count == 0) Free();
+  if (Count == 0 && !TZqLogWalk::TakesOver(this)) Free();
   return Count;
 }
 
@@ -387,10 +388,10 @@ IntfRef<TZqLogger> TZqLogger::FindOrMakeChild(const UnicodeString& AName, bool& 
   return AMade ? New<TZqLogger>(this, AName) : Found;
 }
 
-IntfRef<IZqLogger> TZqLogger::GetLogger(const UnicodeString& AName) {
+IntfRef<IZqLogger> TZqLogger::GetLogger(const TText& AName) {
   const TLogLockScope Scope(FLock, FFullName, u".GetLogger");
   TStringList Path;
-  ZqTokenize(AName, &Path, u".", nullptr);
+  ZqTokenize(AName.ToString(), &Path, u".", nullptr);
   IntfRef<TZqLogger> Current(this);
   for (Integer i = 0; i < Path.Count(); ++i) {
     bool Made = false;
@@ -408,110 +409,164 @@ TZqLogAppenderList* TZqLogger::LockAppenders() {
   return FAppenders.get();
 }
 
-// A list whose lock stays busy is skipped. What an appender logs itself comes back here on the same thread; the depth
-// is bounded, so that one that answers every message with a message doesn't end the host.
-inline void TZqLogger::WriteToAppenders(const UnicodeString& ASender, TZqLogLevel ALogLevel,
+// A list whose lock stays busy is skipped. What an appender logs itself comes back here on the same thread; the
+// number is bounded, so that one that answers every message with a message doesn't end the host. What an appender
+// raises ends the message's way, and is told.
+inline void TZqLogger::WriteToAppenders(TZqLogWalk& AWalk, const UnicodeString& ASender, TZqLogLevel ALogLevel,
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   TZqLogAppenderList& List = *FAppenders;
-  if (!List.FLock.Enter(FFullName, u".DoLog", false)) return;
+  if (!List.FLock.Enter(FFullName, u".DoLog", false))
+    return TellLost(nullptr, FFullName, u"A lock stayed busy: " + List.FLock.LockedBy());
   struct TScope {
-    explicit TScope(TZqLogAppenderList& AList) : Locked(AList) { ++Locked.FNesting; }
+    explicit TScope(TZqLogAppenderList& AList) : Locked(AList) {
+      Locked.FWithin = Locked.FNesting++ == 0 ? 0 : Locked.FWithin + 1;
+    }
     ~TScope() {
       --Locked.FNesting;
       Locked.FLock.Leave();
     }
     TZqLogAppenderList& Locked;
   } const Scope(List);
-  if (List.FNesting > cMaxNesting) return;
+  if (List.FWithin > cMostWithin) return TellLost(nullptr, FFullName, u"One message led to too many others");
   const auto AtStart = static_cast<std::size_t>(List.Count());
   for (std::size_t i = 0; i < AtStart; ++i)
-    if (const auto Item = List.ItemOrNone(i))
-      Item->Appender->Write(ASender, FFullName, ALogLevel, ALogMessage, AValue, ALogIndent);
+    if (const auto Item = List.ItemOrNone(i)) try {
+        Item->Appender->Write(ASender, FFullName, ALogLevel, ALogMessage, AValue, ALogIndent);
+        if (AWalk.HasNotes() || AnyFails()) [[unlikely]]
+          TellOutcome(Item->Appender.Get(), FFullName, AWalk.TakeLost());
+      } catch (const Exception& e) {
+        TellLost(Item->Appender.Get(), FFullName, e.Message());
+        throw;
+      }
 }
 
-// Level and count are tested first, so that a message that nobody writes takes no lock. Each lock is left before the
-// message goes on to the parent. Flat, because after a system call each return into one more frame is mispredicted.
-[[gnu::flatten]] ZQ_HOT void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel,
-    const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+// Level and count are tested first, so that a message that nobody writes takes no lock and isn't even made.
+ZQ_HOT void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const TText& ALogMessage,
+    PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  if (TZqLogger* const First = NextToWrite(this, ALogLevel))
+    WriteUpwards(First, ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
+}
+
+// The nearest logger on the way up, from ALogger on, that has appenders for a message of that level.
+inline TZqLogger* TZqLogger::NextToWrite(TZqLogger* ALogger, TZqLogLevel ALogLevel) {
+  while (ALogger != nullptr && (ALogger->FAppenders->Count() == 0 || ALogger->TZqLogger::GetLevel() > ALogLevel))
+    ALogger = ALogger->Upwards();
+  return ALogger;
+}
+
+namespace {
+
+// Room for a text that has to be made wide: the thread's own, so that a second call finds it, and taken out meanwhile,
+// for a message from within an appender comes here too.
+class TMessageRoom {
+ public:
+  TMessageRoom() {
+    if (!Ended) std::swap(Text.Str(), Spare());
+  }
+  TMessageRoom(const TMessageRoom&) = delete;
+  TMessageRoom& operator=(const TMessageRoom&) = delete;
+  ~TMessageRoom() {
+    if (!Ended && Text.Str().capacity() <= cKept) std::swap(Text.Str(), Spare());
+  }
+  UnicodeString Text;
+
+ private:
+  static constexpr std::size_t cKept = 1 << 15;
+  static inline constinit thread_local bool Ended = false;  // messages may come after the end of a thread's objects
+  static std::u16string& Spare() {
+    struct TSpare {
+      ~TSpare() { Ended = true; }
+      std::u16string Text;
+    };
+    thread_local TSpare Kept;
+    return Kept.Text;
+  }
+};
+
+}  // namespace
+
+inline void TZqLogger::WriteUpwards(TZqLogger* AFirst, const UnicodeString& ASender, TZqLogLevel ALogLevel,
+    const TText& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  if (!ALogMessage.IsWhole()) {
+    TMessageRoom Room;
+    return WriteWhole(AFirst, ASender, ALogLevel, ALogMessage.In(Room.Text), AValue, ALogIndent);
+  }
+  UnicodeString None;
+  WriteWhole(AFirst, ASender, ALogLevel, ALogMessage.In(None), AValue, ALogIndent);
+}
+
+// Each lock is left before the message goes on to the parent. Flat, because after a system call each return into one
+// more frame is mispredicted.
+[[gnu::flatten]] ZQ_HOT void TZqLogger::WriteWhole(TZqLogger* AFirst, const UnicodeString& ASender,
+    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  TZqLogWalk Walk(this);
   try {
-    for (TZqLogger* Current = this; Current != nullptr;) {
-      if (Current->FAppenders->Count() != 0 && Current->TZqLogger::GetLevel() <= ALogLevel)
-        Current->WriteToAppenders(ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
-      Current = Current->FAdditive.load(std::memory_order_relaxed) ? Current->FParent.load(std::memory_order_relaxed)
-                                                                   : nullptr;
-    }
+    for (TZqLogger* Current = AFirst; Current != nullptr; Current = NextToWrite(Current->Upwards(), ALogLevel))
+      Current->WriteToAppenders(Walk, ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
   } catch (const Exception&) {  // logging never raises into its caller
   }
 }
 
-void TZqLogger::Trace(const UnicodeString& ALogMessage) { Log(llTrace, ALogMessage); }
-void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName) {
-  Log(llTrace, Format(u"%s($%p).%s", {AObject->ClassName(), AObject, AMethodName}));
+void TZqLogger::Trace(const TText& ALogMessage) { Log(llTrace, ALogMessage); }
+void TZqLogger::Trace(const TObject* AObject, const TText& AMethodName) {
+  Log(llTrace, Format(u"%s($%p).%s", {AObject->ClassName(), AObject, AMethodName.ToString()}));
 }
-void TZqLogger::Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) {
-  Trace(AObject, Format(AMethodName, AArgs));
+void TZqLogger::Trace(const TObject* AObject, const TText& AMethodName, TVarArgs AArgs) {
+  Trace(AObject, Format(AMethodName.ToString(), AArgs));
 }
-void TZqLogger::Debug(const UnicodeString& ALogMessage) { Log(llDebug, ALogMessage); }
-void TZqLogger::Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) { Log(llDebug, Format(ALogMessage, AArgs)); }
-void TZqLogger::Debug(const UnicodeString& AMessage, const Variant& AValue) { Log(llDebug, AMessage, AValue); }
-void TZqLogger::Debug(const UnicodeString& AMessage, const TObject* AValue) { Log(llDebug, AMessage, AValue); }
-void TZqLogger::Debug(const UnicodeString& AMessage, const Exception& AValue) { Log(llDebug, AMessage, AValue); }
-ZQ_HOT void TZqLogger::Info(const UnicodeString& ALogMessage) {
-  DoLog(FFullName, llInfo, ALogMessage, nullptr, liIndentNone);
+void TZqLogger::Debug(const TText& ALogMessage) { Log(llDebug, ALogMessage); }
+void TZqLogger::Debug(const TText& ALogMessage, TVarArgs AArgs) { Log(llDebug, Format(ALogMessage.ToString(), AArgs)); }
+void TZqLogger::Debug(const TText& AMessage, const Variant& AValue) { Log(llDebug, AMessage, AValue); }
+void TZqLogger::Debug(const TText& AMessage, const TObject* AValue) { Log(llDebug, AMessage, AValue); }
+void TZqLogger::Debug(const TText& AMessage, const Exception& AValue) { Log(llDebug, AMessage, AValue); }
+ZQ_HOT void TZqLogger::Info(const TText& ALogMessage) { DoLog(FFullName, llInfo, ALogMessage, nullptr, liIndentNone); }
+void TZqLogger::Warn(const TText& ALogMessage) { Log(llWarn, ALogMessage); }
+void TZqLogger::Error(const TText& ALogMessage) { Log(llError, ALogMessage); }
+void TZqLogger::Error(const TText& ALogMessage, const Exception& AException) {
+  Log(llError, ALogMessage.ToString() + u"\r\n" + AException.Message());
 }
-void TZqLogger::Warn(const UnicodeString& ALogMessage) { Log(llWarn, ALogMessage); }
-void TZqLogger::Error(const UnicodeString& ALogMessage) { Log(llError, ALogMessage); }
-void TZqLogger::Error(const UnicodeString& ALogMessage, const Exception& AException) {
-  Log(llError, ALogMessage + u"\r\n" + AException.Message());
-}
-void TZqLogger::Fatal(const UnicodeString& ALogMessage) { Log(llFatal, ALogMessage); }
-void TZqLogger::Fatal(const UnicodeString& ALogMessage, TVarArgs AArgs) { Log(llFatal, Format(ALogMessage, AArgs)); }
+void TZqLogger::Fatal(const TText& ALogMessage) { Log(llFatal, ALogMessage); }
+void TZqLogger::Fatal(const TText& ALogMessage, TVarArgs AArgs) { Log(llFatal, Format(ALogMessage.ToString(), AArgs)); }
 void TZqLogger::Fatal(const Exception& AException) { Log(llFatal, AException.Message(), AException); }
-void TZqLogger::Fatal(const UnicodeString& ALogMessage, const Exception& AException) {
-  Log(llFatal, ALogMessage, AException);
-}
-void TZqLogger::Count(const UnicodeString& ACounter, Integer AValue) {
-  Debug(u"#counter::" + ACounter + u"#", Variant(AValue));
+void TZqLogger::Fatal(const TText& ALogMessage, const Exception& AException) { Log(llFatal, ALogMessage, AException); }
+void TZqLogger::Count(const TText& ACounter, Integer AValue) {
+  Debug(u"#counter::" + ACounter.ToString() + u"#", Variant(AValue));
 }
 
-void TZqLogger::EnterMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel) {
+void TZqLogger::EnterMethod(const TText& AMethodName, TZqLogLevel ALogLevel) {
   Log(ALogLevel, AMethodName, liIndentIncrease);
 }
-void TZqLogger::EnterMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel) {
-  Log(ALogLevel, Format(AMethodName, AArgs), liIndentIncrease);
+void TZqLogger::EnterMethod(const TText& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel) {
+  Log(ALogLevel, Format(AMethodName.ToString(), AArgs), liIndentIncrease);
 }
-void TZqLogger::EnterMethod(const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel) {
+void TZqLogger::EnterMethod(const TObject* AObject, const TText& AMethodName, TZqLogLevel ALogLevel) {
   Log(ALogLevel, MethodOf(AObject, AMethodName), liIndentIncrease);
 }
-void TZqLogger::EnterMethod(
-    const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel) {
+void TZqLogger::EnterMethod(const TObject* AObject, const TText& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel) {
   Log(ALogLevel, Format(MethodOf(AObject, AMethodName), AArgs), liIndentIncrease);
 }
-void TZqLogger::ExitMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel) {
+void TZqLogger::ExitMethod(const TText& AMethodName, TZqLogLevel ALogLevel) {
   Log(ALogLevel, AMethodName, liIndentDecrease);
 }
-void TZqLogger::ExitMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel) {
-  Log(ALogLevel, Format(AMethodName, AArgs), liIndentDecrease);
+void TZqLogger::ExitMethod(const TText& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel) {
+  Log(ALogLevel, Format(AMethodName.ToString(), AArgs), liIndentDecrease);
 }
-void TZqLogger::ExitMethod(const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel) {
+void TZqLogger::ExitMethod(const TObject* AObject, const TText& AMethodName, TZqLogLevel ALogLevel) {
   Log(ALogLevel, MethodOf(AObject, AMethodName), liIndentDecrease);
 }
 
-ZQ_HOT void TZqLogger::Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, TZqLogIndent ALogIndent) {
+ZQ_HOT void TZqLogger::Log(TZqLogLevel ALogLevel, const TText& ALogMessage, TZqLogIndent ALogIndent) {
   DoLog(FFullName, ALogLevel, ALogMessage, nullptr, ALogIndent);
 }
-void TZqLogger::Log(
-    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Variant& AValue, TZqLogIndent ALogIndent) {
+void TZqLogger::Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const Variant& AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = VariantRec(AValue);
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
-void TZqLogger::Log(
-    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const TObject* AValue, TZqLogIndent ALogIndent) {
+void TZqLogger::Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const TObject* AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = ObjectRec(AValue);
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
-void TZqLogger::Log(
-    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Exception& AValue, TZqLogIndent ALogIndent) {
+void TZqLogger::Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const Exception& AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = ExceptionRec(AValue);
   DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
 }
@@ -519,6 +574,10 @@ void TZqLogger::Log(const IntfRef<IZqLogData>& ALogData) {
   Assert(static_cast<bool>(ALogData));
   const TZqLogData& Event = *ALogData->Data();
   Log(Event.LogLevel, Event.LogMessage, Event.Indent);
+}
+
+void IZqLogger::Log(TZqLogLevel ALogLevel, const TText& ALogMessage, TVarArgs AArgs, TZqLogIndent ALogIndent) {
+  Log(ALogLevel, Format(ALogMessage.ToString(), AArgs), ALogIndent);
 }
 
 TZqLogger* Logger() {
@@ -639,6 +698,32 @@ void uZqLogger::Stop() {
   delete std::exchange(Appenders, nullptr);
 }
 
+void TZqLogger::CollectAppenders(std::vector<IntfRef<IZqLogAppender>>& AFound) {
+  for (std::size_t i = 0; const auto Item = FAppenders->ItemOrNone(i); ++i) AFound.push_back(Item->Appender);
+  std::vector<IntfRef<TZqLogger>> Children;
+  {
+    const TLogLockScope Scope(FChildLoggers.FLock, FFullName, u".EndProcess");
+    Children.assign(FChildLoggers.FList.begin(), FChildLoggers.FList.end());
+  }
+  for (const IntfRef<TZqLogger>& Child : Children) Child->CollectAppenders(AFound);
+}
+
+void uZqLogger::EndProcess() noexcept {
+  std::vector<IntfRef<IZqLogAppender>> Found;
+  try {
+    if (TZqLogger* const Root = RootLogger.load()) Root->CollectAppenders(Found);
+    const std::lock_guard Guard(AppendersLock);
+    if (Appenders == nullptr) return;
+    for (TZqLogBase* const Appender : *Appenders)  // those that a host holds without a logger
+      if (Appender->RefCount() > 0) Found.push_back(Supports<IZqLogAppender>(Appender));
+  } catch (...) {  // what was found is closed
+  }
+  for (const IntfRef<IZqLogAppender>& Appender : Found) try {
+      Appender->Close();
+    } catch (...) {  // its last bytes can't be written, and there is nobody left to tell
+    }
+}
+
 // ---------------------------------------------------------------------------------------- log events
 
 namespace {
@@ -682,8 +767,8 @@ TZqLogData::TZqLogData(TZqLogLevel ALogLevel, UnicodeString ALogMessage)
 
 namespace {
 
-// Dumps an object and the persistent objects that it publishes. An object met again gets its head line only, and so
-// does what lies too deep: objects may lead to each other in circles, and getters may make a new one at each call.
+// Dumps an object and the persistent objects that it publishes. One that leads back to itself gets its head line only
+// there, and so does what lies too deep or is too much: getters may make a new object at each call.
 class TDumper {
  public:
   void Dump(TObject* AObject, const UnicodeString& AIndent) {
@@ -691,8 +776,11 @@ class TDumper {
     Text += AIndent + u"object " + (Component == nullptr ? UnicodeString() : Component->Name()) + u": " +
             AObject->ClassName() + u"\r\n";
     constexpr std::size_t MaxIndent = 64, MaxObjects = 10000;
-    if (AIndent.size() > MaxIndent || FMet.size() >= MaxObjects || !FMet.insert(AObject).second) return;
+    if (AIndent.size() > MaxIndent || ++FCount > MaxObjects) return;
+    if (std::find(FPath.begin(), FPath.end(), AObject) != FPath.end()) return;
+    FPath.push_back(AObject);
     for (const PPropInfo Property : GetPropList(AObject)) DumpProperty(AObject, Property, AIndent + u"  ");
+    FPath.pop_back();
   }
   UnicodeString Text;
 
@@ -726,7 +814,8 @@ class TDumper {
     }
   }
 
-  std::set<const TObject*> FMet;
+  std::vector<const TObject*> FPath;  // from the outermost to the one that is being dumped
+  std::size_t FCount = 0;
 };
 
 UnicodeString DumpObject(const TObject* AObject) {

@@ -20,6 +20,12 @@ namespace utf8 {
 class TBuffer;
 }
 
+namespace uZqLogger {
+/// The end of the process: every appender is closed, so that files get their footers. Nothing is freed, since other
+/// threads may log still: a message behind a footer opens its file again.
+void EndProcess() noexcept;
+}  // namespace uZqLogger
+
 enum class TZqLogLevel : Byte { llAll, llTrace, llDebug, llInfo, llWarn, llError, llFatal, llDoNotLog };
 using enum TZqLogLevel;
 
@@ -88,6 +94,7 @@ using PZqDataRec = const TZqDataRec*;
 class TZqLogAppenderList;
 class TZqLogBase;
 class TZqLogData;
+class TZqLogWalk;
 class TZqLogger;
 class TZqLoggerList;
 
@@ -107,8 +114,7 @@ struct ZQ_API IZqLogBase : Extends<IInterface> {
 
 /// Takes messages from loggers. Called on the thread that logs, under the lock of the logger's appender list; what it
 /// raises of the Exception family ends the message's way there and reaches nobody; anything else reaches the caller.
-/// One that logs into its own logger gets those messages too, but only a few levels deep; further ones are dropped
-/// there.
+/// One that logs into its own logger gets those messages too, some hundred for one message; further ones are lost.
 struct ZQ_API IZqLogAppender : Extends<IZqLogBase> {
   static constexpr TGUID IID = "{D10CACCF-3B7D-4CBB-96D3-7C22BEF8FE7E}"_guid;
   /// ASender is the full name of the logger that was called, ALoggerName that of the logger whose appender this is.
@@ -245,7 +251,7 @@ class ZQ_API TZqLogData : public Implements<TInterfacedObject, IZqLogData> {
 };
 
 /// The value as text. Objects are dumped with their published read-write properties, one line each; an object that
-/// is met again, or lies very deep, is told by its head line alone. Raises what a conversion raises.
+/// leads back to itself, or lies very deep, is told there by its head line alone. Raises what a conversion raises.
 [[nodiscard]] ZQ_API UnicodeString ZqDataRecToString(PZqDataRec AValue);
 
 // ---------------------------------------------------------------------------------------- loggers
@@ -253,9 +259,16 @@ class ZQ_API TZqLogData : public Implements<TInterfacedObject, IZqLogData> {
 namespace detail {
 template <class T>
 concept TNumber = std::is_arithmetic_v<T> && std::constructible_from<Variant, T>;
-}
+// What goes as the text that it has as an argument.
+template <class T>
+concept TShown =
+    std::constructible_from<TVarRec, const T&> && !std::constructible_from<Variant, const T&> &&
+    !std::derived_from<T, Exception> && !std::convertible_to<const T&, const TObject*> && !std::same_as<T, TVarRec> &&
+    !std::same_as<T, TZqLogIndent> && (!std::is_array_v<T> || std::convertible_to<const T&, const char8_t*>);
+}  // namespace detail
 
-/// A named logger of the tree. Any thread may call any operation. Once a message is made, logging lets no Exception
+/// A named logger of the tree. Any thread may call any operation. Texts come wide or as UTF-8; they are converted only
+/// for who writes them. Once a message is made, logging lets no Exception
 /// out; before that comes out what Format raises for a text and its arguments, and EAssertionFailed for an empty event.
 /// What an appender raises beside Exception is let out. An AObject that names a method or a logger isn't null.
 /// Operations on the tree and on the appenders raise Exception when a lock stays busy for some five seconds.
@@ -282,7 +295,7 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   /// Keeps a count on AConfig; new children get the root's. An empty one is handed down to all children.
   virtual void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) = 0;
   /// Finds or makes the logger at a dotted path below this one; this logger itself for an empty path.
-  virtual IntfRef<IZqLogger> GetLogger(const UnicodeString& AName) = 0;
+  virtual IntfRef<IZqLogger> GetLogger(const TText& AName) = 0;
   /// The child named by the class of AObject.
   virtual IntfRef<IZqLogger> GetLogger(const TObject* AObject) = 0;
   virtual bool IsDebugEnabled() const = 0;
@@ -290,60 +303,66 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   virtual bool IsFatalEnabled() const = 0;
   virtual bool IsInfoEnabled() const = 0;
   virtual bool IsWarnEnabled() const = 0;
+  [[nodiscard]] bool IsTraceEnabled() const { return IsEnabledFor(llTrace); }
   /// Whether this logger's own appenders would get a message of that level.
   virtual bool IsEnabledFor(TZqLogLevel ALogLevel) const = 0;
 
-  /// The forms of a std::string_view take UTF-8.
-  void Trace(std::string_view ALogMessage) { Trace(UnicodeString::FromUTF8(ALogMessage)); }
-  void Debug(std::string_view ALogMessage) { Debug(UnicodeString::FromUTF8(ALogMessage)); }
-  void Info(std::string_view ALogMessage) { Info(UnicodeString::FromUTF8(ALogMessage)); }
-  void Warn(std::string_view ALogMessage) { Warn(UnicodeString::FromUTF8(ALogMessage)); }
-  void Error(std::string_view ALogMessage) { Error(UnicodeString::FromUTF8(ALogMessage)); }
-  void Fatal(std::string_view ALogMessage) { Fatal(UnicodeString::FromUTF8(ALogMessage)); }
-  virtual void Trace(const UnicodeString& ALogMessage) = 0;
-  virtual void Trace(const TObject* AObject, const UnicodeString& AMethodName) = 0;
-  virtual void Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) = 0;
-  virtual void Debug(const UnicodeString& ALogMessage) = 0;
-  virtual void Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) = 0;
-  virtual void Debug(const UnicodeString& AMessage, const Variant& AValue) = 0;
-  virtual void Debug(const UnicodeString& AMessage, const TObject* AValue) = 0;
-  virtual void Debug(const UnicodeString& AMessage, const Exception& AValue) = 0;
+  virtual void Trace(const TText& ALogMessage) = 0;
+  virtual void Trace(const TObject* AObject, const TText& AMethodName) = 0;
+  virtual void Trace(const TObject* AObject, const TText& AMethodName, TVarArgs AArgs) = 0;
+  virtual void Debug(const TText& ALogMessage) = 0;
+  virtual void Debug(const TText& ALogMessage, TVarArgs AArgs) = 0;
+  virtual void Debug(const TText& AMessage, const Variant& AValue) = 0;
+  virtual void Debug(const TText& AMessage, const TObject* AValue) = 0;
+  virtual void Debug(const TText& AMessage, const Exception& AValue) = 0;
   /// A number goes as a Variant, and a literal 0 is none but a number.
   template <detail::TNumber T>
-  void Debug(const UnicodeString& AMessage, T AValue) {
+  void Debug(const TText& AMessage, T AValue) {
     Debug(AMessage, Variant(AValue));
   }
-  virtual void Info(const UnicodeString& ALogMessage) = 0;
-  virtual void Warn(const UnicodeString& ALogMessage) = 0;
-  virtual void Error(const UnicodeString& ALogMessage) = 0;
-  virtual void Fatal(const UnicodeString& ALogMessage) = 0;
-  virtual void Fatal(const UnicodeString& ALogMessage, TVarArgs AArgs) = 0;
+  /// A duration, an optional, a path, an enumeration's value, a range and the like: as its text.
+  template <detail::TShown T>
+  void Debug(const TText& AMessage, const T& AValue) {
+    Debug(AMessage, Variant(VarRecText(AValue)));
+  }
+  virtual void Info(const TText& ALogMessage) = 0;
+  virtual void Warn(const TText& ALogMessage) = 0;
+  virtual void Error(const TText& ALogMessage) = 0;
+  virtual void Fatal(const TText& ALogMessage) = 0;
+  virtual void Fatal(const TText& ALogMessage, TVarArgs AArgs) = 0;
   virtual void Fatal(const Exception& AException) = 0;
-  virtual void Fatal(const UnicodeString& ALogMessage, const Exception& AException) = 0;
-  virtual void Count(const UnicodeString& ACounter, Integer AValue) = 0;
+  virtual void Fatal(const TText& ALogMessage, const Exception& AException) = 0;
+  virtual void Count(const TText& ACounter, Integer AValue) = 0;
   /// Does nothing.
   virtual void ClearLog() = 0;
-  virtual void EnterMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
-  virtual void EnterMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void EnterMethod(const TText& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void EnterMethod(const TText& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void EnterMethod(const TObject* AObject, const TText& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
   virtual void EnterMethod(
-      const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
-  virtual void EnterMethod(
-      const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
-  virtual void ExitMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
-  virtual void ExitMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
-  virtual void ExitMethod(
-      const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
-  virtual void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, TZqLogIndent ALogIndent = liIndentNone) = 0;
-  virtual void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Variant& AValue,
+      const TObject* AObject, const TText& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void ExitMethod(const TText& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void ExitMethod(const TText& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void ExitMethod(const TObject* AObject, const TText& AMethodName, TZqLogLevel ALogLevel = llDebug) = 0;
+  virtual void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, TZqLogIndent ALogIndent = liIndentNone) = 0;
+  virtual void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const Variant& AValue,
       TZqLogIndent ALogIndent = liIndentNone) = 0;
-  virtual void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const TObject* AValue,
+  virtual void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const TObject* AValue,
       TZqLogIndent ALogIndent = liIndentNone) = 0;
-  virtual void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Exception& AValue,
+  virtual void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const Exception& AValue,
       TZqLogIndent ALogIndent = liIndentNone) = 0;
   virtual void Log(const IntfRef<IZqLogData>& ALogData) = 0;
+  // With arguments, for the operations that have no such form of their own.
+  void Info(const TText& ALogMessage, TVarArgs AArgs) { Log(llInfo, ALogMessage, AArgs); }
+  void Warn(const TText& ALogMessage, TVarArgs AArgs) { Log(llWarn, ALogMessage, AArgs); }
+  void Error(const TText& ALogMessage, TVarArgs AArgs) { Log(llError, ALogMessage, AArgs); }
+  void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, TVarArgs AArgs, TZqLogIndent ALogIndent = liIndentNone);
   template <detail::TNumber T>
-  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, T AValue, TZqLogIndent ALogIndent = liIndentNone) {
+  void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, T AValue, TZqLogIndent ALogIndent = liIndentNone) {
     Log(ALogLevel, ALogMessage, Variant(AValue), ALogIndent);
+  }
+  template <detail::TShown T>
+  void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const T& AValue, TZqLogIndent ALogIndent = liIndentNone) {
+    Log(ALogLevel, ALogMessage, Variant(VarRecText(AValue)), ALogIndent);
   }
 
   /// The logger holds a count on AAppender until it is removed.
@@ -461,8 +480,10 @@ class ZQ_API TZqLogAppenderList : public TComponent {
   void LetGoOf(const TComponent* AComponent);
 
   TZqLogger* FLogger;
-  std::atomic<Integer> FCount = 0;      // FList's size
-  Integer FNesting = 0;                 // calls to appenders under way, guarded by FLock
+  std::atomic<Integer> FCount = 0;  // FList's size
+  // Guarded by FLock:
+  Integer FNesting = 0;                 // calls to appenders under way
+  Integer FWithin = 0;                  // messages within the outermost of them
   mutable TCriticalSection FItemsLock;  // innermost, for a few instructions: an appender may end on any thread
   TItems FList;
   TZqLogLock FLock;
@@ -495,7 +516,7 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   void SetAdditive(bool AValue) override { FAdditive.store(AValue, std::memory_order_relaxed); }
   void SetParentLevel(bool AValue) override { FParentLevel.store(AValue, std::memory_order_relaxed); }
   void SetLevel(TZqLogLevel AValue) override;
-  IntfRef<IZqLogger> GetLogger(const UnicodeString& AName) override;
+  IntfRef<IZqLogger> GetLogger(const TText& AName) override;
   IntfRef<IZqLogger> GetLogger(const TObject* AObject) override;
   bool IsDebugEnabled() const override { return IsEnabledFor(llDebug); }
   bool IsErrorEnabled() const override { return IsEnabledFor(llError); }
@@ -511,39 +532,39 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   using IZqLogger::Log;
   using IZqLogger::Trace;
   using IZqLogger::Warn;
-  void Trace(const UnicodeString& ALogMessage) override;
-  void Trace(const TObject* AObject, const UnicodeString& AMethodName) override;
-  void Trace(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs) override;
-  void Debug(const UnicodeString& ALogMessage) override;
-  void Debug(const UnicodeString& ALogMessage, TVarArgs AArgs) override;
-  void Debug(const UnicodeString& AMessage, const Variant& AValue) override;
-  void Debug(const UnicodeString& AMessage, const TObject* AValue) override;
-  void Debug(const UnicodeString& AMessage, const Exception& AValue) override;
-  void Info(const UnicodeString& ALogMessage) override;
-  void Warn(const UnicodeString& ALogMessage) override;
-  void Error(const UnicodeString& ALogMessage) override;
+  void Trace(const TText& ALogMessage) override;
+  void Trace(const TObject* AObject, const TText& AMethodName) override;
+  void Trace(const TObject* AObject, const TText& AMethodName, TVarArgs AArgs) override;
+  void Debug(const TText& ALogMessage) override;
+  void Debug(const TText& ALogMessage, TVarArgs AArgs) override;
+  void Debug(const TText& AMessage, const Variant& AValue) override;
+  void Debug(const TText& AMessage, const TObject* AValue) override;
+  void Debug(const TText& AMessage, const Exception& AValue) override;
+  void Info(const TText& ALogMessage) override;
+  void Warn(const TText& ALogMessage) override;
+  void Error(const TText& ALogMessage) override;
   /// The message of AException on a line of its own behind ALogMessage.
-  void Error(const UnicodeString& ALogMessage, const Exception& AException);
-  void Fatal(const UnicodeString& ALogMessage) override;
-  void Fatal(const UnicodeString& ALogMessage, TVarArgs AArgs) override;
+  void Error(const TText& ALogMessage, const Exception& AException);
+  void Fatal(const TText& ALogMessage) override;
+  void Fatal(const TText& ALogMessage, TVarArgs AArgs) override;
   void Fatal(const Exception& AException) override;
-  void Fatal(const UnicodeString& ALogMessage, const Exception& AException) override;
-  void Count(const UnicodeString& ACounter, Integer AValue) override;
+  void Fatal(const TText& ALogMessage, const Exception& AException) override;
+  void Count(const TText& ACounter, Integer AValue) override;
   void ClearLog() override {}
-  void EnterMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
-  void EnterMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) override;
-  void EnterMethod(const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
-  void EnterMethod(const TObject* AObject, const UnicodeString& AMethodName, TVarArgs AArgs,
-      TZqLogLevel ALogLevel = llDebug) override;
-  void ExitMethod(const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
-  void ExitMethod(const UnicodeString& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) override;
-  void ExitMethod(const TObject* AObject, const UnicodeString& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
-  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, TZqLogIndent ALogIndent = liIndentNone) override;
-  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Variant& AValue,
+  void EnterMethod(const TText& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
+  void EnterMethod(const TText& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) override;
+  void EnterMethod(const TObject* AObject, const TText& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
+  void EnterMethod(
+      const TObject* AObject, const TText& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) override;
+  void ExitMethod(const TText& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
+  void ExitMethod(const TText& AMethodName, TVarArgs AArgs, TZqLogLevel ALogLevel = llDebug) override;
+  void ExitMethod(const TObject* AObject, const TText& AMethodName, TZqLogLevel ALogLevel = llDebug) override;
+  void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, TZqLogIndent ALogIndent = liIndentNone) override;
+  void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const Variant& AValue,
       TZqLogIndent ALogIndent = liIndentNone) override;
-  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const TObject* AValue,
+  void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const TObject* AValue,
       TZqLogIndent ALogIndent = liIndentNone) override;
-  void Log(TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, const Exception& AValue,
+  void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const Exception& AValue,
       TZqLogIndent ALogIndent = liIndentNone) override;
   void Log(const IntfRef<IZqLogData>& ALogData) override;
 
@@ -563,13 +584,24 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   friend class TZqLoggerList;
   friend class TZqLogAppenderList;
   friend ZQ_API TZqLogger* Logger();
+  friend void uZqLogger::EndProcess() noexcept;
 
-  void DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue,
+  void DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const TText& ALogMessage, PZqDataRec AValue,
       TZqLogIndent ALogIndent);
-  void WriteToAppenders(const UnicodeString& ASender, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
+  static TZqLogger* NextToWrite(TZqLogger* ALogger, TZqLogLevel ALogLevel);
+  // Where a message goes on to; null where it ends.
+  [[nodiscard]] TZqLogger* Upwards() const noexcept {
+    return FAdditive.load(std::memory_order_relaxed) ? FParent.load(std::memory_order_relaxed) : nullptr;
+  }
+  void WriteUpwards(TZqLogger* AFirst, const UnicodeString& ASender, TZqLogLevel ALogLevel, const TText& ALogMessage,
       PZqDataRec AValue, TZqLogIndent ALogIndent);
+  void WriteWhole(TZqLogger* AFirst, const UnicodeString& ASender, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent);
+  void WriteToAppenders(TZqLogWalk& AWalk, const UnicodeString& ASender, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent);
   IntfRef<TZqLogger> FindOrMakeChild(const UnicodeString& AName, bool& AMade);
   void ClearChildLoggers();
+  void CollectAppenders(std::vector<IntfRef<IZqLogAppender>>& AFound);
   IntfRef<IZqLogConfigurator> SetConfigurator(IntfRef<IZqLogConfigurator> AConfig);
   void ReplaceConfig(const IntfRef<IZqLogConfigurator>& AConfig, std::vector<IntfRef<IZqLogConfigurator>>& AFormer);
 

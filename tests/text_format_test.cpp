@@ -1,15 +1,24 @@
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <cmath>
 #include <cstdlib>
+#include <exception>
+#include <filesystem>
 #include <limits>
 #include <optional>
+#include <stdexcept>
+#include <string>
+#include <system_error>
+#include <utility>
+#include <vector>
 
 #include "runtime/text/casing.h"
 #include "runtime/text/encoding.h"
 #include "runtime/text/format.h"
 #include "runtime/text/numbers.h"
 #include "runtime/values/variants.h"
+#include "tests/fakes/clock.h"
 #include "tests/support/support.h"
 
 // With LOCPATH set the system's newlocale leaks the search path that it makes of it.
@@ -172,6 +181,20 @@ TEST_F(TextLocale, SettingsComeFromTheEnvironment) {
       Shown += u"|" + Text;
     EXPECT_EQ(Shown, Want) << Locale;
   }
+}
+
+UnicodeString Told(const TVarRec& AValue) { return Format(u"%s", {AValue}); }
+
+TEST(Format, TakesWhatAUserHandsIt) {
+  using namespace std::chrono_literals;
+  const TScriptedClock Clock(0, 3600);
+  EXPECT_EQ(
+      Told(std::runtime_error("\xC3\xA4")) + Told(std::make_exception_ptr(EConvertError(u"e"))) + Told(u8"ö"), u"äeö");
+  EXPECT_EQ(Told(std::make_error_code(std::errc::no_such_file_or_directory)), u"No such file or directory");
+  EXPECT_EQ(
+      Told(std::optional<int>()) + Told(std::optional<std::string>("x")) + Told(std::filesystem::path("a/b")), u"xa/b");
+  EXPECT_EQ(Told(5us) + Told(90min) + Told(std::chrono::sys_seconds(1s)), u"5 us90 min1970-01-01 01:00:01:000");
+  EXPECT_EQ(Told(std::vector{1, -2}) + Told(std::vector<std::string>{}) + Told(rfReplaceAll), u"[1, -2][]0");
 }
 
 }  // namespace

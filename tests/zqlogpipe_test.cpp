@@ -48,7 +48,9 @@ TEST_P(PipeWrongUse, EndsWithAClearMessage) {
 INSTANTIATE_TEST_SUITE_P(Uses, PipeWrongUse,
     testing::Values(TWrongUse{"UnknownOption", "--colour", 2, "unknown option '--colour'"},
         TWrongUse{"NoValue", "--logger", 2, "--logger needs a value"},
-        TWrongUse{"NoNumber", "--max-size 12k", 2, "--max-size takes a whole number from 0 to 4294967295, not '12k'"},
+        TWrongUse{"NoNumber", "--max-size 12x", 2, "--max-size takes a whole number from 0 to 4294967295, not '12x'"},
+        TWrongUse{"TooLarge", "--max-size=4G", 2, "--max-size takes less than 4G, not '4G'"},
+        TWrongUse{"ValueOfASwitch", "--quiet=1", 2, "--quiet takes no value"},
         TWrongUse{"TooManyBackups", "--backups 65536", 2, "--backups takes a whole number from 1 to 65535"},
         TWrongUse{"BlankFile", "--file ' '", 2, "--file needs a name"},
         TWrongUse{"NoLevel", "--level loud", 2, "not 'loud'"},
@@ -94,6 +96,25 @@ TEST_F(Pipe, LevelWordOfTheLineDecides) {
     EXPECT_THAT(SplitLines(Folder.Read(Name)),
         testing::ElementsAre(_, HasSubstr(" - Error "), HasSubstr(" - Fatal "), HasSubstr(" - Debug "), _));
   }
+}
+
+TEST_F(Pipe, OptionsOfFormAndOutput) {
+  Folder.Write("in", "one\n");
+  EXPECT_EQ(Run("--file=app --no-time --tee --quiet --max-size=1k in"), "0: one\n");
+  EXPECT_EQ(SplitLines(Folder.Read("app.log"))[1], "Info root.zqlogpipe - one");
+  EXPECT_THAT(Run("--version"), StartsWith("0: zqlogpipe 0."));
+  EXPECT_THAT(Run("-h"), StartsWith("0: usage: "));
+}
+
+TEST_F(Pipe, SignalsBeginTheFileAgainAndEndItWithWhatWasRead) {
+  Folder.Write("script", "mkfifo f; " ZQ_TEST_LOGPIPE
+                         " --file app.log <f & p=$!; exec 3>f; echo one >&3; sleep 0.3; mv app.log old.log; "
+                         "kill -HUP $p; sleep 0.2; echo two >&3; printf tail >&3; sleep 0.3; kill -TERM $p; wait $p; "
+                         "echo status $?");
+  EXPECT_THAT(Run("--version >/dev/null; sh script"), HasSubstr("status 143"));
+  EXPECT_EQ(Texts(Folder.Read("old.log")), std::vector<std::string>{"one"});
+  EXPECT_EQ(Texts(Folder.Read("app.log")), (std::vector<std::string>{"two", "tail"}));
+  for (const char* const Name : {"old.log", "app.log"}) EXPECT_THAT(Folder.Read(Name), HasSubstr("\nLog stopped on"));
 }
 
 TEST_F(Pipe, FullDeviceIsAFailure) {

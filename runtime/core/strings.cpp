@@ -48,6 +48,18 @@ UnicodeString UnicodeString::Copy(Integer AIndex, Integer ACount) const { return
 
 Integer UnicodeString::Pos(std::u16string_view ASub) const noexcept { return zq::Pos(ASub, FText); }
 
+const UnicodeString& TText::Make(UnicodeString& ARoom) const {
+  std::u16string& Text = ARoom.Str();
+  if (FForm == Wide) {
+    Text.assign(static_cast<const char16_t*>(FData), FSize);
+  } else {
+    Text.resize(FSize);
+    const auto Malformed = FForm == Path ? utf8::TMalformed::Escape : utf8::TMalformed::Replace;
+    Text.resize(utf8::Decode(static_cast<const char*>(FData), FSize, Text.data(), Malformed));
+  }
+  return ARoom;
+}
+
 void TagCodePage(RawByteString& AString, Word ACodePage) noexcept { AString.Tag(ACodePage); }
 
 UTF8String UTF8Encode(const UnicodeString& AText) { return AText.ToUTF8(); }

@@ -212,6 +212,53 @@ class ShortString {
   char FText[255] = {};
 };
 
+/// A text for the length of a call, in whatever form the caller has it: wide, UTF-8 bytes, or a path of the standard
+/// library, whose bytes travel as those of file names do. It is converted only where In is called, and a UnicodeString
+/// is never copied. Bytes of another code page and texts of other widths don't convert.
+class ZQ_API TText {
+ public:
+  TText(const UnicodeString& AText ZQ_LIFETIMEBOUND) noexcept : FData(&AText), FForm(Whole) {}
+  TText(std::u16string_view AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.data(), AText.size(), Wide) {}
+  TText(const std::u16string& AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.data(), AText.size(), Wide) {}
+  TText(const char16_t* AText ZQ_LIFETIMEBOUND) noexcept : TText(std::u16string_view(AText == nullptr ? u"" : AText)) {}
+  TText(std::string_view AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.data(), AText.size(), Utf8) {}
+  TText(const std::string& AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.data(), AText.size(), Utf8) {}
+  TText(const char* AText ZQ_LIFETIMEBOUND) noexcept : TText(std::string_view(AText == nullptr ? "" : AText)) {}
+  TText(const UTF8String& AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.View()) {}
+  TText(std::u8string_view AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.data(), AText.size(), Utf8) {}
+  TText(const char8_t* AText ZQ_LIFETIMEBOUND) noexcept : TText(std::u8string_view(AText == nullptr ? u8"" : AText)) {}
+  template <class T>
+    requires requires(const T& APath) {
+      { APath.native() } -> std::same_as<const std::string&>;
+      APath.root_path();
+    }
+  TText(const T& APath ZQ_LIFETIMEBOUND) noexcept : TText(APath.native().data(), APath.native().size(), Path) {}
+  TText(const RawByteString& AText) = delete;
+  TText(const wchar_t* AText) = delete;
+  TText(const char32_t* AText) = delete;
+  TText(std::nullptr_t) = delete;
+
+  /// The text itself, in ARoom where it has to be made.
+  [[nodiscard]] const UnicodeString& In(UnicodeString& ARoom ZQ_LIFETIMEBOUND) const ZQ_LIFETIMEBOUND {
+    return IsWhole() ? *static_cast<const UnicodeString*>(FData) : Make(ARoom);
+  }
+  /// A UnicodeString of the caller's: In needs no room.
+  [[nodiscard]] bool IsWhole() const noexcept { return FForm == Whole; }
+  [[nodiscard]] UnicodeString ToString() const {
+    UnicodeString Room;
+    return In(Room);
+  }
+
+ private:
+  enum TForm : std::uint8_t { Whole, Wide, Utf8, Path };
+  TText(const void* AData, std::size_t ASize, TForm AForm) noexcept : FData(AData), FSize(ASize), FForm(AForm) {}
+  const UnicodeString& Make(UnicodeString& ARoom) const;
+
+  const void* FData;
+  std::size_t FSize = 0;
+  TForm FForm;
+};
+
 [[nodiscard]] inline UnicodeString FromUTF8(std::string_view AText) { return UnicodeString::FromUTF8(AText); }
 [[nodiscard]] inline std::string ToUTF8(const UnicodeString& AText) { return AText.ToUTF8(); }
 [[nodiscard]] ZQ_API UTF8String UTF8Encode(const UnicodeString& AText);

@@ -1,13 +1,10 @@
 #include "runtime/io/files.h"
 
-#include <dirent.h>
-#include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
-#include <cstdio>
 #include <cstdlib>
 #include <string>
 #include <string_view>
@@ -16,20 +13,22 @@
 #include <vector>
 
 #include "runtime/io/paths.h"
+#include "runtime/platform/disk_service.h"
 #include "runtime/text/local_time.h"
 
 namespace zq {
 
 namespace {
 
-constexpr Integer cNoMoreFiles = 18;
 constexpr Integer cOnlyOnDemand = faHidden | faSysFile | faDirectory;
 
-bool Stat(const UnicodeString& AFileName, struct stat& AResult) {
-  return ::stat(ToSystemPath(AFileName).c_str(), &AResult) == 0;
+TDiskService& Disk() noexcept { return Service<TDiskService>(); }
+
+bool Stat(const UnicodeString& AFileName, TDiskFacts& AResult) {
+  return Disk().Stat(ToSystemPath(AFileName).c_str(), true, AResult) == 0;
 }
 
-Integer AttributesOf(mode_t AMode, std::string_view AName) noexcept {
+Integer AttributesOf(Cardinal AMode, std::string_view AName) noexcept {
   Integer Result = S_ISDIR(AMode) ? faDirectory : S_ISREG(AMode) ? faArchive : S_ISLNK(AMode) ? faSymLink : faSysFile;
   if ((AMode & 0222U) == 0) Result |= faReadOnly;
   if (AName.starts_with('.') && AName != "." && AName != "..") Result |= faHidden;
@@ -59,34 +58,24 @@ std::u16string Normalize(std::u16string_view APath) {
 // --------------------------------------------------------------------------------------------- Files and folders
 
 bool FileExists(const UnicodeString& AFileName) {
-  struct stat Facts {};
-  return Stat(AFileName, Facts) && !S_ISDIR(Facts.st_mode);
+  TDiskFacts Facts;
+  return Stat(AFileName, Facts) && !S_ISDIR(Facts.Mode);
 }
 
 bool DirectoryExists(const UnicodeString& ADirectory) {
-  struct stat Facts {};
-  return Stat(ADirectory, Facts) && S_ISDIR(Facts.st_mode);
+  TDiskFacts Facts;
+  return Stat(ADirectory, Facts) && S_ISDIR(Facts.Mode);
 }
 
-bool DeleteFile(const UnicodeString& AFileName) { return ::unlink(ToSystemPath(AFileName).c_str()) == 0; }
+bool DeleteFile(const UnicodeString& AFileName) { return Disk().Unlink(ToSystemPath(AFileName).c_str()) == 0; }
 
 bool RenameFile(const UnicodeString& AOldName, const UnicodeString& ANewName) {
-  const std::string Old = ToSystemPath(AOldName);
-  const std::string New = ToSystemPath(ANewName);
-  if (::renameat2(AT_FDCWD, Old.c_str(), AT_FDCWD, New.c_str(), RENAME_NOREPLACE) == 0) return true;
-  if (errno != EINVAL && errno != ENOSYS) return false;
-  // This file system can't do it in one step.
-  struct stat Facts {};
-  if (::lstat(New.c_str(), &Facts) == 0) {
-    errno = EEXIST;
-    return false;
-  }
-  return ::rename(Old.c_str(), New.c_str()) == 0;
+  return Disk().Rename(ToSystemPath(AOldName).c_str(), ToSystemPath(ANewName).c_str()) == 0;
 }
 
-bool CreateDir(const UnicodeString& ADirectory) { return ::mkdir(ToSystemPath(ADirectory).c_str(), 0777) == 0; }
+bool CreateDir(const UnicodeString& ADirectory) { return Disk().MakeFolder(ToSystemPath(ADirectory).c_str()) == 0; }
 
-bool RemoveDir(const UnicodeString& ADirectory) { return ::rmdir(ToSystemPath(ADirectory).c_str()) == 0; }
+bool RemoveDir(const UnicodeString& ADirectory) { return Disk().RemoveFolder(ToSystemPath(ADirectory).c_str()) == 0; }
 
 bool ForceDirectories(const UnicodeString& ADirectory) {
   if (ADirectory.IsEmpty() || DirectoryExists(ADirectory)) return true;
@@ -94,10 +83,10 @@ bool ForceDirectories(const UnicodeString& ADirectory) {
   // What can't be made may be there; the last step tells.
   for (std::size_t Slash = Path.find('/', 1); Slash != Path.npos; Slash = Path.find('/', Slash + 1)) {
     Path[Slash] = '\0';
-    ::mkdir(Path.c_str(), 0777);
+    Disk().MakeFolder(Path.c_str());
     Path[Slash] = '/';
   }
-  return ::mkdir(Path.c_str(), 0777) == 0 || DirectoryExists(ADirectory);
+  return Disk().MakeFolder(Path.c_str()) == 0 || DirectoryExists(ADirectory);
 }
 
 UnicodeString ExpandFileName(const UnicodeString& AFileName) {
@@ -119,14 +108,14 @@ UnicodeString GetCurrentDir() {
 bool SetCurrentDir(const UnicodeString& ADirectory) { return ::chdir(ToSystemPath(ADirectory).c_str()) == 0; }
 
 Integer FileGetAttr(const UnicodeString& AFileName) {
-  struct stat Facts {};
+  TDiskFacts Facts;
   if (!Stat(AFileName, Facts)) return -1;
-  return AttributesOf(Facts.st_mode, ToSystemPath(ExtractFileName(AFileName)));
+  return AttributesOf(Facts.Mode, ToSystemPath(ExtractFileName(AFileName)));
 }
 
 Int64 FileSizeOf(const UnicodeString& AFileName) {
-  struct stat Facts {};
-  return Stat(AFileName, Facts) ? Facts.st_size : -1;
+  TDiskFacts Facts;
+  return Stat(AFileName, Facts) ? Facts.Size : -1;
 }
 
 UnicodeString SysErrorMessage(Integer AErrorCode) { return FromUTF8(std::generic_category().message(AErrorCode)); }
@@ -135,44 +124,42 @@ UnicodeString SysErrorMessage(Integer AErrorCode) { return FromUTF8(std::generic
 
 class TFolderScan {
  public:
-  TFolderScan(const std::string& APath, std::u16string_view AMask, Integer AAttr)
-      : FFolder(::opendir(APath.c_str())), FMask(AMask), FAttr(AAttr) {}
+  TFolderScan(const UnicodeString& APath, std::u16string_view AMask, Integer AAttr)
+      : FPath(ToSystemPath(APath)), FFolder(Disk().OpenFolder((FPath + '.').c_str())), FMask(AMask), FAttr(AAttr) {}
   TFolderScan(const TFolderScan&) = delete;
   TFolderScan& operator=(const TFolderScan&) = delete;
   ~TFolderScan() {
-    if (FFolder != nullptr) ::closedir(FFolder);
+    if (FFolder != nullptr) FDisk.CloseFolder(FFolder);
   }
 
   [[nodiscard]] bool IsOpen() const noexcept { return FFolder != nullptr; }
   Integer Next(TSearchRec& ARec);
 
  private:
-  DIR* FFolder;
+  TDiskService& FDisk = Disk();
+  std::string FPath;  // of the folder, with a separator at the end
+  void* FFolder;
   std::u16string FMask;
   Integer FAttr;
 };
 
 namespace {
 
-Int64 Microseconds(const statx_timestamp& AStamp) noexcept { return AStamp.tv_sec * 1000000LL + AStamp.tv_nsec / 1000; }
-
-// Facts of a folder's entry; of a link to what is no folder, the facts of that. False where it is gone.
-bool Describe(int AFolder, const char* AName, TSearchRec& ARec) {
-  constexpr unsigned Wanted = STATX_BASIC_STATS | STATX_BTIME;
-  struct statx Facts {};
-  struct statx Target {};
-  if (::statx(AFolder, AName, AT_SYMLINK_NOFOLLOW, Wanted, &Facts) != 0) return false;
+// Facts of an entry; of a link to what is no folder, the facts of that. False, with errno, where there is none.
+bool Describe(const std::string& APath, TSearchRec& ARec) {
+  TDiskFacts Facts, Target;
+  if (Disk().Stat(APath.c_str(), false, Facts) != 0) return false;
   Integer Link = 0;
-  if (S_ISLNK(Facts.stx_mode) && ::statx(AFolder, AName, 0, Wanted, &Target) == 0 && !S_ISDIR(Target.stx_mode)) {
+  if (S_ISLNK(Facts.Mode) && Disk().Stat(APath.c_str(), true, Target) == 0 && !S_ISDIR(Target.Mode)) {
     Facts = Target;
     Link = faSymLink;
   }
-  const std::string_view Path = AName;
-  ARec.Name = FromSystemPath(Path.substr(Path.rfind('/') + 1));
-  ARec.Attr = AttributesOf(Facts.stx_mode, Path.substr(Path.rfind('/') + 1)) | Link;
-  ARec.Size = S_ISDIR(Facts.stx_mode) ? 0 : static_cast<Int64>(Facts.stx_size);
-  ARec.ModifiedTime = Microseconds(Facts.stx_mtime);
-  ARec.CreatedTime = (Facts.stx_mask & STATX_BTIME) != 0 ? Microseconds(Facts.stx_btime) : ARec.ModifiedTime;
+  const std::string_view Name = std::string_view(APath).substr(APath.rfind('/') + 1);
+  ARec.Name = FromSystemPath(Name);
+  ARec.Attr = AttributesOf(Facts.Mode, Name) | Link;
+  ARec.Size = S_ISDIR(Facts.Mode) ? 0 : Facts.Size;
+  ARec.ModifiedTime = Facts.ModifiedTime;
+  ARec.CreatedTime = Facts.CreatedTime != 0 ? Facts.CreatedTime : Facts.ModifiedTime;
   return true;
 }
 
@@ -213,13 +200,14 @@ TDateTime TSearchRec::TimeStamp() const {
 
 Integer TFolderScan::Next(TSearchRec& ARec) {
   for (;;) {
-    errno = 0;
-    const dirent* const Entry = ::readdir(FFolder);
-    if (Entry == nullptr) return errno != 0 ? errno : cNoMoreFiles;
-    // An entry that vanishes meanwhile was never there.
-    if (FitsMask(FromSystemPath(Entry->d_name), FMask) && Describe(::dirfd(FFolder), Entry->d_name, ARec) &&
-        Wanted(ARec, FAttr))
-      return 0;
+    const char* const Name = FDisk.ReadFolder(FFolder);
+    if (Name == nullptr) return errno != 0 ? errno : cNoMoreFiles;
+    if (!FitsMask(FromSystemPath(Name), FMask)) continue;
+    if (Describe(FPath + Name, ARec)) {
+      if (Wanted(ARec, FAttr)) return 0;
+    } else if (errno != ENOENT) {  // one that vanishes meanwhile was never there
+      return errno;
+    }
   }
 }
 
@@ -232,10 +220,10 @@ Integer FindFirst(const UnicodeString& AMask, Integer AAttr, TSearchRec& ARec) {
   const UnicodeString Name = ExtractFileName(AMask);
   if (Name.IsEmpty()) return ENOENT;
   if (Name.View().find_first_of(u"*?") == std::u16string_view::npos) {
-    if (!Describe(AT_FDCWD, ToSystemPath(AMask).c_str(), ARec)) return errno;
+    if (!Describe(ToSystemPath(AMask), ARec)) return errno;
     return Wanted(ARec, AAttr) ? 0 : cNoMoreFiles;
   }
-  auto Scan = std::make_unique<TFolderScan>(ToSystemPath(ExtractFilePath(AMask) + u"."), Name, AAttr);
+  auto Scan = std::make_unique<TFolderScan>(ExtractFilePath(AMask), Name, AAttr);
   if (!Scan->IsOpen()) return errno;
   const Integer Result = Scan->Next(ARec);
   if (Result == 0) ARec.Scan = std::move(Scan);

@@ -19,6 +19,9 @@ inline constexpr Integer faArchive = 0x20;  ///< ordinary file
 inline constexpr Integer faSymLink = 0x400;
 inline constexpr Integer faAnyFile = 0x1FF;
 
+/// What FindFirst and FindNext give for no (further) entry.
+inline constexpr Integer cNoMoreFiles = 18;
+
 /// Follows links; False for a folder.
 [[nodiscard]] ZQ_API bool FileExists(const UnicodeString& AFileName);
 [[nodiscard]] ZQ_API bool DirectoryExists(const UnicodeString& ADirectory);
@@ -68,7 +71,7 @@ struct ZQ_API TSearchRec {
 
 /// Finds the entries that fit the last part of AMask: "*" any text, "?" one character, case as it stands. "*.*" fits
 /// every name and a trailing ".*" also one without a dot. Entries that are hidden, of the system or folders come only
-/// if AAttr has their bit. 0 for a find; otherwise an errno, or 18 for no (further) entry.
+/// if AAttr has their bit. 0 for a find; otherwise an errno, or cNoMoreFiles.
 ZQ_API Integer FindFirst(const UnicodeString& AMask, Integer AAttr, TSearchRec& ARec);
 ZQ_API Integer FindNext(TSearchRec& ARec);
 /// Ends the scan; harmless when there is none.

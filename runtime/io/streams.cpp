@@ -15,6 +15,7 @@
 
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
+#include "runtime/platform/disk_service.h"
 #include "runtime/text/encoding.h"
 
 namespace zq {
@@ -127,9 +128,7 @@ int LockOf(Word AMode) noexcept {
 int OpenFile(const std::string& APath, Word AMode) noexcept {
   static_assert(O_RDONLY == fmOpenRead && O_WRONLY == fmOpenWrite && O_RDWR == fmOpenReadWrite);
   const int Flags = AMode == fmCreate ? O_RDWR | O_CREAT | O_TRUNC : AMode & 3;
-  int Result = -1;
-  do Result = ::open(APath.c_str(), Flags | O_CLOEXEC, 0666);
-  while (Result < 0 && errno == EINTR);
+  const int Result = Service<TDiskService>().Open(APath.c_str(), Flags, 0666);
   struct stat Facts {};
   if (Result < 0 || ::fstat(Result, &Facts) != 0) return Result;
   // A file system without locks grants what it can't refuse.

@@ -12,6 +12,7 @@
 #include "runtime/core/utf8.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
+#include "runtime/platform/disk_service.h"
 #include "runtime/text/code_pages.h"
 #include "runtime/text/encoding.h"
 
@@ -41,7 +42,7 @@ char* Copy(char* ADest, std::string_view ABytes) noexcept { return std::copy(ABy
 }  // namespace
 
 TTextFile::~TTextFile() {
-  if (IsOpen()) ::close(FHandle);
+  if (IsOpen()) Service<TDiskService>().Close(FHandle);
 }
 
 void TTextFile::Assign(const UnicodeString& AFileName, Word ACodePage) {
@@ -54,16 +55,20 @@ void TTextFile::Rewrite() { Open(O_CREAT | O_TRUNC, u"create"); }
 
 void TTextFile::Append() { Open(0, u"open"); }
 
-void TTextFile::AppendOrCreate() { Open(O_CREAT, u"open"); }
+void TTextFile::AppendOrCreate() {
+  Open(O_CREAT, u"open");
+  char Last = '\n';
+  FTorn = Service<TDiskService>().ReadTail(ToSystemPath(FFileName).c_str(), &Last, 1) == 1 && Last != '\n';
+}
 
 void TTextFile::Open(int AFlags, const char16_t* AStep) {
   Close();
   const std::string Path = ToSystemPath(FFileName);
   // A pipe that nobody reads is a failure then, and no endless wait; writing waits as it does for any file.
-  do FHandle = ::open(Path.c_str(), AFlags | O_WRONLY | O_APPEND | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0666);
-  while (!IsOpen() && errno == EINTR);
+  FHandle = Service<TDiskService>().Open(Path.c_str(), AFlags | O_WRONLY | O_APPEND | O_NOCTTY | O_NONBLOCK, 0666);
   if (!IsOpen()) Fail(AStep, errno);
   ::fcntl(FHandle, F_SETFL, O_APPEND);
+  FProcess = ::getpid();
   FWritten = 0;
   FTorn = false;
 }
@@ -100,7 +105,7 @@ ZQ_HOT void TTextFile::WriteBytes(std::string_view ABytes) {
 
 ZQ_HOT void TTextFile::Put(std::string_view ABytes) {
   while (!ABytes.empty()) {
-    const ssize_t Count = ::write(FHandle, ABytes.data(), ABytes.size());
+    const Int64 Count = Service<TDiskService>().Write(FHandle, ABytes.data(), ABytes.size());
     if (Count < 0 && errno == EINTR) continue;
     if (Count <= 0) Fail(u"write", Count < 0 ? errno : ENOSPC);
     FWritten.store(Written() + Count, std::memory_order_relaxed);
@@ -113,8 +118,16 @@ void TTextFile::Flush() { RequireOpen(); }
 
 void TTextFile::Close() {
   // The descriptor is gone whatever close says, and EINTR tells of no loss.
-  if (IsOpen() && ::close(std::exchange(FHandle, -1)) != 0 && errno != EINTR) Fail(u"close", errno);
+  if (IsOpen() && Service<TDiskService>().Close(std::exchange(FHandle, -1)) != 0 && errno != EINTR)
+    Fail(u"close", errno);
 }
+
+bool TTextFile::Claim() {
+  RequireOpen();
+  return Service<TDiskService>().Claim(FHandle);
+}
+
+bool TTextFile::IsInherited() const noexcept { return IsOpen() && FProcess != ::getpid(); }
 
 void TTextFile::RequireOpen() const {
   if (!IsOpen()) Fail(u"write", EBADF);

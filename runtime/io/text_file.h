@@ -15,7 +15,8 @@ namespace zq {
 ///
 /// Every write is one system call that carries the text and its line end, appending to whatever the file holds then;
 /// nothing is buffered here. A failed step raises EInOutError, whose ErrorCode is errno. After a write that reached the
-/// file in part (disk full) the next one begins with a line end, so that a torn line never swallows it.
+/// file in part (disk full), now or in an earlier run, the next one begins with a line end, so that a torn line never
+/// swallows it.
 /// One thread at a time.
 class ZQ_API TTextFile : public TObject {
  public:
@@ -33,6 +34,15 @@ class ZQ_API TTextFile : public TObject {
   void AppendOrCreate();
   void Write(const UnicodeString& AText);
   void WriteLn(const UnicodeString& AText = {});
+  /// The file ends in the middle of a line, and the next write begins with a line end: behind a write that got through
+  /// in part, or where AppendOrCreate found it so.
+  [[nodiscard]] bool IsTorn() const noexcept { return FTorn; }
+  /// The next write stands directly behind what is there.
+  void GoOnInLine() noexcept { FTorn = false; }
+  /// The file was opened by the process that this one was forked from.
+  [[nodiscard]] bool IsInherited() const noexcept;
+  /// False where another appends to the file too, and has claimed it.
+  [[nodiscard]] bool Claim();
   /// Ready bytes, line ends and all, as they are.
   void WriteBytes(std::string_view ABytes);
   /// Nothing to do but to raise on a file that isn't open: each write has gone to the system.
@@ -56,8 +66,9 @@ class ZQ_API TTextFile : public TObject {
   std::string FLong;  // room for texts that the stack doesn't take; kept for the next one
   std::atomic<Int64> FWritten = 0;
   int FHandle = -1;
+  int FProcess = 0;  // that opened it
   Word FCodePage = 65001;
-  bool FTorn = false;  // the last write got through in part
+  bool FTorn = false;
 };
 
 }  // namespace zq

@@ -5,7 +5,9 @@
 #include <optional>
 
 #include "runtime/core/exceptions.h"
+#include "runtime/text/datetime.h"
 #include "runtime/text/encoding.h"
+#include "runtime/text/local_time.h"
 #include "runtime/text/numbers.h"
 
 namespace zq {
@@ -19,6 +21,7 @@ UnicodeString BytesToText(std::string_view ABytes, Word ACodePage) {
 }
 
 std::optional<UnicodeString> TextOf(const TVarRec& AValue) {
+  if (AValue.Enum != nullptr) return detail::EnumText(*AValue.Enum, AValue.VInteger);
   switch (AValue.Kind) {
     case TVarRec::vtWideText: return UnicodeString(AValue.VWideText);
     case TVarRec::vtAnsiText: return BytesToText(AValue.VAnsiText, AValue.CodePage);
@@ -162,6 +165,25 @@ class TFormatter {
 };
 
 }  // namespace
+
+UnicodeString VarRecText(const TVarRec& AValue) {
+  if (auto Text = TextOf(AValue)) return *std::move(Text);
+  switch (AValue.Kind) {
+    case TVarRec::vtInteger: return IntToStr(AValue.VInteger);
+    case TVarRec::vtUInt64: return IntToStr(AValue.VUInt64);
+    case TVarRec::vtBoolean: return BoolToStr(AValue.VBoolean, true);
+    case TVarRec::vtExtended: return FloatToStr(AValue.VExtended);
+    default: return IntToHex(AddressOf(AValue).value_or(0), 8);
+  }
+}
+
+UnicodeString detail::MomentText(Int64 AUtcMilliseconds) {
+  return FormatDateTime(u"yyyy-mm-dd hh:mm:ss:zzz", UnixMillisecondsToDateTime(LocalMilliseconds(AUtcMilliseconds)));
+}
+
+UnicodeString detail::ExceptionText(const void* AExceptionPtr) {
+  return ExceptionRef(*static_cast<const std::exception_ptr*>(AExceptionPtr)).Message();
+}
 
 UnicodeString Format(const UnicodeString& AFormat, std::span<const TVarRec> AArgs, const TFormatSettings& ASettings) {
   return TFormatter(AFormat, AArgs, &ASettings).Run();

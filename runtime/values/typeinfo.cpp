@@ -220,6 +220,11 @@ UnicodeString GetEnumName(PTypeInfo AType, Integer AOrdinal) {
   return IntToStr(AOrdinal);
 }
 
+UnicodeString detail::EnumText(const std::type_info& AType, Int64 AOrdinal) {
+  const PTypeInfo Type = ClassInfo(TClass(AType));
+  return Type == nullptr ? IntToStr(AOrdinal) : GetEnumName(Type, static_cast<Integer>(AOrdinal));
+}
+
 Integer GetEnumValue(PTypeInfo AType, const UnicodeString& AName) {
   const auto& Names = AType->Data.EnumNames;
   const auto Found = std::find_if(

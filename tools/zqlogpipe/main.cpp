@@ -1,6 +1,7 @@
 // zqlogpipe: logs each line of its input through rZqCommon into a file that rolls by size.
 
 #include <fcntl.h>
+#include <poll.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -8,6 +9,7 @@
 #include <cerrno>
 #include <charconv>
 #include <chrono>
+#include <csignal>
 #include <cstdio>
 #include <cstring>
 #include <iterator>
@@ -16,11 +18,13 @@
 #include <stdexcept>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "common/uZqLogAppenders.h"
 #include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
+#include "common/uZqLogger/failures.h"
 #include "runtime/core/utf8.h"
 
 namespace {
@@ -34,14 +38,28 @@ constexpr char cHelp[] =
     "\n"
     "  --file FILE       log file, .log is added to a name without extension; missing folders are made. May be given\n"
     "                    again for a further log file\n"
-    "  --max-size BYTES  a file that has reached this size is rolled, 0 for never (10485760)\n"
+    "  --max-size BYTES  a file that has reached this size is rolled, 0 for never (10M); K, M and G behind the number\n"
+    "                    stand for its powers of 1024\n"
     "  --backups COUNT   files of the series, FILE among them, 1 to 65535 (5)\n"
     "  --no-append       begin a new FILE; one that exists becomes a backup\n"
     "  --logger NAME     dotted path of the logger below the root (zqlogpipe)\n"
     "  --level LEVEL     level of the lines: trace, debug, info, warn or warning, error, fatal (info)\n"
     "  --detect-level    the first such word in a line decides its level, whatever its case; --level where there is "
     "none\n"
-    "  --help            this text\n"
+    "  --no-time         lines without the time\n"
+    "  --tee             lines go to standard output too, as they come\n"
+    "  --retry SECONDS   a line that can't be written waits so long and is tried again, until it is written; without "
+    "it\n"
+    "                    the line is lost and counted\n"
+    "  --quiet           no last line on standard error\n"
+    "  --version         the version\n"
+    "  -h, --help        this text\n"
+    "\n"
+    "An option's value may also stand behind '=', as in --file=app.log. At TERM and INT what was read is written, and "
+    "the\n"
+    "files are ended; the exit status is 128 and the signal's number then. At HUP the files are ended and begun again "
+    "with\n"
+    "the next line, for who has moved them away.\n"
     "\n"
     "A line ends at LF, or at the end of its input; it may have any length, and all other bytes are its text. The log "
     "is\n"
@@ -63,7 +81,12 @@ struct TOptions {
   std::string Logger = "zqlogpipe";
   TZqLogLevel Level = llInfo;
   bool DetectLevel = false;
+  bool Time = true;
+  bool Tee = false;
+  bool Quiet = false;
+  Cardinal Retry = 0;  // seconds; 0: a line that can't be written is lost
   bool Help = false;
+  bool Version = false;
 };
 
 struct TLevelWord {
@@ -105,21 +128,39 @@ T Number(std::string_view AOption, std::string_view AText, T ALeast) {
   return Result;
 }
 
+// A number of bytes, of their powers of 1024 with K, M or G behind it.
+Cardinal Bytes(std::string_view AOption, std::string_view AText) {
+  constexpr std::string_view Units = "KMG";
+  const std::size_t Unit = AText.empty() ? Units.npos : Units.find(static_cast<char>(std::toupper(AText.back())));
+  if (Unit == Units.npos) return Number<Cardinal>(AOption, AText, 0);
+  const UInt64 Result = UInt64{Number<Cardinal>(AOption, AText.substr(0, AText.size() - 1), 0)} << (10 * (Unit + 1));
+  if (Result <= std::numeric_limits<Cardinal>::max()) return static_cast<Cardinal>(Result);
+  throw TUsageError(std::string(AOption) + " takes less than 4G, not '" + std::string(AText) + "'");
+}
+
 TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
   TOptions Result;
   for (std::size_t i = 0; i < AWords.size(); ++i) {
-    const std::string_view Word = AWords[i];
+    const std::size_t Equals = AWords[i].starts_with("--") ? AWords[i].find('=') : std::string_view::npos;
+    const std::string_view Whole = AWords[i], Word = Whole.substr(0, Equals);
+    bool Taken = Equals == std::string_view::npos;
     const auto Value = [&] {
+      if (!std::exchange(Taken, true)) return std::string(Whole.substr(Equals + 1));
       if (++i == AWords.size()) throw TUsageError(std::string(Word) + " needs a value");
       return std::string(AWords[i]);
     };
     if (Word == "--file") Result.Files.push_back(Value());
-    else if (Word == "--max-size") Result.MaxSize = Number<Cardinal>(Word, Value(), 0);
+    else if (Word == "--max-size") Result.MaxSize = Bytes(Word, Value());
     else if (Word == "--backups") Result.Backups = Number<zq::Word>(Word, Value(), 1);
     else if (Word == "--no-append") Result.Append = false;
     else if (Word == "--logger") Result.Logger = Value();
     else if (Word == "--detect-level") Result.DetectLevel = true;
-    else if (Word == "--help") Result.Help = true;
+    else if (Word == "--no-time") Result.Time = false;
+    else if (Word == "--tee") Result.Tee = true;
+    else if (Word == "--quiet") Result.Quiet = true;
+    else if (Word == "--retry") Result.Retry = Number<Cardinal>(Word, Value(), 1);
+    else if (Word == "--version") Result.Version = true;
+    else if (Word == "--help" || Word == "-h") Result.Help = true;
     else if (Word == "--level") {
       const std::string Text = Value();
       const auto Level = LevelOf(Text);
@@ -130,14 +171,65 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
           i = AWords.size();
     else if (Word.size() > 1 && Word.front() == '-') throw TUsageError("unknown option '" + std::string(Word) + "'");
     else Result.Inputs.emplace_back(Word);
+    if (!Taken) throw TUsageError(std::string(Word) + " takes no value");
   }
   const auto IsBlank = [](const std::string& AName) { return Trim(FromUTF8(AName)).IsEmpty(); };
   if (std::any_of(Result.Files.begin(), Result.Files.end(), IsBlank)) throw TUsageError("--file needs a name");
-  if (Result.Files.empty() && !Result.Help) throw TUsageError("--file is needed");
+  if (Result.Files.empty() && !Result.Help && !Result.Version) throw TUsageError("--file is needed");
   return Result;
 }
 
-/// Counts rolls, and keeps the failures that a logger never shows.
+// ---- Signals
+
+volatile std::sig_atomic_t StopSignal = 0;
+volatile std::sig_atomic_t ReopenSignal = 0;
+int WakeUp[2] = {-1, -1};  // a byte for each signal, so that none is missed just before a wait
+
+void OnSignal(int ANumber) {
+  const int Saved = errno;
+  (ANumber == SIGHUP ? ReopenSignal : StopSignal) = ANumber;
+  static_cast<void>(!::write(WakeUp[1], "", 1));
+  errno = Saved;
+}
+
+void HearSignals() {
+  if (::pipe2(WakeUp, O_CLOEXEC | O_NONBLOCK) != 0) throw std::runtime_error(std::strerror(errno));
+  for (const int Number : {SIGTERM, SIGINT, SIGHUP}) {
+    struct sigaction Action {};
+    Action.sa_handler = OnSignal;
+    ::sigaction(Number, &Action, nullptr);
+  }
+  for (const int Number : {SIGXFSZ, SIGPIPE}) std::signal(Number, SIG_IGN);  // the write tells
+}
+
+// Until there is something to read from AHandle (-1: from nothing), a signal has come, or the time is over.
+void Wait(int AHandle, int AMilliseconds) {
+  pollfd Events[] = {{AHandle, POLLIN, 0}, {WakeUp[0], POLLIN, 0}};
+  ::poll(Events, 2, AMilliseconds);
+  for (char Byte = 0; ::read(WakeUp[0], &Byte, 1) > 0;) continue;
+}
+
+// ---- Appender and layout
+
+/// The simple layout's line without the time.
+class TNoTimeLayout : public Implements<TZqSimpleLayout, IZqLogByteLayout> {
+ public:
+  using Implements::Implements;
+  void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec, TZqLogIndent) override {
+    ALine.Append(ZqLogLevels[ALogLevel]);
+    ALine.AppendBytes(" ");
+    ALine.Append(ALoggerName);
+    ALine.AppendBytes(" - ");
+    ALine.Append(ALogMessage);
+  }
+
+ protected:
+  ~TNoTimeLayout() override = default;
+};
+
+/// Counts rolls, and keeps the failures that a logger never shows. A line that can't be written is tried again, where
+/// that is wanted, until a signal ends the tool.
 class TPipeAppender : public TZqRollingFileAppender {
  public:
   using TZqRollingFileAppender::TZqRollingFileAppender;
@@ -147,15 +239,22 @@ class TPipeAppender : public TZqRollingFileAppender {
   }
   void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override {
-    try {
-      TZqRollingFileAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
-      ++Written;
-    } catch (const Exception& e) {
-      if (Failed++ == 0) Failure = e.Message();
-      if (!FFileStream) Close();  // a roll that couldn't open its new file: the next line tries again
-      throw;
-    }
+    for (;; Wait(-1, static_cast<int>(std::min(Retry, cMostSeconds) * 1000))) try {
+        TZqRollingFileAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+        ++Written;
+        return;
+      } catch (const Exception& e) {
+        if (!FFileStream) Close();  // a roll that couldn't open its new file: the next line tries again
+        if (Retry == 0 || StopSignal != 0) {
+          if (Failed++ == 0) Failure = e.Message();
+          throw;
+        }
+        if (Waits++ == 0) std::fprintf(stderr, "zqlogpipe: waiting: %s\n", e.what());
+      }
   }
+  static constexpr Cardinal cMostSeconds = 86400;
+  Cardinal Retry = 0;  // seconds
+  std::size_t Waits = 0;
   std::size_t Rolls = 0;
   std::size_t Written = 0;
   std::size_t Failed = 0;
@@ -191,8 +290,14 @@ class TPipe {
     std::string Rest;
     ssize_t Got = 0;
     std::vector<char> Block(1 << 16);
-    while ((Got = ::read(Handle, Block.data(), Block.size())) > 0 || (Got < 0 && errno == EINTR))
+    for (;;) {
+      Wait(Handle, -1);
+      if (StopSignal != 0) break;
+      if (std::exchange(ReopenSignal, 0) != 0) Finish();  // the next line opens the files again
+      Got = ::read(Handle, Block.data(), Block.size());
+      if (Got == 0 || (Got < 0 && errno != EINTR && errno != EAGAIN)) break;
       if (Got > 0) Split(Rest, {Block.data(), static_cast<std::size_t>(Got)});
+    }
     const std::string Fault = Got < 0 ? Reason(Standard ? "standard input" : AInput) : "";
     if (!Standard) ::close(Handle);
     if (!Rest.empty()) LogLine(Rest);
@@ -227,7 +332,8 @@ class TPipe {
     Appender->SetMaxFileSize(FOptions.MaxSize);
     Appender->SetMaxBackupCount(FOptions.Backups);
     Appender->SetAppendExisting(FOptions.Append);
-    Appender->SetLayout(TZqLogBaseClass::Of<TZqSimpleLayout>());
+    Appender->Retry = FOptions.Retry;
+    Appender->SetLayout(FOptions.Time ? TZqLogBaseClass::Of<TZqSimpleLayout>() : TZqLogBaseClass::Of<TNoTimeLayout>());
     Appender->Initialize();  // a file that can't be opened shows here, before the first line
     FLogger->AddAppender(FAppenders.back());
   }
@@ -243,8 +349,16 @@ class TPipe {
 
   void LogLine(std::string_view ALine) {
     ++FRead;
+    if (FOptions.Tee) Show(ALine);
     const auto Level = FOptions.DetectLevel ? DetectLevel(ALine) : std::nullopt;
     FLogger->Log(Level.value_or(FOptions.Level), TextOf(ALine));
+  }
+
+  // What standard output doesn't take is no line of the log that is lost.
+  static void Show(std::string_view ALine) {
+    std::fwrite(ALine.data(), 1, ALine.size(), stdout);
+    std::fputc('\n', stdout);
+    std::fflush(stdout);
   }
 
   const TOptions& FOptions;
@@ -261,8 +375,11 @@ int Pipe(const TOptions& AOptions) {
     std::fprintf(stderr, "zqlogpipe: %.*s\n", static_cast<int>(AText.size()), AText.data());
     Status = 1;
   };
+  ZqShowLogFailures(false);  // told below
+  HearSignals();
   TPipe Pipe(AOptions);
   for (const std::string& Input : AOptions.Inputs.empty() ? std::vector<std::string>{"-"} : AOptions.Inputs) try {
+      if (StopSignal != 0) break;
       Pipe.Run(Input);
     } catch (const std::runtime_error& e) {
       Complain(e.what());
@@ -275,9 +392,10 @@ int Pipe(const TOptions& AOptions) {
   if (const std::size_t Failed = Pipe.Sum(&TPipeAppender::Failed))
     Complain(std::to_string(Failed) + " lines were not written: " + Pipe.Failure());
   const std::chrono::duration<double> Seconds = std::chrono::steady_clock::now() - Begin;
-  std::fprintf(stderr, "zqlogpipe: %zu lines read, %zu lines written, %zu files rolled, %.3f s\n", Pipe.Read(),
-      Pipe.Sum(&TPipeAppender::Written), Pipe.Sum(&TPipeAppender::Rolls), Seconds.count());
-  return Status;
+  if (!AOptions.Quiet)
+    std::fprintf(stderr, "zqlogpipe: %zu lines read, %zu lines written, %zu files rolled, %.3f s\n", Pipe.Read(),
+        Pipe.Sum(&TPipeAppender::Written), Pipe.Sum(&TPipeAppender::Rolls), Seconds.count());
+  return StopSignal != 0 ? 128 + StopSignal : Status;
 }
 
 }  // namespace
@@ -285,9 +403,8 @@ int Pipe(const TOptions& AOptions) {
 int main(int ACount, char** AWords) {
   try {
     const TOptions Options = ParseOptions({AWords + 1, AWords + ACount});
-    if (!Options.Help) return Pipe(Options);
-    std::fputs(cHelp, stdout);
-    return 0;
+    if (Options.Help || Options.Version) std::fputs(Options.Help ? cHelp : "zqlogpipe " ZQ_VERSION "\n", stdout);
+    return Options.Help || Options.Version ? 0 : Pipe(Options);
   } catch (const TUsageError& e) {
     std::fprintf(stderr, "zqlogpipe: %s\nTry zqlogpipe --help.\n", e.what());
     return 2;

@@ -1,0 +1,20 @@
+# bash completion for zqlogpipe
+
+_zqlogpipe() {
+  local word=${COMP_WORDS[COMP_CWORD]} before=${COMP_WORDS[COMP_CWORD - 1]} name
+  COMPREPLY=()
+  case $before in
+    --level)
+      mapfile -t COMPREPLY < <(compgen -W 'trace debug info warn warning error fatal' -- "$word")
+      return ;;
+    --max-size | --backups | --logger) return ;;
+  esac
+  if [[ $word == -* ]]; then
+    mapfile -t COMPREPLY < <(compgen -W '--file --max-size --backups --no-append --logger --level --detect-level
+      --help' -- "$word")
+  else
+    compopt -o filenames
+    while IFS= read -r name; do COMPREPLY+=("$name"); done < <(compgen -f -- "$word")
+  fi
+}
+complete -F _zqlogpipe zqlogpipe
