@@ -120,7 +120,7 @@ UnicodeString FolderFor(const UnicodeString& AHost) {
   for (const auto Parent : {+[] { return ZqGetShellFolder(cCommonDocuments); }, +[] { return ZqGetTempDirectory(); }})
     try {
       const UnicodeString Folder = Parent();
-      const UnicodeString Result = IncludeTrailingBackslash(IncludeTrailingBackslash(Folder) + AHost);
+      UnicodeString Result = IncludeTrailingBackslash(IncludeTrailingBackslash(Folder) + AHost);
       if (!Folder.IsEmpty() && ForceDirectories(ExcludeTrailingBackslash(Result))) return Result;
     } catch (const Exception&) {  // the next one
     }

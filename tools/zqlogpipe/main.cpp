@@ -234,8 +234,9 @@ class TPipeAppender : public TZqRollingFileAppender {
  public:
   using TZqRollingFileAppender::TZqRollingFileAppender;
   void RollOver() override {
+    const Cardinal Before = FFileStream ? FFileStream->Size() : 0;
     TZqRollingFileAppender::RollOver();
-    ++Rolls;
+    if (!FFileStream || FFileStream->Size() < Before) ++Rolls;  // not where the file goes on
   }
   void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override {
