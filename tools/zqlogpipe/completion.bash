@@ -7,11 +7,11 @@ _zqlogpipe() {
     --level)
       mapfile -t COMPREPLY < <(compgen -W 'trace debug info warn warning error fatal' -- "$word")
       return ;;
-    --max-size | --backups | --logger) return ;;
+    --max-size | --backups | --logger | --retry) return ;;
   esac
   if [[ $word == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--file --max-size --backups --no-append --logger --level --detect-level
-      --help' -- "$word")
+      --no-time --tee --retry --quiet --version --help' -- "$word")
   else
     compopt -o filenames
     while IFS= read -r name; do COMPREPLY+=("$name"); done < <(compgen -f -- "$word")
