@@ -1,7 +1,8 @@
-// UTF-8 to UTF-16 and back into a caller's buffer, beside the direct functions of ICU on the same text. The figures to
-// quote are the ratios of the pairs.
+// Conversions into a caller's buffer, beside ICU on the same text: for UTF-8 its direct functions, for the other pages
+// a converter that stays open. The figures to quote are the ratios of the pairs.
 
 #include <benchmark/benchmark.h>
+#include <unicode/ucnv.h>
 #include <unicode/ustring.h>
 
 #include <array>
@@ -118,6 +119,102 @@ BENCHMARK(Utf8ToUtf16)->Apply(Texts);     // never slower than the one below,
 BENCHMARK(IcuUtf8ToUtf16)->Apply(Texts);  // on ASCII at least 3 times faster
 BENCHMARK(Utf16ToUtf8)->Apply(Texts);     // the same
 BENCHMARK(IcuUtf16ToUtf8)->Apply(Texts);
+
+// --------------------------------------------------------------------------------------------- other pages
+
+struct TPageCase {
+  Word Page;
+  const char* Converter;
+  std::u16string_view Words;
+};
+
+constexpr TPageCase cPageCases[] = {
+    {1252, "ibm-5348_P100-1997", u"größer Straße café naïve señor plain words between déjà über façade "},
+    {1251, "ibm-5347_P100-1998", u"съешь же ещё этих мягких французских булок да выпей чаю, 2024 "},
+    {437, "ibm-437_P100-1995", u"größer café naïve señor plain words between déjà über ░▒▓│┤ "},
+    {932, "ibm-943_P15A-2003", u"日本語の文章、カタカナとひらがな交じり、plain words 漢字 "},
+    {936, "windows-936-2000", u"中文测试，这是一个句子，plain words 汉字编码 "},
+    {949, "windows-949-2000", u"한국어 문장, 세계 여러 나라 plain words 서울 "},
+    {950, "windows-950-2000", u"中文測試，這是一個句子，plain words 漢字編碼 "}};
+
+struct TPageSample {
+  explicit TPageSample(const benchmark::State& AState) : Case(cPageCases[AState.range(0)]) {
+    const auto Length = static_cast<std::size_t>(AState.range(1));
+    while (Text.size() < Length) Text += Case.Words;
+    Text.resize(Length);
+    Bytes = TZqEncoding::ConvertW(Text, Case.Page).Str();
+    WideRoom.resize(Bytes.size());
+    ByteRoom.resize(2 * Length);
+    UErrorCode Error = U_ZERO_ERROR;
+    Converter = ucnv_open(Case.Converter, &Error);
+  }
+  TPageSample(const TPageSample&) = delete;
+  TPageSample& operator=(const TPageSample&) = delete;
+  ~TPageSample() { ucnv_close(Converter); }
+
+  const TPageCase& Case;
+  std::u16string Text;
+  std::string Bytes;
+  std::vector<char16_t> WideRoom;
+  std::vector<char> ByteRoom;
+  UConverter* Converter = nullptr;
+};
+
+void PageToUtf16(benchmark::State& AState) {
+  TPageSample Sample(AState);
+  Integer Got = 0;
+  for (auto Step : AState) {
+    Got = TZqEncoding::ConvertA(reinterpret_cast<const Byte*>(Sample.Bytes.data()),
+        static_cast<Integer>(Sample.Bytes.size()), Sample.Case.Page, Sample.WideRoom.data(),
+        static_cast<Integer>(Sample.WideRoom.size()));
+    benchmark::ClobberMemory();
+  }
+  Count(AState, Sample.Text.size(), Got);
+}
+
+void IcuPageToUtf16(benchmark::State& AState) {
+  TPageSample Sample(AState);
+  std::int32_t Got = 0;
+  for (auto Step : AState) {
+    UErrorCode Error = U_ZERO_ERROR;
+    Got = ucnv_toUChars(Sample.Converter, Sample.WideRoom.data(), static_cast<std::int32_t>(Sample.WideRoom.size()),
+        Sample.Bytes.data(), static_cast<std::int32_t>(Sample.Bytes.size()), &Error);
+    benchmark::ClobberMemory();
+  }
+  Count(AState, Sample.Text.size(), Got);
+}
+
+void Utf16ToPage(benchmark::State& AState) {
+  TPageSample Sample(AState);
+  Integer Got = 0;
+  for (auto Step : AState) {
+    Got = TZqEncoding::ConvertW(Sample.Text.data(), static_cast<Integer>(Sample.Text.size()),
+        reinterpret_cast<Byte*>(Sample.ByteRoom.data()), static_cast<Integer>(Sample.ByteRoom.size()),
+        Sample.Case.Page);
+    benchmark::ClobberMemory();
+  }
+  Count(AState, Sample.Bytes.size(), Got);
+}
+
+void IcuUtf16ToPage(benchmark::State& AState) {
+  TPageSample Sample(AState);
+  std::int32_t Got = 0;
+  for (auto Step : AState) {
+    UErrorCode Error = U_ZERO_ERROR;
+    Got = ucnv_fromUChars(Sample.Converter, Sample.ByteRoom.data(), static_cast<std::int32_t>(Sample.ByteRoom.size()),
+        Sample.Text.data(), static_cast<std::int32_t>(Sample.Text.size()), &Error);
+    benchmark::ClobberMemory();
+  }
+  Count(AState, Sample.Bytes.size(), Got);
+}
+
+void Pages(benchmark::internal::Benchmark* ABenchmark) {
+  ABenchmark->ArgNames({"case", "chars"})->ArgsProduct({{0, 1, 2, 3, 4, 5, 6}, {64, 4096}});
+}
+BENCHMARK(PageToUtf16)->Apply(Pages);     // twice as fast as the one below with one byte a character,
+BENCHMARK(IcuPageToUtf16)->Apply(Pages);  // never slower with two
+BENCHMARK(Utf16ToPage)->Apply(Pages);     // the same
+BENCHMARK(IcuUtf16ToPage)->Apply(Pages);
 
 }  // namespace
 }  // namespace zq

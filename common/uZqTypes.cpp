@@ -290,6 +290,11 @@ constexpr TEnumTable<TZqTypeKind, TKindFacts, 36> cKindFacts{{
     {mtkOther, cNoVarType},      // rtkClassRef
 }};
 
+// Of a number that is no kind, too: it came from a cast, or from a newer module.
+constexpr TKindFacts FactsOf(TZqTypeKind AKind) noexcept {
+  return AKind <= rtkClassRef ? cKindFacts[AKind] : TKindFacts{mtkUnknown, cNoVarType};
+}
+
 struct TVarTypeKind {
   TVarType VarType;
   TZqTypeKind Kind;
@@ -359,7 +364,7 @@ TZqMainTypeKind ZqMainTypeKind(TVarType AVarType) noexcept {
   return Kind == rtkVariant ? mtkUnknown : ZqMainTypeKind(Kind);
 }
 
-TZqMainTypeKind ZqMainTypeKind(TZqTypeKind AKind) noexcept { return cKindFacts[AKind].Main; }
+TZqMainTypeKind ZqMainTypeKind(TZqTypeKind AKind) noexcept { return FactsOf(AKind).Main; }
 
 TZqTypeKind ZqTypeKind(TVarType AVarType) noexcept {
   if ((AVarType & varArray) != 0) return rtkDynArray;
@@ -374,7 +379,7 @@ TZqTypeKind ZqTypeKind(TTypeKind AKind) {
 }
 
 TVarType ZqTypeKindToVarType(TZqTypeKind AKind) {
-  const TVarType Result = cKindFacts[AKind].VarType;
+  const TVarType Result = FactsOf(AKind).VarType;
   if (Result == cNoVarType) throw Exception(u"The given datatype cannot be converted to a Variant Type!");
   return Result;
 }

@@ -174,12 +174,13 @@ using TZqVariantTypeKind = TSubrange<rtkUnknown, rtkInterface>;
 
 /// Of a variant type; any array is mtkArray.
 [[nodiscard]] ZQ_API TZqMainTypeKind ZqMainTypeKind(TVarType AVarType) noexcept;
+/// mtkUnknown for a number beyond the kinds.
 [[nodiscard]] ZQ_API TZqMainTypeKind ZqMainTypeKind(TZqTypeKind AKind) noexcept;
 /// Of a variant type; any array is rtkDynArray, a type that is not listed rtkUnknown.
 [[nodiscard]] ZQ_API TZqTypeKind ZqTypeKind(TVarType AVarType) noexcept;
 /// Raises EAssertionFailed for an ordinal beyond the enumeration.
 [[nodiscard]] ZQ_API TZqTypeKind ZqTypeKind(TTypeKind AKind);
-/// Raises Exception for a kind that no variant holds.
+/// Raises Exception for a kind that no variant holds, and for a number beyond the kinds.
 [[nodiscard]] ZQ_API TVarType ZqTypeKindToVarType(TZqTypeKind AKind);
 [[nodiscard]] ZQ_API bool ZqIsSimpleTypeKind(TTypeKind AKind) noexcept;
 [[nodiscard]] ZQ_API bool ZqIsSimpleTypeKind(TZqTypeKind AKind) noexcept;

@@ -42,9 +42,8 @@ constexpr Word cAllNumbers[] = {37, 437, 500, 708, 709, 710, 720, 737, 775, 850,
     57009, 57010, 57011, 65000, 65001};
 
 TEST(TextEncoding, ExactlyThesePagesHaveNoCharacterData) {
-  const std::vector<Word> cWithout = {709, 710, 1361, 10001, 10002, 10003, 10004, 10005, 10008, 10010, 10021, 10079,
-      10082, 20000, 20001, 20002, 20003, 20004, 20005, 20105, 20106, 20107, 20108, 20261, 20269, 20423, 20833, 20880,
-      20905, 20924, 29001};
+  const std::vector<Word> cWithout = {709, 710, 10001, 10002, 10003, 10004, 10005, 10008, 10021, 20000, 20001, 20002,
+      20003, 20004, 20005, 20924, 29001};
   std::vector<Word> Refused;
   for (const Word Number : cAllNumbers) {
     SetLastError(0);
@@ -142,12 +141,51 @@ TEST(TextEncoding, MapsAsThePagesOfThePlatformDo) {
       {949, "\xB0\xA1", u"가"}, {28591, "\x80\xFF", u"\x80\xFF"},
       {437, "\x1A\x7F\x1C\x80\x1A\x7F\x1C", u"\x1A\x7F\x1C\u00C7\x1A\x7F\x1C"}, {37, "\xC1\x4A", u"A\u00A2"},
       {1201, {"\0A\x20\xAC", 4}, u"A€"}, {12000, {"A\0\0\0\0\xF6\x01\0", 8}, u"A😀"},
-      {65001, "\xE2\x82\xAC\xF0\x9F\x98\x80", u"€😀"}, {65000, "a+IKw-", u"a€"}, {52936, "ab~{VP~}", u"ab中"},
-      {50220, "\x1B$B$\"\x1B(B", u"あ"}, {50225, "\x1B$)CA", u"A"}, {54936, "\x81\x30\x81\x30", u"\x80"}};
+      {65001, "\xE2\x82\xAC\xF0\x9F\x98\x80", u"€😀"}, {65000, "a+IKw-", u"a€"},
+      {65000, "+AH4AXAAh- +2D3eAA-/+-+ECA-+-", u"~\\! 😀/+\u1020+"}, {52936, "ab~{VP~}", u"ab中"},
+      {52936, "~~~{VPVP~}~~\n~{VP~}", u"~中中~\n中"},
+      {50221, "a\x1B(I1\x1B(Bb\x1B$B4A\x1B(I1\x1B$B4A\x1B(B", u"aｱb漢ｱ漢"}, {50220, "\x1B$B$\"\x1B(B", u"あ"},
+      {50225, "\x1B$)CA", u"A"}, {54936, "\x81\x30\x81\x30", u"\x80"}};
   for (const auto& [Page, Bytes, Text] : cCases) {
     EXPECT_EQ(UnicodeString(Decoded(Page, Bytes)), Text) << Page;
     EXPECT_EQ(Encoded(Page, Text), Bytes) << Page;
   }
+}
+
+// Where the tables at hand differ, from each other or from the platform's.
+TEST(TextEncoding, DecidesBetweenTablesAsThePlatformDoes) {
+  const std::tuple<std::vector<Word>, std::string_view, std::u16string_view> cCases[] = {
+      {{437, 860, 861, 862, 863, 865}, "\xE6", u"\u00B5"}, {{852}, "\xAA", u"\u00AC"},
+      {{1026}, "\x9A\x9D\xBC", u"\u00AA\u00B8\u00AF"}, {{869}, "\x88\xEF", u"\u00B7\u0384"},
+      {{864}, "%\xD7\xD8\xF1", u"%\uFEC1\uFEC5\u0651"}, {{870}, "\xB0", u"\u02D9"},
+      {{20936, 51936}, "\xA3\xA7", u"\uFF07"},
+      {{720}, "\x80\x81\x84\x86\x8D\x8E\x8F\x90", u"\x80\x81\x84\x86\x8D\x8E\x8F\x90"},
+      {{932}, "\x80\xA0\xFD\xFE\xFF", u"\x80\uF8F0\uF8F1\uF8F2\uF8F3"},
+      {{936}, "\xFF\xA1\xA4\xA1\xAA", u"\uF8F5\u00B7\u2014"}, {{949}, "\x80\xFF\xC9\xA1", u"\x80\uF8F7\uE000"},
+      {{950}, "\xFF\xC6\xA1\xF9\xFE", u"\uF8F8\uF6B1\u2593"}, {{874}, "\x81\xDB\xFF", u"\x81\uF8C1\uF8C8"},
+      {{875}, "\x6A\x74\xDD", u"|\u00A0\u0387"}, {{1361}, "\\\xD9\xE6\x88\x61", u"\\\u20AC\uAC00"},
+      {{10000}, "\xC6\xDB\xF0", u"\u2206\u20AC\uF8FF"}, {{10007}, "\xA2\xB6\xFF", u"\u00A2\u2202\u00A4"},
+      {{10017}, "\xA2\xB6\xFF", u"\u0490\u0491\u00A4"}, {{10010}, "\xAE\xAF\xDE\xDF", u"ĂŞŢţ"},
+      {{10079}, "\xA0\xDC\xDF\xE0", u"ÝÐþý"}, {{10082}, "\xA9\xD0\xF0\xFE", u"ŠĐđæ"}, {{20106}, "@[~", u"§Äß"},
+      {{20107}, "$@`~", u"¤Ééü"}, {{20108}, "[\\]~", u"ÆØÅ\u203E"}, {{20105}, "$~", u"$~"},
+      {{20261, 20269}, "a\xC2\x65", u"aé"}, {{20278}, "\x71\xE0", u"\\É"}, {{20285}, "\xA1", u"\u00AF"},
+      {{20290}, "\x41\x62", u"\uFF61a"}, {{20423}, "\x41", u"Α"}, {{20424}, "\x78\xB3\xBC", u"\u2017\u2022\u203E"},
+      {{20833}, "\x0E\x0F\x42\xE0", u"\x0E\x0F\uFFA0\u20A9"}, {{20871}, "\x4A\xC0", u"Þþ"}, {{20880}, "\x42", u"ђ"},
+      {{20905}, "\x4A", u"Ç"}};
+  for (const auto& [Pages, Bytes, Text] : cCases)
+    for (const Word Page : Pages) {
+      EXPECT_EQ(UnicodeString(Decoded(Page, Bytes, MB_ERR_INVALID_CHARS)), Text) << Page;
+      EXPECT_EQ(Encoded(Page, Text, WC_NO_BEST_FIT_CHARS), Bytes) << Page;
+    }
+  // One way only.
+  EXPECT_EQ(Decoded(875, "\xDC\x3F"), u"\x1A\x1A");
+  EXPECT_EQ(Encoded(875, u"\x1A"), "\x3F");
+  EXPECT_EQ(Encoded(932, u"\u00A2\u00A3\u00AC"), "\x81\x91\x81\x92\x81\xCA");
+  EXPECT_EQ(Encoded(932, u"\u00A2\u00A3\u00AC", WC_NO_BEST_FIT_CHARS), "???");
+  EXPECT_EQ(Encoded(437, u"\u03BC\u2192\u221F"), "\xE6\x1A\x1C");
+  EXPECT_EQ(Encoded(1361, u"\u327E\xFFFD"), "??");
+  EXPECT_EQ(Decoded(65000, "~\\+IKw!+IK-\xE9+"), u"~\\€!\xFFFD\xFFFD\xFFFD");
+  EXPECT_EQ(Decoded(52936, "~x~~~{VP~~~}~\nd~{V\nd"), u"~x~中\uE4C5d\xFFFD\nd");
 }
 
 TEST(TextEncoding, WhatAPageDoesNotHaveIsReplaced) {
@@ -272,6 +310,21 @@ TEST(TextEncoding, OneCharacterIntoOneByte) {
   EXPECT_TRUE(std::string_view(Bytes, 3) == "a##" && Used);
   EXPECT_EQ(LocaleCharsFromUnicode(437, 0, u"日", 1, Bytes, 4, "\x1A", nullptr), 1);
   EXPECT_EQ(Bytes[0], '\x1A');
+}
+
+TEST(TextEncoding, ThreadsLearnAPageTogether) {
+  std::vector<std::string> Results(4);
+  std::vector<std::thread> Threads;
+  for (std::string& Result : Results)
+    Threads.emplace_back([&Result] {
+      std::u16string All;
+      for (char16_t c = 1; c < 0x3100; ++c) All += c;
+      for (const Word Page : {Word{1361}, Word{20269}, Word{10081}})
+        Result += Encoded(Page, Decoded(Page, Encoded(Page, All)));
+    });
+  for (std::thread& Thread : Threads) Thread.join();
+  for (const std::string& Result : Results) EXPECT_EQ(Result, Results[0]);
+  EXPECT_EQ(Encoded(10081, u"Ğ"), "\xDA");
 }
 
 struct TLateConversion {

@@ -190,6 +190,10 @@ TEST(TypeKinds, AndVariantTypesComeBackFromEachOtherButForThoseThatShareOne) {
     EXPECT_EQ(ZqIsSimpleTypeKind(Kind), i >= 1 && i <= 24) << i;
   }
   EXPECT_EQ(ZqTypeKindToVarType(rtkObject), varObject);
+  for (const auto Beyond : {static_cast<TZqTypeKind>(36), static_cast<TZqTypeKind>(255)}) {
+    EXPECT_EQ(ZqMainTypeKind(Beyond), mtkUnknown);
+    EXPECT_THROW((void)ZqTypeKindToVarType(Beyond), Exception);
+  }
   EXPECT_TRUE(ZqMainTypeKind(varAny) == mtkUnknown && ZqTypeKind(TVarType{0x4003}) == rtkUnknown);
   EXPECT_TRUE(ZqTypeKind(TVarType{0xFFFF}) == rtkDynArray && ZqMainTypeKind(TVarType{0x200C}) == mtkArray);
 }

@@ -13,50 +13,79 @@ namespace {
 
 using enum TPageKind;
 using enum TAsciiUse;
+using enum TMapping::TWay;
 
 constexpr TCharacterData ICU(const char* AConverter) noexcept { return {TCharacterData::ICU, AConverter}; }
 
+constexpr TCharacterData CLibrary(const char* ACharset) noexcept { return {TCharacterData::CLibrary, ACharset}; }
+
+// Of several tables for a page the rows name the nearest one; what is left is told here.
+constexpr TMapping cMicro[] = {{0xE6, 0x00B5}};
+constexpr TMapping c720[] = {
+    {0x80, 0x80}, {0x81, 0x81}, {0x84, 0x84}, {0x86, 0x86}, {0x8D, 0x8D}, {0x8E, 0x8E}, {0x8F, 0x8F}, {0x90, 0x90}};
+constexpr TMapping c852[] = {{0xAA, 0x00AC}};
+constexpr TMapping c864[] = {{0xD7, 0xFEC1}, {0xD8, 0xFEC5}, {0xF1, 0x0651}};
+constexpr TMapping c869[] = {{0x88, 0x00B7}, {0xEF, 0x0384}};
+constexpr TMapping c875[] = {{0xDC, 0x1A, OnlyDecodes}, {0xE1, 0x1A, OnlyDecodes}, {0xEC, 0x1A, OnlyDecodes},
+    {0xED, 0x1A, OnlyDecodes}, {0xFC, 0x1A, OnlyDecodes}, {0xFD, 0x1A, OnlyDecodes}};
+constexpr TMapping c932[] = {{0x80, 0x0080}, {0xA0, 0xF8F0}, {0xFD, 0xF8F1}, {0xFE, 0xF8F2}, {0xFF, 0xF8F3},
+    {0x8191, 0x00A2, OnlyEncodes}, {0x8192, 0x00A3, OnlyEncodes}, {0x81CA, 0x00AC, OnlyEncodes}};
+constexpr TMapping c1026[] = {{0x9A, 0x00AA}};
+constexpr TMapping c1361[] = {{0xD9E8, 0xFFFD, OnlyDecodes}};
+constexpr TMapping cMacCyrillic[] = {{0xA2, 0x00A2}, {0xB6, 0x2202}, {0xFF, 0x00A4}};
+constexpr TMapping cMacRomanian[] = {
+    {0xAE, 0x0102}, {0xAF, 0x015E}, {0xBE, 0x0103}, {0xBF, 0x015F}, {0xDE, 0x0162}, {0xDF, 0x0163}};
+constexpr TMapping cMacUkrainian[] = {{0xFF, 0x00A4}};
+constexpr TMapping cMacIcelandic[] = {
+    {0xA0, 0x00DD}, {0xDC, 0x00D0}, {0xDD, 0x00F0}, {0xDE, 0x00DE}, {0xDF, 0x00FE}, {0xE0, 0x00FD}};
+constexpr TMapping cMacCroatian[] = {{0xA9, 0x0160}, {0xAE, 0x017D}, {0xB4, 0x2206}, {0xB9, 0x0161}, {0xBE, 0x017E},
+    {0xC6, 0x0106}, {0xC8, 0x010C}, {0xD0, 0x0110}, {0xD8, 0xF8FF}, {0xD9, 0x00A9}, {0xDE, 0x00C6}, {0xDF, 0x00BB},
+    {0xE0, 0x2013}, {0xE6, 0x0107}, {0xE8, 0x010D}, {0xF0, 0x0111}, {0xF9, 0x03C0}, {0xFA, 0x00CB}, {0xFD, 0x00CA},
+    {0xFE, 0x00E6}};
+constexpr TMapping c20833[] = {{0x0E, 0x0E}, {0x0F, 0x0F}};  // its data is the half of a page that shifts by these
+constexpr TMapping cApostrophe[] = {{0xA3A7, 0xFF07}};
+
 // By number. Of several tables for a page these are the ones with its mappings of the platform's own, user-defined
 // ranges and C1 controls included. 708 is served by the table of the standard that it follows, 57006 by that of the
-// script that it shares, 50221 by one that shifts its half-width letters in with SO. The blanks at the end of two names
-// belong there. 42 and 50229 have no name at all.
+// script that it shares. The blanks at the end of two names belong there. 42 and 50229 have no name at all.
 constexpr TCodePage cPages[] = {
     {37, SingleByte, Foreign, 1, ICU("ibm-37_P100-1995"), u"IBM037"},
     {42, Symbol, Foreign, 1, {}},
-    {437, SingleByte, Rotated, 1, ICU("ibm-437_P100-1995"), u"IBM437"},
+    {437, SingleByte, Plain, 1, ICU("ibm-437_P100-1995"), u"IBM437", {}, cMicro},
     {500, SingleByte, Foreign, 1, ICU("ibm-500_P100-1995"), u"IBM500"},
     {708, SingleByte, Plain, 1, ICU("ibm-1089_P100-1995"), u"ASMO-708"},
     {709, SingleByte, Plain, 1, {}, u"ASMO-709"},
     {710, SingleByte, Plain, 1, {}, u"DOS-710"},
-    {720, SingleByte, Rotated, 1, ICU("ibm-720_P100-1997"), u"DOS-720"},
-    {737, SingleByte, Rotated, 1, ICU("ibm-737_P100-1997"), u"ibm737"},
-    {775, SingleByte, Rotated, 1, ICU("ibm-775_P100-1996"), u"ibm775"},
-    {850, SingleByte, Rotated, 1, ICU("ibm-850_P100-1995"), u"ibm850"},
-    {852, SingleByte, Rotated, 1, ICU("ibm-852_P100-1995"), u"ibm852"},
-    {855, SingleByte, Rotated, 1, ICU("ibm-855_P100-1995"), u"IBM855"},
-    {857, SingleByte, Rotated, 1, ICU("ibm-857_P100-1995"), u"ibm857"},
-    {858, SingleByte, Rotated, 1, ICU("ibm-858_P100-1997"), u"IBM00858"},
-    {860, SingleByte, Rotated, 1, ICU("ibm-860_P100-1995"), u"IBM860"},
-    {861, SingleByte, Rotated, 1, ICU("ibm-861_P100-1995"), u"ibm861"},
-    {862, SingleByte, Rotated, 1, ICU("ibm-862_P100-1995"), u"DOS-862"},
-    {863, SingleByte, Rotated, 1, ICU("ibm-863_P100-1995"), u"IBM863"},
-    {864, SingleByte, Rotated, 1, ICU("ibm-864_X110-1999"), u"IBM864"},
-    {865, SingleByte, Rotated, 1, ICU("ibm-865_P100-1995"), u"IBM865"},
-    {866, SingleByte, Rotated, 1, ICU("ibm-866_P100-1995"), u"cp866|ibm866"},
-    {869, SingleByte, Rotated, 1, ICU("ibm-869_P100-1995"), u"ibm869"},
+    {720, SingleByte, Plain, 1, ICU("ibm-720_P100-1997"), u"DOS-720", {}, c720},
+    {737, SingleByte, Plain, 1, ICU("ibm-737_P100-1997"), u"ibm737"},
+    {775, SingleByte, Plain, 1, ICU("ibm-775_P100-1996"), u"ibm775"},
+    {850, SingleByte, Plain, 1, ICU("ibm-850_P100-1995"), u"ibm850"},
+    {852, SingleByte, Plain, 1, ICU("ibm-852_P100-1995"), u"ibm852", {}, c852},
+    {855, SingleByte, Plain, 1, ICU("ibm-855_P100-1995"), u"IBM855"},
+    {857, SingleByte, Plain, 1, ICU("ibm-857_P100-1995"), u"ibm857"},
+    {858, SingleByte, Plain, 1, ICU("ibm-858_P100-1997"), u"IBM00858"},
+    {860, SingleByte, Plain, 1, ICU("ibm-860_P100-1995"), u"IBM860", {}, cMicro},
+    {861, SingleByte, Plain, 1, ICU("ibm-861_P100-1995"), u"ibm861", {}, cMicro},
+    {862, SingleByte, Plain, 1, ICU("ibm-862_P100-1995"), u"DOS-862", {}, cMicro},
+    {863, SingleByte, Plain, 1, ICU("ibm-863_P100-1995"), u"IBM863", {}, cMicro},
+    {864, SingleByte, Plain, 1, ICU("ibm-864_X110-1999"), u"IBM864", {}, c864},
+    {865, SingleByte, Plain, 1, ICU("ibm-865_P100-1995"), u"IBM865", {}, cMicro},
+    {866, SingleByte, Plain, 1, ICU("ibm-866_P100-1995"), u"cp866|ibm866"},
+    {869, SingleByte, Plain, 1, ICU("ibm-869_P100-1995"), u"ibm869", {}, c869},
     {870, SingleByte, Foreign, 1, ICU("ibm-870_P100-1995"), u"IBM870"},
     {874, SingleByte, Plain, 1, ICU("windows-874-2000"), u"windows-874"},
-    {875, SingleByte, Foreign, 1, ICU("ibm-875_P100-1995"), u"cp875"},
-    {932, MultiByte, Rotated, 2, ICU("ibm-943_P15A-2003"),
+    {875, SingleByte, Foreign, 1, ICU("ibm-875_P100-1995"), u"cp875", {}, c875},
+    {932, MultiByte, Plain, 2, ICU("ibm-943_P15A-2003"),
         u"shift_jis|cseucpkdfmtjapanese|csshiftjis|extended_unix_code_packed_format_for_japanese|ms_kanji |"
-        u"shift-jis|x-euc|x-euc-jp|x-sjis"},
+        u"shift-jis|x-euc|x-euc-jp|x-sjis",
+        {}, c932},
     {936, MultiByte, Plain, 2, ICU("windows-936-2000"),
         u"gb2312|chinese|csgb2312 |csiso58gb231280|gb_2312-80|iso-ir-58"},
     {949, MultiByte, Plain, 2, ICU("windows-949-2000"),
         u"ks_c_5601-1987|cseuckr|csksc56011987|iso-ir-149|korean|ks-c-5601|ks-c-5601-1987|ks_c_5601|ks_c_5601-1989|"
         u"ksc-5601|ksc5601|ksc_5601"},
     {950, MultiByte, Plain, 2, ICU("windows-950-2000"), u"big5|csbig5|x-x-big5"},
-    {1026, SingleByte, Foreign, 1, ICU("ibm-1026_P100-1995"), u"IBM1026"},
+    {1026, SingleByte, Foreign, 1, ICU("ibm-1026_P100-1995"), u"IBM1026", {}, c1026},
     {1047, SingleByte, Foreign, 1, ICU("ibm-1047_P100-1995"), u"IBM01047"},
     {1140, SingleByte, Foreign, 1, ICU("ibm-1140_P100-1997"), u"IBM01140"},
     {1141, SingleByte, Foreign, 1, ICU("ibm-1141_P100-1997"), u"IBM01141"},
@@ -82,7 +111,7 @@ constexpr TCodePage cPages[] = {
     {1256, SingleByte, Plain, 1, ICU("ibm-9448_X100-2005"), u"windows-1256"},
     {1257, SingleByte, Plain, 1, ICU("ibm-9449_P100-2002"), u"windows-1257"},
     {1258, SingleByte, Plain, 1, ICU("ibm-5354_P100-1998"), u"windows-1258"},
-    {1361, MultiByte, Plain, 2, {}, u"Johab"},
+    {1361, MultiByte, Plain, 2, CLibrary("JOHAB"), u"Johab", {}, c1361},
     {10000, SingleByte, Plain, 1, ICU("macos-0_2-10.2"), u"macintosh"},
     {10001, MultiByte, Plain, 2, {}, u"x-mac-japanese"},
     {10002, MultiByte, Plain, 2, {}, u"x-mac-chinesetrad"},
@@ -90,15 +119,15 @@ constexpr TCodePage cPages[] = {
     {10004, SingleByte, Plain, 1, {}, u"x-mac-arabic"},
     {10005, SingleByte, Plain, 1, {}, u"x-mac-hebrew"},
     {10006, SingleByte, Plain, 1, ICU("macos-6_2-10.4"), u"x-mac-greek"},
-    {10007, SingleByte, Plain, 1, ICU("macos-7_3-10.2"), u"x-mac-cyrillic"},
+    {10007, SingleByte, Plain, 1, ICU("macos-7_3-10.2"), u"x-mac-cyrillic", {}, cMacCyrillic},
     {10008, MultiByte, Plain, 2, {}, u"x-mac-chinesesimp"},
-    {10010, SingleByte, Plain, 1, {}, u"x-mac-romanian"},
-    {10017, SingleByte, Plain, 1, ICU("macos-7_3-10.2"), u"x-mac-ukrainian"},
+    {10010, SingleByte, Plain, 1, ICU("macos-0_2-10.2"), u"x-mac-romanian", {}, cMacRomanian},
+    {10017, SingleByte, Plain, 1, ICU("macos-7_3-10.2"), u"x-mac-ukrainian", {}, cMacUkrainian},
     {10021, SingleByte, Plain, 1, {}, u"x-mac-thai"},
     {10029, SingleByte, Plain, 1, ICU("macos-29-10.2"), u"x-mac-ce"},
-    {10079, SingleByte, Plain, 1, {}, u"x-mac-icelandic"},
+    {10079, SingleByte, Plain, 1, ICU("macos-0_2-10.2"), u"x-mac-icelandic", {}, cMacIcelandic},
     {10081, SingleByte, Plain, 1, ICU("macos-35-10.2"), u"x-mac-turkish"},
-    {10082, SingleByte, Plain, 1, {}, u"x-mac-croatian"},
+    {10082, SingleByte, Plain, 1, ICU("macos-0_2-10.2"), u"x-mac-croatian", {}, cMacCroatian},
     {12000, Utf32, Foreign, 4, ICU("UTF-32LE"), u"utf-32", cUTF32LEMark},
     {12001, Utf32, Foreign, 4, ICU("UTF-32BE"), u"utf-32BE", cUTF32BEMark},
     {20000, MultiByte, Plain, 2, {}, u"x-Chinese_CNS"},
@@ -107,13 +136,13 @@ constexpr TCodePage cPages[] = {
     {20003, MultiByte, Plain, 2, {}, u"x-cp20003"},
     {20004, MultiByte, Plain, 2, {}, u"x-cp20004"},
     {20005, MultiByte, Plain, 2, {}, u"x-cp20005"},
-    {20105, SingleByte, Foreign, 1, {}, u"x-IA5"},
-    {20106, SingleByte, Foreign, 1, {}, u"x-IA5-German"},
-    {20107, SingleByte, Foreign, 1, {}, u"x-IA5-Swedish"},
-    {20108, SingleByte, Foreign, 1, {}, u"x-IA5-Norwegian"},
+    {20105, SingleByte, Plain, 1, CLibrary("ISO_646.IRV:1991"), u"x-IA5"},
+    {20106, SingleByte, Foreign, 1, CLibrary("ISO646-DE"), u"x-IA5-German"},
+    {20107, SingleByte, Foreign, 1, CLibrary("ISO646-SE2"), u"x-IA5-Swedish"},
+    {20108, SingleByte, Foreign, 1, CLibrary("ISO646-NO"), u"x-IA5-Norwegian"},
     {20127, SingleByte, Plain, 1, ICU("US-ASCII"), u"us-ascii"},
-    {20261, MultiByte, Foreign, 2, {}, u"x-cp20261"},
-    {20269, MultiByte, Foreign, 2, {}, u"x-cp20269"},
+    {20261, MultiByte, Foreign, 2, CLibrary("T.61-8BIT"), u"x-cp20261"},
+    {20269, MultiByte, Plain, 2, CLibrary("ISO_6937"), u"x-cp20269"},
     {20273, SingleByte, Foreign, 1, ICU("ibm-273_P100-1995"), u"IBM273"},
     {20277, SingleByte, Foreign, 1, ICU("ibm-277_P100-1995"), u"IBM277"},
     {20278, SingleByte, Foreign, 1, ICU("ibm-278_P100-1995"), u"IBM278"},
@@ -123,17 +152,17 @@ constexpr TCodePage cPages[] = {
     {20290, SingleByte, Foreign, 1, ICU("ibm-290_P100-1995"), u"IBM290"},
     {20297, SingleByte, Foreign, 1, ICU("ibm-297_P100-1995"), u"IBM297"},
     {20420, SingleByte, Foreign, 1, ICU("ibm-420_X120-1999"), u"IBM420"},
-    {20423, SingleByte, Foreign, 1, {}, u"IBM423"},
+    {20423, SingleByte, Foreign, 1, CLibrary("IBM423"), u"IBM423"},
     {20424, SingleByte, Foreign, 1, ICU("ibm-424_P100-1995"), u"IBM424"},
-    {20833, SingleByte, Foreign, 1, {}, u"x-EBCDIC-KoreanExtended"},
+    {20833, SingleByte, Foreign, 1, ICU("ibm-933_P110-1995"), u"x-EBCDIC-KoreanExtended", {}, c20833},
     {20838, SingleByte, Foreign, 1, ICU("ibm-838_P100-1995"), u"IBM-Thai"},
     {20866, SingleByte, Plain, 1, ICU("ibm-878_P100-1996"), u"koi8-r|cskoi8r"},
     {20871, SingleByte, Foreign, 1, ICU("ibm-871_P100-1995"), u"IBM871"},
-    {20880, SingleByte, Foreign, 1, {}, u"IBM880"},
-    {20905, SingleByte, Foreign, 1, {}, u"IBM905"},
+    {20880, SingleByte, Foreign, 1, CLibrary("IBM880"), u"IBM880"},
+    {20905, SingleByte, Foreign, 1, CLibrary("IBM905"), u"IBM905"},
     {20924, SingleByte, Foreign, 1, {}, u"IBM00924"},
     {20932, MultiByte, Plain, 3, ICU("euc-jp-2007"), u"EUC-JP"},
-    {20936, MultiByte, Plain, 2, ICU("ibm-1383_P110-1999"), u"x-cp20936"},
+    {20936, MultiByte, Plain, 2, ICU("ibm-1383_P110-1999"), u"x-cp20936", {}, cApostrophe},
     {20949, MultiByte, Plain, 2, ICU("ibm-970_P110_P110-2006_U2"), u"x-cp20949"},
     {21025, SingleByte, Foreign, 1, ICU("ibm-1025_P100-1995"), u"cp1025"},
     {21866, SingleByte, Plain, 1, ICU("ibm-1168_P100-2002"), u"koi8-u"},
@@ -158,7 +187,7 @@ constexpr TCodePage cPages[] = {
     {50227, Iso2022, Guarded, 8, ICU("ISO_2022,locale=zh,version=0"), u"x-cp50227"},
     {50229, Iso2022, Guarded, 8, {}},
     {51932, MultiByte, Plain, 3, ICU("euc-jp-2007"), u"euc-jp"},
-    {51936, MultiByte, Plain, 2, ICU("ibm-1383_P110-1999"), u"EUC-CN"},
+    {51936, MultiByte, Plain, 2, ICU("ibm-1383_P110-1999"), u"EUC-CN", {}, cApostrophe},
     {51949, MultiByte, Plain, 2, ICU("ibm-970_P110_P110-2006_U2"), u"euc-kr"},
     {52936, Hz, Guarded, 6, ICU("HZ"), u"hz-gb-2312"},
     {54936, Gb18030, Plain, 4, ICU("gb18030"), u"GB18030"},
@@ -172,7 +201,7 @@ constexpr TCodePage cPages[] = {
     {57009, Iscii, Plain, 4, ICU("ISCII,version=8"), u"x-iscii-ma"},
     {57010, Iscii, Plain, 4, ICU("ISCII,version=3"), u"x-iscii-gu"},
     {57011, Iscii, Plain, 4, ICU("ISCII,version=2"), u"x-iscii-pa"},
-    {65000, Utf7, Guarded, 5, ICU("UTF-7"), u"utf-7"},
+    {65000, Utf7, Foreign, 5, ICU("UTF-7"), u"utf-7"},
     {65001, Utf8, Plain, 3, ICU("UTF-8"), u"utf-8", cUTF8Mark},
 };
 static_assert(std::ranges::adjacent_find(cPages, std::ranges::greater_equal{}, &TCodePage::Number) == std::end(cPages));

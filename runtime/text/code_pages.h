@@ -30,16 +30,23 @@ enum class TPageKind : Byte {
 /// What bytes and characters below 80 have in common at the front of a text.
 enum class TAsciiUse : Byte {
   Plain,    ///< they are the same
-  Rotated,  ///< likewise, but its data has 1A, 1C and 7F the way that old hosts had them: 7F, 1A, 1C
   Guarded,  ///< likewise as long as none of them shifts or quotes
   Foreign,  ///< nothing
 };
 
 /// Character data: who has it, and the name of the page there.
 struct TCharacterData {
-  enum TSource : Byte { None, ICU };
+  enum TSource : Byte { None, ICU, CLibrary };
   TSource Source = None;
   const char* Name = nullptr;
+};
+
+/// Where a page and its character data part.
+struct TMapping {
+  enum TWay : Byte { Both, OnlyDecodes, OnlyEncodes };
+  Word Code = 0;  // a byte, or two with the first in the high one
+  char16_t Char = 0;
+  TWay Way = Both;  // OnlyEncodes: a similar character, whose code means another one
 };
 
 struct TCodePage {
@@ -50,6 +57,7 @@ struct TCodePage {
   TCharacterData Data = {};        // a page without refuses all text, whatever else its row says
   std::u16string_view Names = {};  // its name, then the further ones that lead to it, divided by "|"
   std::span<const Byte> Mark = {};
+  std::span<const TMapping> Differences = {};  // of pages with one or two bytes a character
 
   [[nodiscard]] constexpr bool IsServed() const noexcept { return Data.Source != TCharacterData::None; }
   [[nodiscard]] constexpr bool IsUnicode() const noexcept {
@@ -62,6 +70,8 @@ struct TCodePage {
   [[nodiscard]] constexpr std::size_t UnitSize() const noexcept {
     return Kind == TPageKind::Utf16 ? 2 : Kind == TPageKind::Utf32 ? 4 : 1;
   }
+  /// Whether a table of one or two bytes a character serves it.
+  [[nodiscard]] constexpr bool HasTable() const noexcept { return Kind <= TPageKind::MultiByte && BytesPerUnit <= 2; }
   [[nodiscard]] constexpr std::u16string_view Name() const noexcept { return Names.substr(0, Names.find(u'|')); }
 };
 

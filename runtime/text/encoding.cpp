@@ -17,12 +17,19 @@
 #include "runtime/core/utf8.h"
 #include "runtime/text/code_pages.h"
 #include "runtime/text/numbers.h"
+#include "runtime/text/page_table.h"
+#include "runtime/text/shift_codecs.h"
 
 namespace zq {
 
 // --------------------------------------------------------------------------------------------- character data
 
 namespace {
+
+// HZ and UTF-7 are ours; of these only names come from their row's data.
+constexpr bool HasCodec(const TCodePage& APage) noexcept {
+  return APage.Kind == TPageKind::Hz || APage.Kind == TPageKind::Utf7;
+}
 
 // The page, if it has character data.
 const TCodePage* ServedPage(Word ACodePage) noexcept {
@@ -88,6 +95,7 @@ std::unique_ptr<UConverter, TGiveBack> ConverterOf(const TCodePage& APage) {
 // --------------------------------------------------------------------------------------------- conversion, both ways
 
 constexpr int cFailed = -1;
+constexpr int cMeets = -2;  // stopped at a character that may meet the one before it
 
 int Refuse(Cardinal AReason) noexcept {
   SetLastError(AReason);
@@ -115,21 +123,11 @@ int Pump(TUnit* ADest, int ACapacity, TStep AStep) {
   }
 }
 
-template <class TUnit>
-void Unrotate(TUnit* AText, int ACount, const char* AFrom, const char* ATo) noexcept {
-  for (TUnit& Unit : std::span(AText, static_cast<std::size_t>(ACount)))
-    for (int i = 0; i < 3; ++i)
-      if (Unit == static_cast<TUnit>(AFrom[i])) {
-        Unit = static_cast<TUnit>(ATo[i]);
-        break;
-      }
-}
-
 // What shifts or quotes in one guarded page or another.
 constexpr auto cGuarded = [] {
   std::array<bool, 0x80> Result{};
   for (unsigned i = 0; i < 0x20; ++i) Result[i] = i != 9 && i != 10 && i != 13;
-  for (const char c : {'+', '\\', '~', '\x7F'}) Result[static_cast<unsigned char>(c)] = true;
+  for (const char c : {'~', '\x7F'}) Result[static_cast<unsigned char>(c)] = true;
   return Result;
 }();
 
@@ -157,14 +155,14 @@ char* CopyPlain(const char16_t* ASource, int ACount, char* ADest) noexcept {
 template <class TFrom, class TTo, class TRest>
 int AfterPlainRun(const TCodePage& APage, const TFrom* ASource, int ACount, TTo* ADest, int ACapacity, TRest ARest) {
   const auto Run = static_cast<int>(PlainRun(APage, ASource, static_cast<std::size_t>(ACount)));
-  if (ADest != nullptr) {
+  if (ADest != nullptr && Run > 0) {
     if (Run > ACapacity) return Refuse(ERROR_INSUFFICIENT_BUFFER);
     ADest = CopyPlain(ASource, Run, ADest);
   }
   if (Run == ACount) return Run;
   const int Rest = ARest(ASource + Run, ACount - Run, ADest, ACapacity - Run);
   if (Rest > std::numeric_limits<int>::max() - Run) return Refuse(ERROR_INSUFFICIENT_BUFFER);
-  return Rest == cFailed ? cFailed : Run + Rest;
+  return Rest < 0 ? Rest : Run + Rest;
 }
 
 // Bytes or units up to and with the zero that ends them.
@@ -200,7 +198,7 @@ void U_CALLCONV DecodeMalformed(const void* AStrict, UConverterToUnicodeArgs* AA
   ucnv_cbToUWriteUChars(AArgs, &cReplacement, 1, 0, AError);
 }
 
-int DecodeByTable(
+int DecodeByConverter(
     const TCodePage& APage, bool AStrict, const char* ASource, int ABytes, char16_t* ADest, int ADestChars) {
   const auto Converter = ConverterOf(APage);
   if (Converter == nullptr) return Refuse(ERROR_INVALID_PARAMETER);
@@ -210,10 +208,36 @@ int DecodeByTable(
   const auto Step = [&](char16_t** AAt, const char16_t* ALimit, UErrorCode* AError) {
     ucnv_toUnicode(Converter.get(), AAt, ALimit, &ASource, End, nullptr, true, AError);
   };
-  const int Result = Pump(ADest, ADestChars, Step);
-  if (APage.Ascii == TAsciiUse::Rotated && ADest != nullptr && Result > 0)
-    Unrotate(ADest, Result, "\x1C\x7F\x1A", "\x1A\x1C\x7F");
-  return Result;
+  return Pump(ADest, ADestChars, Step);
+}
+
+int DecodeByTable(
+    const TCodePage& APage, bool AStrict, const char* ASource, int ABytes, char16_t* ADest, int ADestChars) {
+  TPageTable* const Table = TPageTable::Of(APage);
+  if (Table == nullptr) return Refuse(ERROR_INVALID_PARAMETER);
+  const auto Bytes = static_cast<std::size_t>(ABytes);
+  bool Malformed = false;
+  const bool Roomy = ADest != nullptr && ADestChars >= ABytes;
+  const auto Needed = Roomy ? 0 : static_cast<int>(Table->Decode(ASource, Bytes, nullptr, Malformed));
+  if (Needed > ADestChars && ADest != nullptr) return Refuse(ERROR_INSUFFICIENT_BUFFER);
+  const int Result = ADest == nullptr ? Needed : static_cast<int>(Table->Decode(ASource, Bytes, ADest, Malformed));
+  return AStrict && Malformed ? Refuse(ERROR_NO_UNICODE_TRANSLATION) : Result;
+}
+
+// AText is the result, for a destination that may be too small or none.
+template <class TUnit>
+int Deliver(std::basic_string_view<TUnit> AText, TUnit* ADest, int ACapacity) {
+  const std::size_t Limit = ADest == nullptr ? std::numeric_limits<int>::max() : static_cast<std::size_t>(ACapacity);
+  if (AText.size() > Limit) return Refuse(ERROR_INSUFFICIENT_BUFFER);
+  if (ADest != nullptr) std::ranges::copy(AText, ADest);
+  return static_cast<int>(AText.size());
+}
+
+int DecodeByCodec(const TCodePage& APage, bool AStrict, std::string_view ABytes, char16_t* ADest, int ADestChars) {
+  bool Malformed = false;
+  const std::u16string Text = APage.Kind == TPageKind::Hz ? DecodeHz(ABytes, Malformed) : DecodeUtf7(ABytes);
+  if (AStrict && Malformed) return Refuse(ERROR_NO_UNICODE_TRANSLATION);
+  return Deliver<char16_t>(Text, ADest, ADestChars);
 }
 
 // Escaped bytes are low surrogates, and only they come without a high one.
@@ -241,7 +265,9 @@ int DecodeText(const TCodePage& APage, bool AStrict, const char* ASource, int AB
   if (APage.Kind == TPageKind::Utf8) return DecodeUtf8(AStrict, ASource, ABytes, ADest, ADestChars);
   return AfterPlainRun(
       APage, ASource, ABytes, ADest, ADestChars, [&](const char* AFrom, int ACount, char16_t* ATo, int ACapacity) {
-        return DecodeByTable(APage, AStrict, AFrom, ACount, ATo, ACapacity);
+        if (APage.HasTable()) return DecodeByTable(APage, AStrict, AFrom, ACount, ATo, ACapacity);
+        if (!HasCodec(APage)) return DecodeByConverter(APage, AStrict, AFrom, ACount, ATo, ACapacity);
+        return DecodeByCodec(APage, AStrict, {AFrom, static_cast<std::size_t>(ACount)}, ATo, ACapacity);
       });
 }
 
@@ -277,7 +303,10 @@ struct TSubstitute {
   char16_t Char = u'?';
   bool Strict = false;  // fail instead
   bool Used = false;
-  bool Rotated = false;  // what the converter gives has three bytes exchanged, which are put right behind it
+  [[nodiscard]] std::string_view View() const noexcept {  // of Bytes, of which an empty one is a byte 0
+    return Bytes == nullptr ? std::string_view()
+                            : std::string_view(Bytes, std::max<std::size_t>(std::strlen(Bytes), 1));
+  }
 };
 
 void U_CALLCONV EncodeMissing(const void* AContext, UConverterFromUnicodeArgs* AArgs, const UChar*, int32_t, UChar32,
@@ -288,52 +317,75 @@ void U_CALLCONV EncodeMissing(const void* AContext, UConverterFromUnicodeArgs* A
   Substitute.Used = true;
   *AError = U_ZERO_ERROR;
   if (Substitute.Bytes != nullptr) {
-    const auto Count = static_cast<int32_t>(std::max<std::size_t>(std::strlen(Substitute.Bytes), 1));
-    std::string Bytes(Substitute.Bytes, static_cast<std::size_t>(Count));  // an empty one is a byte 0
-    if (Substitute.Rotated) Unrotate(Bytes.data(), Count, "\x1A\x1C\x7F", "\x7F\x1A\x1C");
-    ucnv_cbFromUWriteBytes(AArgs, Bytes.data(), Count, 0, AError);
+    ucnv_cbFromUWriteBytes(AArgs, Substitute.Bytes, static_cast<int32_t>(Substitute.View().size()), 0, AError);
   } else {
     const UChar* At = &Substitute.Char;
     ucnv_cbFromUWriteUChars(AArgs, &At, At + 1, 0, AError);
   }
 }
 
-int EncodeByTable(const TCodePage& APage, bool ABestFit, TSubstitute& ASubstitute, const char16_t* ASource, int AChars,
-    char* ADest, int ADestBytes) {
+int EncodeByConverter(const TCodePage& APage, bool ABestFit, TSubstitute& ASubstitute, const char16_t* ASource,
+    int AChars, char* ADest, int ADestBytes) {
   const auto Converter = ConverterOf(APage);
   if (Converter == nullptr) return Refuse(ERROR_INVALID_PARAMETER);
   UErrorCode Error = U_ZERO_ERROR;
-  ASubstitute.Rotated = APage.Ascii == TAsciiUse::Rotated;
   ucnv_setFallback(Converter.get(), ABestFit ? 1 : 0);
   ucnv_setFromUCallBack(Converter.get(), EncodeMissing, &ASubstitute, nullptr, nullptr, &Error);
   const char16_t* const End = ASource + AChars;
   const auto Step = [&](char** AAt, const char* ALimit, UErrorCode* AError) {
     ucnv_fromUnicode(Converter.get(), AAt, ALimit, &ASource, End, nullptr, true, AError);
   };
-  const int Result = Pump(ADest, ADestBytes, Step);
-  if (ASubstitute.Rotated && ADest != nullptr && Result > 0) Unrotate(ADest, Result, "\x7F\x1A\x1C", "\x1A\x1C\x7F");
-  return Result;
+  return Pump(ADest, ADestBytes, Step);
 }
 
-// The one converter that leaves its text shifted at the end: a line end makes it shift back.
-int EncodeHz(const TCodePage& APage, bool ABestFit, TSubstitute& ASubstitute, std::u16string_view AText, char* ADest,
-    int ADestBytes) {
-  const std::u16string Line = std::u16string(AText) + u'\n';
-  const auto Chars = static_cast<int>(Line.size());
-  const int Size = EncodeByTable(APage, ABestFit, ASubstitute, Line.data(), Chars, nullptr, 0);
-  if (Size == cFailed || ADest == nullptr) return Size == cFailed ? cFailed : Size - 1;
-  if (Size - 1 > ADestBytes) return Refuse(ERROR_INSUFFICIENT_BUFFER);
+int EncodeByTable(const TCodePage& APage, Cardinal AFlags, TSubstitute& ASubstitute, const char16_t* ASource,
+    int AChars, char* ADest, int ADestBytes) {
+  TPageTable* const Table = TPageTable::Of(APage);
+  if (Table == nullptr) return Refuse(ERROR_INVALID_PARAMETER);
+  TPageTable::TMissing Missing{.Bytes = ASubstitute.View(),
+      .BestFit = (AFlags & WC_NO_BEST_FIT_CHARS) == 0,
+      .Composes = (AFlags & WC_COMPOSITECHECK) != 0};
+  const auto Chars = static_cast<std::size_t>(AChars);
+  const std::size_t Most = Chars * std::max<std::size_t>(APage.BytesPerUnit, Missing.Bytes.size());
+  const bool Roomy = ADest != nullptr && static_cast<std::size_t>(ADestBytes) >= Most;
+  const std::size_t Needed = Roomy ? 0 : Table->Encode(ASource, Chars, nullptr, Missing);
+  const std::size_t Room = ADest == nullptr ? std::numeric_limits<int>::max() : static_cast<std::size_t>(ADestBytes);
+  if (Needed > Room) return Refuse(ERROR_INSUFFICIENT_BUFFER);
+  const std::size_t Result = ADest == nullptr || Missing.Meets ? Needed : Table->Encode(ASource, Chars, ADest, Missing);
+  if (Missing.Meets) return cMeets;
+  ASubstitute.Used = ASubstitute.Used || Missing.Found;
+  return static_cast<int>(Result);
+}
+
+int EncodeByCodec(const TCodePage& APage, bool ABestFit, TSubstitute& ASubstitute, std::u16string_view AText,
+    char* ADest, int ADestBytes) {
+  if (APage.Kind == TPageKind::Utf7) return Deliver<char>(EncodeUtf7(AText), ADest, ADestBytes);
+  TPageTable::TMissing Missing{.Bytes = ASubstitute.View(), .BestFit = ABestFit};
+  const std::string Bytes = EncodeHz(AText, Missing);
+  ASubstitute.Used = ASubstitute.Used || Missing.Found;
+  return Deliver<char>(Bytes, ADest, ADestBytes);
+}
+
+// The converter has half-width letters behind SO.
+int EncodeWithEscapes(
+    const TCodePage& APage, TSubstitute& ASubstitute, std::u16string_view AText, char* ADest, int ADestBytes) {
+  const auto Chars = static_cast<int>(AText.size());
+  const int Size = EncodeByConverter(APage, true, ASubstitute, AText.data(), Chars, nullptr, 0);
+  if (Size == cFailed) return cFailed;
   std::string Bytes(static_cast<std::size_t>(Size), '\0');
-  EncodeByTable(APage, ABestFit, ASubstitute, Line.data(), Chars, Bytes.data(), Size);
-  std::copy(Bytes.begin(), Bytes.end() - 1, ADest);
-  return Size - 1;
+  EncodeByConverter(APage, true, ASubstitute, AText.data(), Chars, Bytes.data(), Size);
+  return Deliver<char>(EscapeHalfWidth(Bytes), ADest, ADestBytes);
 }
 
 bool PageHas(const TCodePage& APage, UChar32 AChar) {
+  if (APage.HasTable()) {
+    TPageTable* const Table = TPageTable::Of(APage);
+    return Table != nullptr && Table->CodeOf(static_cast<char16_t>(AChar), false) != 0;
+  }
   TSubstitute Substitute{.Strict = true};
   const std::u16string Text = AChar > 0xFFFF ? std::u16string{U16_LEAD(AChar), U16_TRAIL(AChar)}
                                              : std::u16string(1, static_cast<char16_t>(AChar));
-  return EncodeByTable(APage, false, Substitute, Text.data(), static_cast<int>(Text.size()), nullptr, 0) > 0;
+  return EncodeByConverter(APage, false, Substitute, Text.data(), static_cast<int>(Text.size()), nullptr, 0) > 0;
 }
 
 const UNormalizer2* Composer() noexcept {
@@ -341,17 +393,12 @@ const UNormalizer2* Composer() noexcept {
   return unorm2_getNFCInstance(&Error);
 }
 
-constexpr bool MayBeMark(char16_t AChar) noexcept { return AChar >= 0x300; }
-bool IsMark(char16_t AChar) noexcept { return MayBeMark(AChar) && unorm2_hasBoundaryBefore(Composer(), AChar) == 0; }
-bool HasMarks(std::u16string_view AText) noexcept {
-  return std::ranges::any_of(AText, MayBeMark) && std::ranges::any_of(AText, IsMark);
-}
-
 // AText with each letter and the mark behind it as one character, where the page has that character.
 std::u16string ComposeFor(const TCodePage& APage, std::u16string_view AText) {
   std::u16string Result;
   for (const char16_t c : AText) {
-    const UChar32 Whole = Result.empty() || !IsMark(c) ? U_SENTINEL : unorm2_composePair(Composer(), Result.back(), c);
+    const UChar32 Whole =
+        Result.empty() || !TPageTable::MayMeet(c) ? U_SENTINEL : unorm2_composePair(Composer(), Result.back(), c);
     if (Whole > 0 && Whole <= 0xFFFF && PageHas(APage, Whole)) Result.back() = static_cast<char16_t>(Whole);
     else Result += c;
   }
@@ -386,8 +433,11 @@ int EncodeText(const TCodePage& APage, Cardinal AFlags, TSubstitute& ASubstitute
   if (APage.Kind == TPageKind::Utf8) return EncodeUtf8(ASource, AChars, ADest, ADestBytes);
   const auto Rest = [&](const char16_t* AFrom, int ACount, char* ATo, int ACapacity) {
     const bool BestFit = (AFlags & WC_NO_BEST_FIT_CHARS) == 0;
-    if (APage.Kind != TPageKind::Hz) return EncodeByTable(APage, BestFit, ASubstitute, AFrom, ACount, ATo, ACapacity);
-    return EncodeHz(APage, BestFit, ASubstitute, {AFrom, static_cast<std::size_t>(ACount)}, ATo, ACapacity);
+    const std::u16string_view Text(AFrom, static_cast<std::size_t>(ACount));
+    if (APage.HasTable()) return EncodeByTable(APage, AFlags, ASubstitute, AFrom, ACount, ATo, ACapacity);
+    if (HasCodec(APage)) return EncodeByCodec(APage, BestFit, ASubstitute, Text, ATo, ACapacity);
+    if (APage.Number == 50221) return EncodeWithEscapes(APage, ASubstitute, Text, ATo, ACapacity);
+    return EncodeByConverter(APage, BestFit, ASubstitute, AFrom, ACount, ATo, ACapacity);
   };
   return AfterPlainRun(APage, ASource, AChars, ADest, ADestBytes, Rest);
 }
@@ -407,10 +457,13 @@ int Encode(Word ACodePage, Cardinal AFlags, const char16_t* ASource, int AChars,
   if (Page->IsUnicode()) ASubstitute.Char = 0xFFFD;
   const int Chars = AChars == -1 ? TerminatedLength<char16_t>(ASource) / 2 : AChars;
   const std::u16string_view Text(ASource, static_cast<std::size_t>(Chars));
-  const bool Composes = (AFlags & WC_COMPOSITECHECK) != 0 && !Page->IsUnicode() && HasMarks(Text);
-  if (!Composes) return EncodeText(*Page, AFlags, ASubstitute, ASource, Chars, ADest, ADestBytes);
+  const bool Composes = (AFlags & WC_COMPOSITECHECK) != 0 && !Page->IsUnicode();
+  const bool Meets = Composes && !Page->HasTable() && std::ranges::any_of(Text, TPageTable::MayMeet);
+  const int Result = Meets ? cMeets : EncodeText(*Page, AFlags, ASubstitute, ASource, Chars, ADest, ADestBytes);
+  if (Result != cMeets) return Result;
   const std::u16string Composed = ComposeFor(*Page, Text);
-  return EncodeText(*Page, AFlags, ASubstitute, Composed.data(), static_cast<int>(Composed.size()), ADest, ADestBytes);
+  return EncodeText(*Page, AFlags & ~WC_COMPOSITECHECK, ASubstitute, Composed.data(), static_cast<int>(Composed.size()),
+      ADest, ADestBytes);
 }
 
 }  // namespace
@@ -511,7 +564,8 @@ std::string Narrow(Word ACodePage, std::u16string_view AText) {
 }
 
 const TCodePage& RequiredPage(Word ACodePage) {
-  if (const TCodePage* const Page = ServedPage(ACodePage)) return *Page;
+  const TCodePage* const Page = ServedPage(ACodePage);
+  if (Page != nullptr && (!Page->HasTable() || TPageTable::Of(*Page) != nullptr)) return *Page;
   throw EEncodingError(u"There is no character data for code page " + IntToStr(ACodePage));
 }
 
@@ -549,6 +603,7 @@ UnicodeString TEncoding::GetEncodingName() const { return IntToStr(GetCodePage()
 
 UnicodeString TEncoding::GetMIMEName() const {
   const TCodePage& Page = RequiredPage(FCodePage);
+  if (Page.Data.Source != TCharacterData::ICU) return Page.Name();
   for (const char* const Standard : {"MIME", "IANA"}) {
     UErrorCode Error = U_ZERO_ERROR;
     if (const char* const Name = ucnv_getStandardName(Page.Data.Name, Standard, &Error))
