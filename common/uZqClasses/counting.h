@@ -6,10 +6,13 @@
 
 namespace zq {
 
-struct IZqObject : Extends<IInterface> {
+struct ZQ_API IZqObject : Extends<IInterface> {
   static constexpr TGUID IID = "{0417F540-9CCC-4DE6-B2C4-1063D0508346}"_guid;
   /// The object behind the interface.
   virtual TObject* Implementor() = 0;
+
+ protected:
+  ~IZqObject() = default;
 };
 
 /// What a count of zero means for an instance.

@@ -17,13 +17,16 @@ inline constexpr TResStringRec _SObjRefCountNotZero{
     65507, u"An instance of %s is destroyed while it's refcount is not 0!"};
 }  // namespace uZqClasses
 
-struct IZqObjectFreeNotificationEvent : Extends<IZqObject> {
+struct ZQ_API IZqObjectFreeNotificationEvent : Extends<IZqObject> {
   static constexpr TGUID IID = "{BBECB66F-1397-4FFA-AFE5-C7BD63A1EAC6}"_guid;
   /// AObject is going; to drop pointers to it.
   virtual void OnObjectDestroyed(TObject* AObject) = 0;
+
+ protected:
+  ~IZqObjectFreeNotificationEvent() = default;
 };
 
-struct IZqObjectEx : Extends<IZqObject> {
+struct ZQ_API IZqObjectEx : Extends<IZqObject> {
   static constexpr TGUID IID = "{66D757F3-6274-47EC-95A9-39B144271EA9}"_guid;
   /// One-sided: only this object forgets AObject.
   virtual void RemoveNotification(const TObject* AObject) = 0;
@@ -31,16 +34,22 @@ struct IZqObjectEx : Extends<IZqObject> {
   virtual void FreeNotificationEx(const IntfRef<IZqObjectFreeNotificationEvent>& AObject) = 0;
   /// Undoes that on both sides.
   virtual void RemoveFreeNotificationEx(const IntfRef<IZqObject>& AObject) = 0;
+
+ protected:
+  ~IZqObjectEx() = default;
 };
 
 enum class TZqObjectOwnership : std::uint8_t { ooReference, ooOwned };
 using enum TZqObjectOwnership;
 
-struct IZqObjectAdapter : Extends<IInterface> {
+struct ZQ_API IZqObjectAdapter : Extends<IInterface> {
   static constexpr TGUID IID = "{6C25403A-FB3F-4F23-87AC-8DD56330109B}"_guid;
   /// The object behind the adapter, which stays its owner's or the adapter's by GetOwnership.
   virtual TObject* GetObject() = 0;
   virtual TZqObjectOwnership GetOwnership() = 0;
+
+ protected:
+  ~IZqObjectAdapter() = default;
 };
 
 /// Lives by an owner or by its interface references, which each instance decides: the first reference makes it theirs,

@@ -29,10 +29,13 @@ struct TBindingAssociation {
 }
 
 /// Where the names of an expression are looked up.
-struct IScope : Extends<IInterface> {
+struct ZQ_API IScope : Extends<IInterface> {
   static constexpr TGUID IID = "{7B0D6A52-53D4-4C0B-9B1E-5D0A3C5E8F21}"_guid;
   /// The object of that name, in any case; nullptr if none.
   virtual TObject* Lookup(const UnicodeString& AName) = 0;
+
+ protected:
+  ~IScope() = default;
 };
 
 /// Makes what is written out of what was read.
