@@ -4,6 +4,8 @@
 #include <chrono>
 #include <optional>
 
+#include "runtime/sync/pause.h"
+
 namespace zq {
 
 namespace {
@@ -57,7 +59,7 @@ void TEvent::ResetEvent() {
 
 TWaitResult TEvent::WaitFor(Cardinal ATimeout) {
   const auto IsSet = [this] { return FSignaled.load(std::memory_order_relaxed); };
-  for (int i = 0; ATimeout != 0 && i < cSpins && !IsSet(); ++i) __builtin_ia32_pause();
+  for (int i = 0; ATimeout != 0 && i < cSpins && !IsSet(); ++i) SpinPause();
   std::unique_lock Guard(FLock);
   if (!IsSet() && (ATimeout == 0 || !WaitUntil(FChanged, Guard, Deadline(ATimeout), IsSet))) return wrTimeout;
   if (!FManualReset) FSignaled.store(false, std::memory_order_relaxed);
