@@ -23,8 +23,9 @@ constexpr TPackageUnit cUnits[] = {
     {u"uZqLogAppenders", uZqLogAppenders::Start, uZqLogAppenders::Stop},
 };
 
-[[gnu::constructor]] void Load() { Initialize(); }
-[[gnu::destructor]] void Unload() { uZqLogger::EndProcess(); }
+// Also linked statically, the library starts before the program's own static objects and ends after them.
+[[gnu::constructor(101)]] void Load() { Initialize(); }
+[[gnu::destructor(101)]] void Unload() { uZqLogger::EndProcess(); }
 
 }  // namespace
 

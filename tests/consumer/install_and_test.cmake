@@ -7,6 +7,6 @@ endfunction()
 file(REMOVE_RECURSE ${WORK})
 run(${CMAKE_COMMAND} --install ${BUILD} --prefix ${WORK}/prefix)
 run(${CMAKE_COMMAND} -S ${CMAKE_CURRENT_LIST_DIR} -B ${WORK}/build -G ${GENERATOR}
-  -DCMAKE_CXX_COMPILER=${COMPILER} -DCMAKE_PREFIX_PATH=${WORK}/prefix)
+  -DCMAKE_CXX_COMPILER=${COMPILER} -DSHARED=${SHARED} -DCMAKE_PREFIX_PATH=${WORK}/prefix)
 run(${CMAKE_COMMAND} --build ${WORK}/build)
 run(${CMAKE_CTEST_COMMAND} --test-dir ${WORK}/build --output-on-failure --no-tests=error)

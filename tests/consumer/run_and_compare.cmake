@@ -1,4 +1,4 @@
-# Runs PROGRAM in an empty FOLDER. The log must hold header, line and footer, and the folder nothing else.
+# Runs PROGRAM in an empty FOLDER. The log must hold header, a line for each of MESSAGES and footer, and the folder nothing else.
 
 file(REMOVE_RECURSE ${FOLDER})
 file(MAKE_DIRECTORY ${FOLDER})
@@ -10,6 +10,8 @@ if(NOT names STREQUAL "app.log")
 endif()
 file(READ ${FOLDER}/app.log log)
 set(time "[0-9][0-9][0-9][0-9]-[0-9][0-9]-[0-9][0-9] [0-9][0-9]:[0-9][0-9]:[0-9][0-9]:[0-9][0-9][0-9]")
-if(NOT log MATCHES "^Log started on : [^\n]+\n${time} - Info root - started\nLog stopped on : [^\n]+$")
+list(TRANSFORM MESSAGES REPLACE "(.+)" "${time} - Info root - \\1\n" OUTPUT_VARIABLE lines)
+list(JOIN lines "" lines)
+if(NOT log MATCHES "^Log started on : [^\n]+\n${lines}Log stopped on : [^\n]+$")
   message(FATAL_ERROR "Unexpected log:\n${log}")
 endif()
