@@ -2,8 +2,9 @@ include(CMakePackageConfigHelpers)
 
 set(package_folder ${CMAKE_INSTALL_LIBDIR}/cmake/rZqCommon)
 
-install(TARGETS rZqCommon EXPORT rZqCommonTargets
-  FILE_SET HEADERS DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/rZqCommon)
+install(TARGETS rZqCommon EXPORT rZqCommonTargets INCLUDES DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/rZqCommon)
+install(DIRECTORY common runtime DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/rZqCommon
+  FILES_MATCHING PATTERN *.h PATTERN runtime/linux EXCLUDE)
 install(EXPORT rZqCommonTargets NAMESPACE rZqCommon:: DESTINATION ${package_folder})
 
 # Who links the library statically links what stands below it, too, and needs that installed; nobody else does.
@@ -21,8 +22,18 @@ write_basic_package_version_file(${PROJECT_BINARY_DIR}/rZqCommonConfigVersion.cm
 install(FILES ${PROJECT_BINARY_DIR}/rZqCommonConfig.cmake ${PROJECT_BINARY_DIR}/rZqCommonConfigVersion.cmake
   DESTINATION ${package_folder})
 
-# The way from the .pc file up to the prefix, so that an installed tree may be moved.
-set(pc_to_prefix ${CMAKE_INSTALL_PREFIX})
-cmake_path(RELATIVE_PATH pc_to_prefix BASE_DIRECTORY ${CMAKE_INSTALL_FULL_LIBDIR}/pkgconfig)
+# A relative folder lies below the prefix and the .pc file tells the way up to that, so that an installed tree may be
+# moved; an absolute one stands as it is.
+foreach(kind IN ITEMS LIBDIR INCLUDEDIR)
+  set(pc_${kind} ${CMAKE_INSTALL_${kind}})
+  if(NOT IS_ABSOLUTE ${pc_${kind}})
+    string(PREPEND pc_${kind} "\${prefix}/")
+  endif()
+endforeach()
+set(pc_prefix ${CMAKE_INSTALL_PREFIX})
+if(NOT IS_ABSOLUTE ${CMAKE_INSTALL_LIBDIR})
+  cmake_path(RELATIVE_PATH pc_prefix BASE_DIRECTORY ${CMAKE_INSTALL_FULL_LIBDIR}/pkgconfig)
+  string(PREPEND pc_prefix "\${pcfiledir}/")
+endif()
 configure_file(packaging/rZqCommon.pc.in ${PROJECT_BINARY_DIR}/rZqCommon.pc @ONLY)
 install(FILES ${PROJECT_BINARY_DIR}/rZqCommon.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)
