@@ -15,6 +15,12 @@ endfunction()
 
 file(REMOVE_RECURSE ${WORK})
 run(${CMAKE_COMMAND} --install ${BUILD} --prefix ${WORK}/prefix)
+if(NOT CONFIG STREQUAL "Debug")
+  execute_process(COMMAND grep -rlF -e ${SOURCE}/ -e ${BUILD}/ ${WORK}/prefix OUTPUT_VARIABLE named)
+  if(named)
+    message(FATAL_ERROR "Installed files name the folder they were built in:\n${named}")
+  endif()
+endif()
 test_hosts(moved ${WORK}/prefix/${LIBDIR})
 
 # Configured anew, not built anew. What is installed into a folder of the source tree has to be told relatively.

@@ -1,4 +1,5 @@
-# Runs PROGRAM in an empty FOLDER. The log must hold header, a line for each of MESSAGES and footer, and the folder nothing else.
+# Runs PROGRAM in an empty FOLDER. The log must hold header, a line for each of MESSAGES and footer, and the folder
+# nothing else.
 
 file(REMOVE_RECURSE ${FOLDER})
 file(MAKE_DIRECTORY ${FOLDER})
