@@ -60,7 +60,7 @@ template <class T>
 UnicodeString TextOfOther(const void* AValue);
 
 /// The name of an enumeration's value, its number where nobody has described it.
-[[nodiscard]] ZQ_API UnicodeString EnumText(const std::type_info& AType, Int64 AOrdinal);
+[[nodiscard]] UnicodeString EnumText(const std::type_info& AType, Int64 AOrdinal);
 /// A moment by the local clock, "yyyy-mm-dd hh:mm:ss:zzz".
 [[nodiscard]] ZQ_API UnicodeString MomentText(Int64 AUtcMilliseconds);
 [[nodiscard]] ZQ_API UnicodeString ExceptionText(const void* AExceptionPtr);
