@@ -70,7 +70,7 @@ std::u16string LongestUnit(Word ACodePage, int& ALength) {
 // The converters' own answers: a foreign front keeps the rest from the short way that ASCII takes.
 void CheckAscii(const TCodePage& APage, const std::string& AForeign, const std::u16string& AForeignText) {
   std::string Ascii;
-  for (char c = 0x10; c > 0; ++c) Ascii += c;
+  for (char c = 0x10; c != '\x80'; ++c) Ascii += c;
   const bool Kept = Encoded(APage.Number, std::u16string(Ascii.begin(), Ascii.end())) == Ascii;
   EXPECT_EQ(Kept, APage.Ascii < TAsciiUse::Guarded);
   if (APage.Ascii == TAsciiUse::Foreign) return;

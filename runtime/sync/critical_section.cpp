@@ -11,6 +11,8 @@
 #include <ctime>
 #include <mutex>
 
+#include "runtime/sync/pause.h"
+
 namespace zq {
 
 namespace {
@@ -77,7 +79,7 @@ ZQ_HOT bool TCriticalSection::TryEnter() noexcept {
 bool TCriticalSection::Spin() noexcept {
   for (int Pauses = 1, Left = cSpins; Left > 0; Left -= Pauses) {
     Pauses = std::min(2 * Pauses, cLongestPause);
-    for (int i = 0; i < Pauses; ++i) __builtin_ia32_pause();
+    for (int i = 0; i < Pauses; ++i) SpinPause();
     if (TryEnter()) return true;
   }
   return false;

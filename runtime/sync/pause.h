@@ -7,9 +7,11 @@ inline void SpinPause() noexcept {
 #if defined(__x86_64__) || defined(__i386__)
   __builtin_ia32_pause();
 #elif defined(__aarch64__)
-  asm volatile("isb" ::: "memory");  // `yield` is over at once on most cores, so that a spin would end too early
+  // `yield` is over at once on most cores, so that a spin would end too early.
+  asm volatile("isb" ::: "memory");
 #elif defined(__riscv)
-  asm volatile(".insn i 0x0F, 0, x0, x0, 0x010" ::: "memory");  // `pause`; a core without it takes it for an empty fence
+  // `pause`: a core that does not know it takes it for an empty fence.
+  asm volatile(".insn i 0x0F, 0, x0, x0, 0x010" ::: "memory");
 #else
   asm volatile("" ::: "memory");
 #endif
