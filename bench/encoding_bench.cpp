@@ -32,16 +32,23 @@ constexpr std::u16string_view cCjk[] = {
     u"漢字", u"日本語", u"文章", u"世界", u"東京都", u"かな交じり", u"中文", u"한국어", u"你好", u"測試"};
 constexpr std::u16string_view cEmoji[] = {u"😀", u"🚀", u"👍"};
 
-// ALength characters: phrases of some words each, in one script or, mixed, in a script that chance names.
-std::u16string MakeText(bool AMixed, std::size_t ALength) {
-  constexpr std::array<TWords, 4> cScripts{cLatin, cLatin, cGreek, cCjk};
+// What the benchmarks call text: phrases of some words each, in one script or in scripts that chance names; words among
+// emoji; emoji without a blank.
+enum TKind : std::int64_t { Ascii, Mixed, Chat, Emoji };
+
+std::u16string MakeText(std::int64_t AKind, std::size_t ALength) {
+  static const std::vector<TWords> cScripts[] = {
+      {cAscii}, {cLatin, cLatin, cGreek, cCjk}, {cAscii, cCjk, cEmoji, cEmoji}, {cEmoji}};
+  const std::vector<TWords>& Scripts = cScripts[AKind];
   std::minstd_rand Chance(7);  // NOLINT: the same text in each run
   std::u16string Result;
-  const auto Append = [&](TWords AWords) { Result.append(AWords[Chance() % AWords.size()]).append(u" "); };
+  const auto Append = [&](TWords AWords) {
+    Result.append(AWords[Chance() % AWords.size()]).append(AKind == Emoji ? u"" : u" ");
+  };
   while (Result.size() < ALength) {
-    const TWords Words = AMixed ? cScripts[Chance() % cScripts.size()] : TWords(cAscii);
-    for (auto Left = 3 + Chance() % 6; Left > 0; --Left) Append(Words);
-    if (AMixed && Chance() % 4 == 0) Append(cEmoji);
+    const TWords Words = Scripts[Chance() % Scripts.size()];
+    for (auto Left = AKind == Chat ? 1 : 3 + Chance() % 6; Left > 0; --Left) Append(Words);
+    if (AKind == Mixed && Chance() % 4 == 0) Append(cEmoji);
   }
   Result.resize(ALength);
   if ((Result.back() & 0xFC00) == 0xD800) Result.back() = u'.';  // a pair that was cut
@@ -50,7 +57,7 @@ std::u16string MakeText(bool AMixed, std::size_t ALength) {
 
 struct TSample {
   explicit TSample(const benchmark::State& AState)
-      : Text(MakeText(AState.range(0) != 0, static_cast<std::size_t>(AState.range(1)))),
+      : Text(MakeText(AState.range(0), static_cast<std::size_t>(AState.range(1)))),
         Bytes(TZqEncoding::ConvertW(Text, cUtf8).Str()),
         WideRoom(Bytes.size()),
         ByteRoom(3 * Text.size()) {}
@@ -89,6 +96,28 @@ void IcuUtf8ToUtf16(benchmark::State& AState) {
   Count(AState, Sample.Text.size(), Got);
 }
 
+void Utf8Size(benchmark::State& AState) {
+  const TSample Sample(AState);
+  Integer Got = 0;
+  for (auto Step : AState) {
+    Got = TZqEncoding::ConvertA(reinterpret_cast<const Byte*>(Sample.Bytes.data()),
+        static_cast<Integer>(Sample.Bytes.size()), cUtf8, nullptr, 0);
+    benchmark::ClobberMemory();
+  }
+  Count(AState, Sample.Text.size(), Got);
+}
+
+void IcuUtf8Size(benchmark::State& AState) {
+  const TSample Sample(AState);
+  std::int32_t Got = 0;
+  for (auto Step : AState) {
+    UErrorCode Error = U_ZERO_ERROR;
+    u_strFromUTF8(nullptr, 0, &Got, Sample.Bytes.data(), static_cast<std::int32_t>(Sample.Bytes.size()), &Error);
+    benchmark::ClobberMemory();
+  }
+  Count(AState, Sample.Text.size(), Got);
+}
+
 void Utf16ToUtf8(benchmark::State& AState) {
   TSample Sample(AState);
   Integer Got = 0;
@@ -113,12 +142,14 @@ void IcuUtf16ToUtf8(benchmark::State& AState) {
 }
 
 void Texts(benchmark::internal::Benchmark* ABenchmark) {
-  ABenchmark->ArgNames({"mixed", "chars"})->ArgsProduct({{0, 1}, {64, 4096}});
+  ABenchmark->ArgNames({"text", "chars"})->ArgsProduct({{Ascii, Mixed, Chat, Emoji}, {64, 4096}});
 }
 BENCHMARK(Utf8ToUtf16)->Apply(Texts);     // never slower than the one below,
 BENCHMARK(IcuUtf8ToUtf16)->Apply(Texts);  // on ASCII at least 3 times faster
 BENCHMARK(Utf16ToUtf8)->Apply(Texts);     // the same
 BENCHMARK(IcuUtf16ToUtf8)->Apply(Texts);
+BENCHMARK(Utf8Size)->Apply(Texts);  // never slower than the one below
+BENCHMARK(IcuUtf8Size)->Apply(Texts);
 
 // --------------------------------------------------------------------------------------------- other pages
 
