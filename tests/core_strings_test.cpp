@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include <vector>
+
 #include "runtime/core/guid.h"
 #include "runtime/core/strings.h"
 #include "runtime/core/utf8.h"
@@ -38,7 +40,9 @@ INSTANTIATE_TEST_SUITE_P(Table, Utf8Decode,
         TUtf8Case{"OverlongOfFour", "\xF0\x8F\xBF\xBF", u"\uFFFD\uFFFD\uFFFD\uFFFD"},
         TUtf8Case{"Surrogate", "\xED\xA0\x80\xED\xB0\x80", u"\uFFFD\uFFFD\uFFFD\uFFFD\uFFFD\uFFFD"},
         TUtf8Case{"BeyondTheLastPlane", "\xF4\x90\x80\x80\xF5", u"\uFFFD\uFFFD\uFFFD\uFFFD\uFFFD"},
-        TUtf8Case{"CutAtTwo", "\xE2\x82", u"\uFFFD"}, TUtf8Case{"CutAtThree", "\xF0\x9F\x98", u"\uFFFD"},
+        TUtf8Case{"NoLead", "\xF8\x90\x80\x80", u"\uFFFD\uFFFD\uFFFD\uFFFD"},
+        TUtf8Case{"CutAtTwo", "\xE2\x82", u"\uFFFD"}, TUtf8Case{"BrokenThird", "\xF0\x9Fz\x80", u"\uFFFDz\uFFFD"},
+        TUtf8Case{"CutAtThree", "\xF0\x9F\x98", u"\uFFFD"},
         TUtf8Case{"CutByASequence", "\xF0\x9F\x98z\xE2\x82\xE2\x82\xAC", u"\uFFFDz\uFFFD\u20AC"},
         TUtf8Case{"TheStandardsExample", "a\xF1\x80\x80\xE1\x80\xC2\x62\x80\x63\x80\xBF\x64",
             u"a\uFFFD\uFFFD\uFFFDb\uFFFDc\uFFFD\uFFFDd"}),
@@ -56,27 +60,40 @@ TEST(Utf8Escape, CarriesEveryByteAloneAndInPairs) {
 
 TEST(Utf8Encode, GivesEveryCodePointTheBytesThatDecodeToIt) {
   for (char32_t Code = 1; Code <= 0x10FFFF; Code += Code < 0x3000 ? 1 : 61) {
-    UnicodeString Text(static_cast<char16_t>(Code));
-    if (Code > 0xFFFF)
-      Text =
-          std::u16string{static_cast<char16_t>(0xD7C0 + (Code >> 10)), static_cast<char16_t>(0xDC00 | (Code & 0x3FF))};
-    const std::size_t Length = Code < 0x80 ? 1 : Code < 0x800 ? 2 : Code < 0x10000 ? 3 : 4;
-    const bool Surrogate = Code >= 0xD800 && Code <= 0xDFFF;
+    const auto Unit = [](char32_t AUnit) { return static_cast<char16_t>(AUnit); };
+    UnicodeString Text(Unit(Code));
+    if (Code > 0xFFFF) Text = std::u16string{Unit(0xD7C0 + (Code >> 10)), Unit(0xDC00 | (Code & 0x3FF))};
     const std::string Bytes = Text.ToUTF8();
-    ASSERT_EQ(Bytes.size(), Length);
-    ASSERT_EQ(FromUTF8(Bytes) == Text, !Surrogate) << std::hex << static_cast<unsigned>(Code);
+    ASSERT_EQ(Bytes.size(), Code < 0x80 ? 1U : Code < 0x800 ? 2U : Code < 0x10000 ? 3U : 4U);
+    ASSERT_EQ(FromUTF8(Bytes) == Text, Code < 0xD800 || Code > 0xDFFF) << std::hex << static_cast<unsigned>(Code);
   }
 }
 
 TEST(Utf8Encode, ReplacesSurrogatesWithoutPartner) {
-  for (const std::u16string Lone : {u"\xD800", u"\xDBFFx", u"\xDC80", u"\xDFFF", u"\xDC00\xD800", u"\xD800\xD800"}) {
+  for (const std::u16string Lone : {u"\xDBFFx", u"\xDC80", u"\xDFFF", u"\xDC00\xD800", u"\xD800\xD83D\xDE00\xD83D"}) {
     const std::string Bytes = utf8::Encode(Lone);
     EXPECT_EQ(Bytes.rfind("\xEF\xBF\xBD", 0), 0U);
     EXPECT_EQ(Bytes.find("\xED"), std::string::npos);
     EXPECT_EQ(utf8::EncodedLength(Lone.data(), Lone.size()), Bytes.size());
+    EXPECT_EQ(utf8::Encode(Lone + std::u16string(9, u'r')), Bytes + std::string(9, 'r'));
   }
   EXPECT_EQ(utf8::Encode(u"\xD83D\xDE00", utf8::TMalformed::Escape), "\xF0\x9F\x98\x80");
   EXPECT_EQ(utf8::Encode(u"\xDC7F\xDC80", utf8::TMalformed::Escape), "\xEF\xBF\xBD\x80");
+}
+
+TEST(Utf8Runs, OfOneLengthEndWhereverTheTextDoes) {
+  for (const std::u16string One : {u"\u00E9", u"\u4E16", u"\U0001F600"}) {
+    std::u16string Run = One;
+    for (std::size_t Count = 1; Count < 24; ++Count, Run += One) {
+      std::string Bytes = utf8::Encode(Run);
+      ASSERT_EQ(utf8::Decode(Bytes.substr(0, Bytes.size() - 1)), Run.substr(One.size()) + u'\xFFFD') << Count;
+      Bytes.append(Count % 4, 'a');
+      const std::vector<char> Source(Bytes.begin(), Bytes.end());  // no byte and no unit more than the text
+      std::vector<char16_t> Room(utf8::DecodedLength(Source.data(), Source.size()));
+      ASSERT_EQ(utf8::Decode(Source.data(), Source.size(), Room.data()), Room.size());
+      ASSERT_EQ(std::u16string(Room.begin(), Room.end()), Run + std::u16string(Count % 4, u'a'));
+    }
+  }
 }
 
 TEST(Utf8Ascii, RunEndsAtTheFirstOtherCharacterWhereverItStands) {

@@ -1,6 +1,7 @@
 #include "runtime/core/utf8.h"
 
 #include <algorithm>
+#include <bit>
 #include <cstdint>
 #include <cstring>
 #include <utility>
@@ -13,7 +14,40 @@ namespace zq::utf8 {
 
 namespace {
 
+static_assert(std::endian::native == std::endian::little, "the first byte of a sequence is the lowest of its word");
+
 constexpr char16_t cReplacement = 0xFFFD;
+
+bool IsSurrogate(std::uint32_t c) noexcept { return (c & 0xF800U) == 0xD800U; }
+bool IsHighSurrogate(std::uint32_t c) noexcept { return (c & 0xFC00U) == 0xD800U; }
+bool IsLowSurrogate(std::uint32_t c) noexcept { return (c & 0xFC00U) == 0xDC00U; }
+
+// Most text beyond ASCII is runs of well-formed sequences of one length. These look at four bytes at a time.
+
+std::uint32_t LoadFour(const unsigned char* ASource) noexcept {
+  std::uint32_t Four = 0;
+  std::memcpy(&Four, ASource, 4);
+  return Four;
+}
+
+bool IsPair(std::uint32_t AFour) noexcept { return (AFour & 0xC0FFU) - 0x80C2U <= 0x1DU; }
+char16_t UnitOfPair(std::uint32_t AFour) noexcept {
+  return static_cast<char16_t>((AFour & 0x1FU) << 6U | (AFour >> 8U & 0x3FU));
+}
+
+bool IsTriple(std::uint32_t AFour, std::uint32_t AUnit) noexcept {
+  return (AFour & 0xC0C0F0U) == 0x8080E0 && AUnit >= 0x800 && !IsSurrogate(AUnit);
+}
+std::uint32_t UnitOfTriple(std::uint32_t AFour) noexcept {
+  return (AFour & 0x0FU) << 12U | (AFour >> 2U & 0xFC0U) | (AFour >> 16U & 0x3FU);
+}
+
+bool IsQuad(std::uint32_t AFour, std::uint32_t ACodePoint) noexcept {
+  return (AFour & 0xC0C0C0F8U) == 0x808080F0 && ACodePoint - 0x10000U < 0x100000U;
+}
+std::uint32_t CodePointOfQuad(std::uint32_t AFour) noexcept {
+  return (AFour & 0x07U) << 18U | (AFour << 4U & 0x3F000U) | (AFour >> 10U & 0xFC0U) | (AFour >> 24U & 0x3FU);
+}
 
 // One sequence of two to four bytes. Follows table 3-7 of the Unicode standard: the range of the second byte depends on
 // the first. Length is that of the sequence, or of the longest broken piece when Valid is false.
@@ -83,6 +117,11 @@ std::size_t WidenAscii(const char* ASource, std::size_t ALength, char16_t* ADest
   return i;
 }
 
+// The same where nothing is written.
+std::size_t WidenAscii(const char* ASource, std::size_t ALength, std::size_t) noexcept {
+  return AsciiRun(ASource, ALength);
+}
+
 // At least eight units. What is left behind the last whole block is done with a block that overlaps the one before.
 std::size_t NarrowAscii(const char16_t* ASource, std::size_t ALength, char* ADest) noexcept {
   std::size_t i = 0;
@@ -110,16 +149,11 @@ std::size_t NarrowAscii(const char16_t* ASource, std::size_t ALength, char* ADes
   return i;
 }
 
-bool IsSurrogate(std::uint32_t c) noexcept { return (c & 0xF800U) == 0xD800U; }
-bool IsHighSurrogate(std::uint32_t c) noexcept { return (c & 0xFC00U) == 0xD800U; }
-bool IsLowSurrogate(std::uint32_t c) noexcept { return (c & 0xFC00U) == 0xDC00U; }
-
 // What the Put functions return is the place behind what they wrote.
 
 char* PutDouble(char* ADest, std::uint32_t c) noexcept {
-  const std::uint32_t Pair = 0x80C0U | c >> 6U | (c & 0x3FU) << 8U;  // one store, as the compilers see it
-  ADest[0] = static_cast<char>(Pair);
-  ADest[1] = static_cast<char>(Pair >> 8U);
+  const auto Pair = static_cast<std::uint16_t>(0x80C0U | c >> 6U | (c & 0x3FU) << 8U);
+  std::memcpy(ADest, &Pair, 2);
   return ADest + 2;
 }
 
@@ -132,54 +166,46 @@ char* PutTriple(char* ADest, std::uint32_t c) noexcept {
 
 char* PutQuad(char* ADest, std::uint32_t AHigh, std::uint32_t ALow) noexcept {
   const std::uint32_t c = 0x10000U + ((AHigh & 0x3FFU) << 10U | (ALow & 0x3FFU));
-  ADest[0] = static_cast<char>(0xF0U | c >> 18U);
-  ADest[1] = static_cast<char>(0x80U | (c >> 12U & 0x3FU));
-  ADest[2] = static_cast<char>(0x80U | (c >> 6U & 0x3FU));
-  ADest[3] = static_cast<char>(0x80U | (c & 0x3FU));
+  const std::uint32_t Quad =
+      0x808080F0U | c >> 18U | (c >> 4U & 0x3F00U) | (c << 10U & 0x3F0000U) | (c << 24U & 0x3F000000U);
+  std::memcpy(ADest, &Quad, 4);
   return ADest + 4;
 }
 
-// Most text beyond ASCII is runs of well-formed sequences of two or of three bytes. These look at four bytes at a time.
+// Units go to a place or, where only their number is asked for, to a count.
 
-std::uint32_t LoadFour(const unsigned char* ASource) noexcept {
-  std::uint32_t Four = 0;
-  std::memcpy(&Four, ASource, 4);
-  return Four;
+void Put(char16_t*& ADest, std::uint32_t AUnit) noexcept { *ADest++ = static_cast<char16_t>(AUnit); }
+void Put(std::size_t& ACount, std::uint32_t) noexcept { ++ACount; }
+
+template <class TDest>
+void PutSurrogates(TDest& ADest, std::uint32_t ACodePoint) noexcept {
+  Put(ADest, 0xD7C0U + (ACodePoint >> 10U));
+  Put(ADest, 0xDC00U | (ACodePoint & 0x3FFU));
 }
 
-bool IsPair(std::uint32_t AFour) noexcept { return (AFour & 0xC0FFU) - 0x80C2U <= 0x1DU; }
-char16_t UnitOfPair(std::uint32_t AFour) noexcept {
-  return static_cast<char16_t>((AFour & 0x1FU) << 6U | (AFour >> 8U & 0x3FU));
-}
+// The run that ASource begins with; a sequence may begin before AStop, behind which seven bytes can be read. False
+// where there is none.
 
-bool IsTriple(std::uint32_t AFour, std::uint32_t AUnit) noexcept {
-  return (AFour & 0xC0C0F0U) == 0x8080E0 && AUnit >= 0x800 && !IsSurrogate(AUnit);
-}
-std::uint32_t UnitOfTriple(std::uint32_t AFour) noexcept {
-  return (AFour & 0x0FU) << 12U | (AFour >> 2U & 0xFC0U) | (AFour >> 16U & 0x3FU);
-}
-
-// The run that ASource begins with; a sequence may begin before AStop, behind which four bytes can be read. False where
-// there is none.
-
+template <class TDest>
 [[gnu::always_inline]] inline bool DecodePairs(
-    const unsigned char*& ASource, const unsigned char* AStop, char16_t*& ADest) noexcept {
+    const unsigned char*& ASource, const unsigned char* AStop, TDest& ADest) noexcept {
   std::uint32_t Four = LoadFour(ASource);
   if (!IsPair(Four)) return false;
   do {
-    *ADest++ = UnitOfPair(Four);
+    Put(ADest, UnitOfPair(Four));
     ASource += 2;
     Four = LoadFour(ASource);
   } while (IsPair(Four) && ASource < AStop);
   return true;
 }
 
+template <class TDest>
 [[gnu::always_inline]] inline bool DecodeTriples(
-    const unsigned char*& ASource, const unsigned char* AStop, char16_t*& ADest) noexcept {
+    const unsigned char*& ASource, const unsigned char* AStop, TDest& ADest) noexcept {
   std::uint32_t Four = LoadFour(ASource), Unit = UnitOfTriple(Four);
   if (!IsTriple(Four, Unit)) return false;
   do {
-    *ADest++ = static_cast<char16_t>(Unit);
+    Put(ADest, Unit);
     ASource += 3;
     Four = LoadFour(ASource);
     Unit = UnitOfTriple(Four);
@@ -187,25 +213,84 @@ std::uint32_t UnitOfTriple(std::uint32_t AFour) noexcept {
   return true;
 }
 
-// Any sequence, broken ones too.
-const unsigned char* DecodeOne(
-    const unsigned char* ASource, const unsigned char* AEnd, char16_t*& ADest, TMalformed AMalformed) noexcept {
-  const TSequence Sequence = ReadSequence(ASource, static_cast<std::size_t>(AEnd - ASource));
-  if (Sequence.Valid && Sequence.CodePoint < 0x10000) {
-    *ADest++ = static_cast<char16_t>(Sequence.CodePoint);
-  } else if (Sequence.Valid) {
-    *ADest++ = static_cast<char16_t>(0xD7C0U + (Sequence.CodePoint >> 10U));
-    *ADest++ = static_cast<char16_t>(0xDC00U | (Sequence.CodePoint & 0x3FFU));
-  } else if (AMalformed == TMalformed::Replace) {
-    *ADest++ = cReplacement;
-  } else {
-    for (std::uint32_t k = 0; k < Sequence.Length; ++k) *ADest++ = static_cast<char16_t>(0xDC00U | ASource[k]);
-  }
-  return ASource + Sequence.Length;
+template <class TDest>
+[[gnu::always_inline]] inline bool DecodeQuads(
+    const unsigned char*& ASource, const unsigned char* AStop, TDest& ADest) noexcept {
+  std::uint32_t Four = LoadFour(ASource), CodePoint = CodePointOfQuad(Four);
+  if (!IsQuad(Four, CodePoint)) return false;
+  do {
+    PutSurrogates(ADest, CodePoint);
+    ASource += 4;
+    Four = LoadFour(ASource);
+    CodePoint = CodePointOfQuad(Four);
+  } while (ASource < AStop && IsQuad(Four, CodePoint));
+  return true;
 }
 
-// The run of characters of two or of three bytes at the front, none of which begins behind AStop. False where there is
-// none.
+// What no run takes: a broken sequence, or one of two or three bytes at the very end. Inline, as the runs are, so that
+// the caller's places stay in registers.
+template <class TDest>
+[[gnu::always_inline]] inline void DecodeOne(
+    const unsigned char*& ASource, const unsigned char* AEnd, TDest& ADest, TMalformed AMalformed) noexcept {
+  const TSequence Sequence = ReadSequence(ASource, static_cast<std::size_t>(AEnd - ASource));
+  if (Sequence.Valid || AMalformed == TMalformed::Replace) {
+    Put(ADest, Sequence.Valid ? Sequence.CodePoint : cReplacement);
+  } else {
+    for (std::uint32_t k = 0; k < Sequence.Length; ++k) Put(ADest, 0xDC00U | ASource[k]);
+  }
+  ASource += Sequence.Length;
+}
+
+// Step by step: returns the place behind what it wrote.
+template <class TDest>
+[[gnu::always_inline]] inline TDest DecodeRest(
+    const unsigned char* ASource, const unsigned char* AEnd, TDest ADest, TMalformed AMalformed) noexcept {
+  while (ASource < AEnd) {
+    if (*ASource < 0x80) {
+      Put(ADest, *ASource++);
+      continue;
+    }
+    const std::uint32_t Four = AEnd - ASource >= 4 ? LoadFour(ASource) : 0;
+    const std::uint32_t Unit = UnitOfTriple(Four), CodePoint = CodePointOfQuad(Four);
+    if (IsPair(Four)) Put(ADest, UnitOfPair(Four)), ASource += 2;
+    else if (IsTriple(Four, Unit)) Put(ADest, Unit), ASource += 3;
+    else if (IsQuad(Four, CodePoint)) PutSurrogates(ADest, CodePoint), ASource += 4;
+    else DecodeOne(ASource, AEnd, ADest, AMalformed);
+  }
+  return ADest;
+}
+
+// Goes by eight bytes as long as there are that many, and step by step behind. Returns the units written or counted.
+template <class TDest>
+[[gnu::always_inline]] inline std::size_t DecodeAll(
+    const char* ASource, std::size_t ALength, TDest ADest, TMalformed AMalformed) noexcept {
+  const auto* Source = reinterpret_cast<const unsigned char*>(ASource);
+  const auto* const End = Source + ALength;
+  const auto* const Stop = ALength < 8 ? Source : End - 7;
+  TDest Dest = ADest;
+  while (Source < Stop) {
+    if (*Source < 0x80) {
+      const auto* const Text = reinterpret_cast<const char*>(Source);
+      if (StartsAscii(Text)) {
+        const std::size_t Run = WidenAscii(Text, static_cast<std::size_t>(End - Source), Dest);
+        Source += Run;
+        Dest += Run;
+      } else {
+        do Put(Dest, *Source++);
+        while (*Source < 0x80);
+      }
+      if (Source >= Stop) break;
+    }
+    if (DecodePairs(Source, Stop, Dest) || DecodeTriples(Source, Stop, Dest) || DecodeQuads(Source, Stop, Dest)) {
+      if (*Source < 0x80) Put(Dest, *Source++);  // the blank between two words
+    } else {
+      DecodeOne(Source, End, Dest, AMalformed);
+    }
+  }
+  return static_cast<std::size_t>(DecodeRest(Source, End, Dest, AMalformed) - ADest);
+}
+
+// The run of characters of one length at the front, none of which begins behind AStop. False where there is none.
 
 [[gnu::always_inline]] inline bool EncodeDoubles(
     const char16_t*& ASource, const char16_t* AStop, char*& ADest) noexcept {
@@ -229,6 +314,22 @@ const unsigned char* DecodeOne(
   return true;
 }
 
+[[gnu::always_inline]] inline bool EncodeQuads(const char16_t*& ASource, const char16_t* AStop, char*& ADest) noexcept {
+  if (!IsHighSurrogate(ASource[0]) || !IsLowSurrogate(ASource[1])) return false;
+  do {
+    ADest = PutQuad(ADest, ASource[0], ASource[1]);
+    ASource += 2;
+  } while (IsHighSurrogate(ASource[0]) && IsLowSurrogate(ASource[1]) && ASource < AStop);
+  return true;
+}
+
+// A surrogate without its partner.
+char* EncodeLone(std::uint32_t c, char* ADest, TMalformed AMalformed) noexcept {
+  if (AMalformed == TMalformed::Replace || c < 0xDC80 || c > 0xDCFF) return PutTriple(ADest, cReplacement);
+  *ADest = static_cast<char>(c);
+  return ADest + 1;
+}
+
 // One character beyond ASCII; ASource moves along. Returns the place behind its bytes.
 [[gnu::always_inline]] inline char* EncodeOne(
     const char16_t*& ASource, const char16_t* AEnd, char* ADest, TMalformed AMalformed) noexcept {
@@ -236,13 +337,12 @@ const unsigned char* DecodeOne(
   if (c < 0x800) return PutDouble(ADest, c);
   if (!IsSurrogate(c)) return PutTriple(ADest, c);
   if (IsHighSurrogate(c) && ASource < AEnd && IsLowSurrogate(*ASource)) return PutQuad(ADest, c, *ASource++);
-  if (AMalformed == TMalformed::Replace || c < 0xDC80 || c > 0xDCFF) return PutTriple(ADest, cReplacement);
-  *ADest = static_cast<char>(c);
-  return ADest + 1;
+  return EncodeLone(c, ADest, AMalformed);
 }
 
 // Step by step: returns the place behind what it wrote.
-ZQ_HOT char* EncodeRest(const char16_t* ASource, const char16_t* AEnd, char* ADest, TMalformed AMalformed) noexcept {
+ZQ_HOT [[gnu::aligned(64)]] char* EncodeRest(
+    const char16_t* ASource, const char16_t* AEnd, char* ADest, TMalformed AMalformed) noexcept {
   while (ASource < AEnd) {
     if (*ASource < 0x80) *ADest++ = static_cast<char>(*ASource++);
     else ADest = EncodeOne(ASource, AEnd, ADest, AMalformed);
@@ -250,8 +350,8 @@ ZQ_HOT char* EncodeRest(const char16_t* ASource, const char16_t* AEnd, char* ADe
   return ADest;
 }
 
-// At least eight units, at a time as long as there are that many, and step by step behind. This one and Decode begin on
-// a cache line: with some compilers that is a quarter of their speed.
+// At least eight units, at a time as long as there are that many, and step by step behind. This one, EncodeRest and the
+// two that decode begin on a cache line: with some compilers that is a quarter of their speed.
 [[gnu::noinline, gnu::aligned(64)]] char* EncodeMixed(
     const char16_t* ASource, const char16_t* AEnd, char* ADest, TMalformed AMalformed) noexcept {
   const char16_t* const Stop = AEnd - 7;
@@ -267,10 +367,11 @@ ZQ_HOT char* EncodeRest(const char16_t* ASource, const char16_t* AEnd, char* ADe
       }
       if (ASource >= Stop) break;
     }
-    if (EncodeDoubles(ASource, Stop, ADest)) {
+    if (EncodeDoubles(ASource, Stop, ADest) || EncodeTriples(ASource, Stop, ADest) ||
+        EncodeQuads(ASource, Stop, ADest)) {
       if (*ASource < 0x80) *ADest++ = static_cast<char>(*ASource++);  // the blank between two words
-    } else if (!EncodeTriples(ASource, Stop, ADest)) {
-      ADest = EncodeOne(ASource, AEnd, ADest, AMalformed);
+    } else {
+      ADest = EncodeLone(*ASource++, ADest, AMalformed);
     }
   }
   return EncodeRest(ASource, AEnd, ADest, AMalformed);
@@ -292,57 +393,13 @@ std::size_t AsciiRun(const char16_t* ASource, std::size_t ALength) noexcept {
   return i;
 }
 
-// Goes by eight bytes as long as there are that many, and step by step behind.
-
 [[gnu::aligned(64)]] std::size_t Decode(
     const char* ASource, std::size_t ALength, char16_t* ADest, TMalformed AMalformed) noexcept {
-  const auto* Source = reinterpret_cast<const unsigned char*>(ASource);
-  const auto* const End = Source + ALength;
-  const auto* const Stop = ALength < 8 ? Source : End - 7;
-  char16_t* Dest = ADest;
-  while (Source < Stop) {
-    if (*Source < 0x80) {
-      const auto* const Text = reinterpret_cast<const char*>(Source);
-      if (StartsAscii(Text)) {
-        const std::size_t Run = WidenAscii(Text, static_cast<std::size_t>(End - Source), Dest);
-        Source += Run;
-        Dest += Run;
-      } else {
-        do *Dest++ = *Source++;
-        while (*Source < 0x80);
-      }
-      if (Source >= Stop) break;
-    }
-    if (DecodePairs(Source, Stop, Dest)) {
-      if (*Source < 0x80) *Dest++ = *Source++;  // the blank between two words
-    } else if (!DecodeTriples(Source, Stop, Dest)) {
-      Source = DecodeOne(Source, End, Dest, AMalformed);
-    }
-  }
-  while (Source < End) {
-    const std::uint32_t Four = End - Source >= 4 ? LoadFour(Source) : 0;
-    const std::uint32_t Unit = UnitOfTriple(Four);
-    if (*Source < 0x80) *Dest++ = *Source++;
-    else if (IsPair(Four)) *Dest++ = UnitOfPair(Four), Source += 2;
-    else if (IsTriple(Four, Unit)) *Dest++ = static_cast<char16_t>(Unit), Source += 3;
-    else Source = DecodeOne(Source, End, Dest, AMalformed);
-  }
-  return static_cast<std::size_t>(Dest - ADest);
+  return DecodeAll(ASource, ALength, ADest, AMalformed);
 }
 
-std::size_t DecodedLength(const char* ASource, std::size_t ALength) noexcept {
-  std::size_t Result = 0;
-  for (std::size_t i = 0; i < ALength;) {
-    const std::size_t Run = AsciiRun(ASource + i, ALength - i);
-    Result += Run;
-    i += Run;
-    while (i < ALength && static_cast<unsigned char>(ASource[i]) >= 0x80) {
-      const TSequence Sequence = ReadSequence(reinterpret_cast<const unsigned char*>(ASource) + i, ALength - i);
-      Result += Sequence.Valid && Sequence.CodePoint > 0xFFFF ? 2 : 1;
-      i += Sequence.Length;
-    }
-  }
-  return Result;
+[[gnu::aligned(64)]] std::size_t DecodedLength(const char* ASource, std::size_t ALength) noexcept {
+  return DecodeAll(ASource, ALength, std::size_t{0}, TMalformed::Replace);
 }
 
 ZQ_HOT std::size_t Encode(const char16_t* ASource, std::size_t ALength, char* ADest, TMalformed AMalformed) noexcept {
