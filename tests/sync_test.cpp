@@ -1,9 +1,11 @@
 #include <gtest/gtest.h>
+#include <sys/resource.h>
 
 #include <array>
 #include <atomic>
 #include <chrono>
 #include <functional>
+#include <iostream>
 #include <thread>
 #include <utility>
 #include <vector>
@@ -180,6 +182,87 @@ TEST(LockMonitor, KeepsThreadsApartAndNests) {
   });
   TMonitor::Exit(&Object);
   EXPECT_EQ(std::pair(Guarded, Interlocked), std::pair(2000, 2000));
+}
+
+// ---- Waits for a lock ----------------------------------------------------------------------------------------------
+
+TEST(LockWaiting, WhoWaitsSleepsUntilHeIsWoken) {
+  for (const int Waiters : {1, 2}) {
+    TCriticalSection Lock;
+    Lock.Enter();
+    std::atomic<long> WakeUps = 0;
+    std::jthread Holder([&] {
+      OnThreads(Waiters, [&](int) {
+        Lock.Enter();
+        Lock.Leave();
+        rusage Usage{};
+        ::getrusage(RUSAGE_THREAD, &Usage);
+        WakeUps += Usage.ru_nvcsw;
+        for (const timeval& Busy : {Usage.ru_utime, Usage.ru_stime})
+          EXPECT_LT(Busy.tv_sec * 1'000'000 + Busy.tv_usec, 10'000) << "of 1 s";
+      });
+    });
+    Sleep(1000);
+    Lock.Leave();
+    Holder.join();
+    EXPECT_LT(WakeUps, 20);
+  }
+}
+
+TEST(LockWaiting, ATryEndsWhenItsTimeIsOver) {
+  TCriticalSection Lock;
+  Lock.Enter();
+  OnThreads(2, [&](int) {
+    for (const Cardinal Time : {1U, 30U, 1030U}) {
+      const auto Start = std::chrono::steady_clock::now();
+      EXPECT_FALSE(Lock.TryEnterFor(Time));
+      const auto Waited = std::chrono::steady_clock::now() - Start;
+      EXPECT_GE(Waited, std::chrono::milliseconds(Time));
+      EXPECT_LT(Waited, std::chrono::milliseconds(Time + 500));
+    }
+    EXPECT_FALSE(Lock.TryEnterFor(0));
+  });
+  Lock.Leave();
+  EXPECT_TRUE(Lock.TryEnterFor(0));
+  Lock.Leave();
+}
+
+// The owner keeps each lock about as long as the next one spins for it: that one lies down while the lock becomes free.
+TEST(LockWaiting, NoWakeUpIsMissedAndWhoTakesItLastMayFreeTheLock) {
+  struct TShared {
+    TCriticalSection Lock;
+    int Users;
+  };
+  using TTake = void (*)(TCriticalSection&);
+  constexpr TTake cTakes[] = {[](auto& Lock) { Lock.Enter(); },
+      [](auto& Lock) { EXPECT_TRUE(Lock.TryEnterFor(cLong)); },
+      [](auto& Lock) {
+        while (!Lock.TryEnterFor(1)) {
+        }
+      }};
+  const auto Start = std::chrono::steady_clock::now();
+  std::size_t Rounds = 0;
+  while (std::chrono::steady_clock::now() - Start < std::chrono::seconds(2)) {
+    for (const int Threads : {2, 4}) {
+      std::vector<TShared*> Locks(500);
+      for (TShared*& Lock : Locks) Lock = new TShared{{}, Threads};
+      OnThreads(Threads, [&](int AThread) {
+        for (std::size_t i = 0; i < Locks.size(); ++i) {
+          TShared* const Shared = Locks[i];
+          cTakes[(i + static_cast<std::size_t>(AThread)) % 3](Shared->Lock);
+          const auto Until = std::chrono::steady_clock::now() + std::chrono::microseconds(i % 120);
+          while (std::chrono::steady_clock::now() < Until) {
+          }
+          const bool Last = --Shared->Users == 0;
+          Shared->Lock.Leave();
+          if (Last) delete Shared;
+        }
+      });
+      Rounds += Locks.size();
+    }
+  }
+  EXPECT_LT(std::chrono::steady_clock::now() - Start, std::chrono::milliseconds(cLong)) << "a thread slept on";
+  std::cout << Rounds << " locks\n";
 }
 
 }  // namespace

@@ -1,6 +1,7 @@
 #include "runtime/sync/critical_section.h"
 
 #include <linux/futex.h>
+#include <linux/membarrier.h>
 #include <pthread.h>
 #include <sys/single_threaded.h>
 #include <sys/syscall.h>
@@ -17,59 +18,81 @@ namespace zq {
 
 namespace {
 
-constexpr std::int64_t cSlice = 1'000'000;  // ns; see Wait
-constexpr std::int64_t cLongestSlice = 16 * cSlice;
-constexpr std::uint32_t cFewSleepers = 3;
 constexpr int cSpins = 2000;  // pauses in all, some 20 to 90 us
 constexpr int cLongestPause = 512;
 
 // Initial-exec: one load relative to the thread pointer, where a shared library would otherwise make a call.
 __attribute__((tls_model("initial-exec"))) constinit thread_local std::uint32_t ThreadId = 0;
 
-std::uint32_t LearnThreadId() noexcept {
+timespec After(Cardinal AMilliseconds) noexcept {
+  timespec Result{};
+  ::clock_gettime(CLOCK_MONOTONIC, &Result);
+  const std::int64_t Nanoseconds = Result.tv_nsec + std::int64_t{AMilliseconds % 1000} * 1'000'000;
+  Result.tv_sec += static_cast<time_t>(AMilliseconds / 1000 + Nanoseconds / 1'000'000'000);
+  Result.tv_nsec = static_cast<long>(Nanoseconds % 1'000'000'000);
+  return Result;
+}
+
+// Sleeps unless AWord isn't AValue any more. False when the time was over.
+bool WaitOn(void* AWord, std::uint32_t AValue, const timespec* ADeadline) noexcept {
+  return ::syscall(SYS_futex, AWord, FUTEX_WAIT_BITSET_PRIVATE, AValue, ADeadline, nullptr, FUTEX_BITSET_MATCH_ANY) ==
+             0 ||
+         errno != ETIMEDOUT;
+}
+
+// AWord is an address only: a lock that lies there by now takes the wake-up for a reason to look again.
+void WakeOneOn(void* AWord) noexcept { ::syscall(SYS_futex, AWord, FUTEX_WAKE_PRIVATE, 1, nullptr, nullptr, 0); }
+
+}  // namespace
+
+constinit std::atomic<std::uint32_t> TCriticalSection::ParkedCounts[cParkedCounts] = {};
+
+// Before the first lock of any thread, and anew in a forked child, whose other threads are gone. Where the system
+// can't put a barrier into other threads, every Leave that finds nobody asleep makes its own.
+void TCriticalSection::PrepareCounts() noexcept {
+  const bool Barriers = ::syscall(SYS_membarrier, MEMBARRIER_CMD_REGISTER_PRIVATE_EXPEDITED, 0, 0) == 0;
+  for (TCount& Count : ParkedCounts) Count.store(Barriers ? 0 : cFenced, std::memory_order_relaxed);
+}
+
+std::uint32_t TCriticalSection::LearnThreadId() noexcept {
   static std::once_flag Once;
-  std::call_once(Once, [] { pthread_atfork(nullptr, nullptr, [] { ThreadId = 0; }); });
+  std::call_once(Once, [] {
+    PrepareCounts();
+    pthread_atfork(nullptr, nullptr, [] {
+      ThreadId = 0;
+      PrepareCounts();
+    });
+  });
   ThreadId = static_cast<std::uint32_t>(::syscall(SYS_gettid));
   return ThreadId;
 }
 
-std::uint32_t MyThreadId() noexcept {
+ZQ_HOT Cardinal GetCurrentThreadId() noexcept {
   const std::uint32_t Known = ThreadId;
-  return Known != 0 ? Known : LearnThreadId();
+  return Known != 0 ? Known : TCriticalSection::LearnThreadId();
 }
-
-std::int64_t Nanoseconds() noexcept {
-  timespec Time{};
-  ::clock_gettime(CLOCK_MONOTONIC, &Time);
-  return std::int64_t{Time.tv_sec} * 1'000'000'000 + Time.tv_nsec;
-}
-
-// False when the time was over.
-bool Futex(std::atomic<std::uint32_t>& AWord, int AOperation, std::uint32_t AValue, const timespec* ATimeout) noexcept {
-  return ::syscall(SYS_futex, &AWord, AOperation | FUTEX_PRIVATE_FLAG, AValue, ATimeout, nullptr, 0) >= 0 ||
-         errno != ETIMEDOUT;
-}
-
-}  // namespace
-
-ZQ_HOT Cardinal GetCurrentThreadId() noexcept { return MyThreadId(); }
 
 Cardinal GetCurrentProcessId() noexcept { return static_cast<Cardinal>(::getpid()); }
 
 // As long as the process has one thread, which the system's library knows, a plain store does what else takes an atomic
-// exchange.
+// exchange. A wake-up that is under way stays so: it is another thread's.
 ZQ_HOT bool TCriticalSection::Take(std::uint32_t AThread) noexcept {
-  std::uint32_t Free = 0;
-  if (FOwner.load(std::memory_order_relaxed) != 0) return false;
-  if (!__libc_single_threaded)
-    return FOwner.compare_exchange_strong(Free, AThread, std::memory_order_acquire, std::memory_order_relaxed);
-  FOwner.store(AThread, std::memory_order_relaxed);
-  return true;
+  std::uint32_t Free = FOwner.load(std::memory_order_relaxed);
+  while (OwnerIn(Free) == 0) {
+    const std::uint32_t Taken = AThread | Free;
+    if (!__libc_single_threaded) {
+      if (FOwner.compare_exchange_weak(Free, Taken, std::memory_order_acquire, std::memory_order_relaxed)) return true;
+    } else {
+      FOwner.store(Taken, std::memory_order_relaxed);
+      return true;
+    }
+  }
+  return false;
 }
 
 ZQ_HOT bool TCriticalSection::TryEnter() noexcept {
-  const std::uint32_t Me = MyThreadId();
-  if (FOwner.load(std::memory_order_relaxed) != Me && !Take(Me)) return false;
+  const std::uint32_t Me = GetCurrentThreadId();
+  if (OwnerIn(FOwner.load(std::memory_order_relaxed)) != Me && !Take(Me)) return false;
   ++FDepth;
   return true;
 }
@@ -85,37 +108,48 @@ bool TCriticalSection::Spin() noexcept {
   return false;
 }
 
-// Leave reads FSleepers and stores without a full barrier about them, which keeps leaving cheap: a wake-up can be
-// missed when a thread lies down at that very moment. Sleeping in slices bounds what that costs. Where more
-// than a few sleep, the slices grow, and who wakes by itself looks but once: they must not take the processors from the
-// one that they wait for.
+// Leave stores and then reads the count without a barrier between them, which keeps leaving cheap. The barrier that a
+// sleeper puts into every thread between its counting and its look at FOwner stands in for that: whoever misses the
+// count has freed the lock in the sleeper's sight.
 [[gnu::noinline]] bool TCriticalSection::Wait(Cardinal AMilliseconds) noexcept {
-  const std::int64_t Deadline = AMilliseconds == cForEver ? 0 : Nanoseconds() + std::int64_t{AMilliseconds} * 1'000'000;
+  const timespec Deadline = AMilliseconds == cForEver ? timespec{} : After(AMilliseconds);
   if (Spin()) return true;
   FSleepers.fetch_add(1);
-  bool Taken = false;
-  for (std::int64_t Slice = cSlice, Left = Slice; !Taken && Left > 0;) {
-    Left = Deadline == 0 ? Slice : std::min(Slice, Deadline - Nanoseconds());
-    const std::uint32_t Owner = FOwner.load(std::memory_order_relaxed);
-    bool Woken = true;
-    if (Owner != 0 && Left > 0) {
-      const timespec Timeout{0, static_cast<long>(Left)};
-      const bool Few = FSleepers.load(std::memory_order_relaxed) <= cFewSleepers;
-      Woken = Futex(FOwner, FUTEX_WAIT, Owner, &Timeout) || Few;
-      FWaking.store(false, std::memory_order_relaxed);
-      if (!Woken) Slice = std::min(2 * Slice, cLongestSlice);
-    }
-    Taken = Woken ? Spin() : TryEnter();
-  }
+  ParkedAt(this).fetch_add(1);
+  ::syscall(SYS_membarrier, MEMBARRIER_CMD_PRIVATE_EXPEDITED, 0, 0);
+  const bool Taken = Sleep(AMilliseconds == cForEver ? nullptr : &Deadline);
+  if (Taken) FOwner.fetch_and(~cWaking, std::memory_order_relaxed);  // who leaves wakes the next one
+  ParkedAt(this).fetch_sub(1);
   FSleepers.fetch_sub(1);
   return Taken;
 }
 
+// While cWaking is set nobody wakes a second thread. So who isn't to come back takes it away, and who goes to sleep
+// takes it away before its last look; only more wake-ups than needed can come of that.
+bool TCriticalSection::Sleep(const timespec* ADeadline) noexcept {
+  for (bool InTime = true;;) {
+    const std::uint32_t Owner = OwnerIn(FOwner.fetch_and(~cWaking));
+    if (Owner == 0) {
+      if (TryEnter()) return true;
+    } else if (!InTime) {
+      return false;
+    } else {
+      InTime = WaitOn(&FOwner, Owner, ADeadline);
+      if (InTime && Spin()) return true;
+    }
+  }
+}
+
+// By exchange: a thread that has taken cWaking away and lies down again must not be taken for one that still looks.
 void TCriticalSection::LeaveAndWake() noexcept {
-  const bool Wakes = !FWaking.load(std::memory_order_relaxed);
-  if (Wakes) FWaking.store(true, std::memory_order_relaxed);
-  FOwner.store(0, std::memory_order_release);
-  if (Wakes) Futex(FOwner, FUTEX_WAKE, 1, nullptr);
+  if ((FOwner.exchange(cWaking, std::memory_order_release) & cWaking) == 0) WakeOneOn(&FOwner);
+}
+
+// For who found nobody asleep, or nobody in time.
+void TCriticalSection::WakeParked(void* ALock) noexcept {
+  TCount& Parked = ParkedAt(ALock);
+  if ((Parked.load(std::memory_order_relaxed) & cFenced) != 0 && Parked.fetch_add(0) == cFenced) return;
+  WakeOneOn(ALock);
 }
 
 }  // namespace zq

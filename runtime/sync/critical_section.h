@@ -1,10 +1,13 @@
 #pragma once
 
 #include <atomic>
+#include <cstddef>
 #include <cstdint>
 
 #include "runtime/core/api.h"
 #include "runtime/core/types.h"
+
+struct timespec;
 
 namespace zq {
 
@@ -15,8 +18,8 @@ namespace zq {
 /// Lock that its owner may take again, and must then leave as often.
 ///
 /// Taking a free lock is one atomic exchange, leaving it one store: there is no system call unless threads meet.
-/// Then a thread spins for a while, goes to sleep, and spins again once it is woken. Not fair: a thread that comes by
-/// may take the lock before one that waits for it.
+/// Then a thread spins for a while and sleeps until somebody wakes it. Not fair: a thread that comes by may take the
+/// lock before one that waits for it.
 class ZQ_API TCriticalSection {
  public:
   TCriticalSection() noexcept = default;
@@ -38,25 +41,49 @@ class ZQ_API TCriticalSection {
   ZQ_HOT void Leave() noexcept {
     // Nothing of the lock is touched once it is free: whoever takes it next may destroy it.
     if (--FDepth != 0) return;
-    if (FSleepers.load(std::memory_order_relaxed) == 0) FOwner.store(0, std::memory_order_release);
-    else LeaveAndWake();
+    if (FSleepers.load(std::memory_order_relaxed) != 0) [[unlikely]] {
+      LeaveAndWake();
+      return;
+    }
+    const TCount& Parked = ParkedAt(this);
+    FOwner.store(0, std::memory_order_release);
+    std::atomic_signal_fence(std::memory_order_seq_cst);  // for the processor's order pays who goes to sleep
+    if (Parked.load(std::memory_order_relaxed) != 0) [[unlikely]]
+      WakeParked(this);
   }
   void Acquire() noexcept { Enter(); }
   void Release() noexcept { Leave(); }
-  [[nodiscard]] bool IsOwned() const noexcept { return FOwner.load(std::memory_order_relaxed) == GetCurrentThreadId(); }
+  [[nodiscard]] bool IsOwned() const noexcept {
+    return OwnerIn(FOwner.load(std::memory_order_relaxed)) == GetCurrentThreadId();
+  }
 
  private:
-  static constexpr Cardinal cForEver = 0xFFFFFFFF;
+  using TCount = std::atomic<std::uint32_t>;
+  friend Cardinal GetCurrentThreadId() noexcept;
 
+  static constexpr Cardinal cForEver = 0xFFFFFFFF;
+  static constexpr std::uint32_t cWaking = 1U << 31;  // in FOwner: a sleeper has been woken and looks before it sleeps
+  static constexpr std::uint32_t cFenced = 1U << 31;  // in ParkedCounts: a plain load of the count isn't enough
+  static constexpr std::size_t cParkedCounts = 1024;
+
+  static std::uint32_t OwnerIn(std::uint32_t AOwner) noexcept { return AOwner & ~cWaking; }
+  static TCount& ParkedAt(const void* ALock) noexcept {
+    return ParkedCounts[(reinterpret_cast<std::uintptr_t>(ALock) >> 4) % cParkedCounts];
+  }
+  static std::uint32_t LearnThreadId() noexcept;
+  static void PrepareCounts() noexcept;
+  static void WakeParked(void* ALock) noexcept;
   bool Take(std::uint32_t AThread) noexcept;
   bool Spin() noexcept;
   bool Wait(Cardinal AMilliseconds) noexcept;
+  bool Sleep(const timespec* ADeadline) noexcept;
   void LeaveAndWake() noexcept;
 
-  std::atomic<std::uint32_t> FOwner = 0;  // thread id, and the word that sleepers wait on; 0 when free
-  std::atomic<std::uint32_t> FSleepers = 0;
-  std::atomic<bool> FWaking = false;  // a sleeper has been woken and hasn't run yet
-  std::uint32_t FDepth = 0;           // the owner's alone
+  static TCount ParkedCounts[cParkedCounts];  // sleepers on all locks of one hash; outlives every lock
+
+  TCount FOwner = 0;         // thread id, and the word that sleepers wait on; 0 when free; beside it cWaking
+  TCount FSleepers = 0;      // threads in Sleep
+  std::uint32_t FDepth = 0;  // the owner's alone
 };
 
 /// Holds ALock, anything with Enter and Leave, for a scope.
