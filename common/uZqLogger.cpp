@@ -13,7 +13,7 @@
 #include "runtime/core/start_count.h"
 #include "runtime/io/string_list.h"
 #include "runtime/platform/version_service.h"
-#include "runtime/sync/thread.h"
+#include "runtime/sync/event.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/format.h"
 #include "runtime/text/local_time.h"
@@ -24,8 +24,8 @@ namespace zq {
 
 namespace {
 
-constexpr Cardinal cLockTries = 5001;  // one millisecond each
-constexpr Integer cMostWithin = 200;   // messages that appenders log into their own logger, out of one
+constexpr Cardinal cLockWait = 5001;  // milliseconds
+constexpr Integer cMostWithin = 200;  // messages that appenders log into their own logger, out of one
 constexpr char16_t cAppenderListRequest[] = u".AppenderList.Remove";
 constexpr char16_t cLoggerListRequest[] = u".LoggerList.Remove";
 
@@ -37,8 +37,7 @@ std::atomic<TZqLogBaseClassList*> AppenderClasses = nullptr;
 std::vector<TZqLogBase*>* Appenders = nullptr;  // every appender alive
 constinit std::mutex AppendersLock;
 constinit TCriticalSection EndLock;  // held while an appender or a list ends: linked components must not at one time
-using TWalks = std::vector<std::shared_ptr<const void>>;
-TWalks* Walks = nullptr;  // under EndLock: entries of the ending appender that walks of lists may share still
+const std::shared_ptr<const void>* EndToken = nullptr;  // under EndLock: for the entries of the appender that ends
 
 // Holds a log lock for a scope, for a requester that is a name and an operation.
 class TLogLockScope {
@@ -84,7 +83,7 @@ UnicodeString MethodOf(const TObject* AObject, const TText& AMethodName) {
 // ---------------------------------------------------------------------------------------- TZqLogLock
 
 ZQ_HOT bool TZqLogLock::Take(const UnicodeString& AOwner, const char16_t* AOperation, bool ARaise) {
-  if (FLock.TryEnterFor(cLockTries)) return true;
+  if (FLock.TryEnterFor(cLockWait)) return true;
   if (ARaise)
     throw Exception(u"A lock was requested by %s (ThreadId: %d), however  logger has already been locked by %s!",
         {AOwner + AOperation, GetCurrentThreadId(), LockedBy()});
@@ -159,7 +158,7 @@ void TZqLogAppenderList::BeforeDestruction() {
 void TZqLogAppenderList::Add(const IntfRef<IZqLogAppender>& AAppender) {
   Assert(static_cast<bool>(AAppender));
   const TLogLockScope Scope(FLock, FLogger->FFullName, cAppenderListRequest);
-  const auto Added = std::make_shared<const TEntry>(TEntry{AAppender, AAppender->Component()});
+  const auto Added = std::make_shared<const TEntry>(TEntry{.Appender = AAppender, .Component = AAppender->Component()});
   {
     const TLockScope Guard(FItemsLock);
     if (std::any_of(FList.begin(), FList.end(), [&](const TItem& AItem) { return AItem->IsSame(*Added); })) return;
@@ -218,7 +217,7 @@ void TZqLogAppenderList::Remove(const IntfRef<IZqLogAppender>& AAppender) {
   Assert(static_cast<bool>(AAppender));
   TItems Dropped;
   const TLogLockScope Scope(FLock, FLogger->FFullName, cAppenderListRequest);
-  const TEntry Removed{AAppender, AAppender->Component()};
+  const TEntry Removed{.Appender = AAppender, .Component = AAppender->Component()};
   Dropped = TakeItems([&](const TEntry& AEntry) { return AEntry.IsSame(Removed); });
   if (Removed.Component != nullptr) Removed.Component->RemoveFreeNotification(this);
 }
@@ -240,12 +239,11 @@ IntfRef<IZqLogAppender> TZqLogAppenderList::GetAppender(Integer AIndex) const {
   return Item->Appender;
 }
 
-// The entry goes to the appender that ends, which waits for the walks that share it; this thread's own walk is none to
-// wait for.
+// The appender that ends waits for the walks that share its entry; this thread's own walk is none to wait for.
 void TZqLogAppenderList::LetGoOf(const TComponent* AComponent) {
-  TItems Taken = TakeItems([&](const TEntry& AEntry) { return AEntry.Component == AComponent; });
-  if (EndLock.IsOwned() && Walks != nullptr && !FLock.IsOwned())
-    std::move(Taken.begin(), Taken.end(), std::back_inserter(*Walks));
+  const TItems Taken = TakeItems([&](const TEntry& AEntry) { return AEntry.Component == AComponent; });
+  if (EndLock.IsOwned() && EndToken != nullptr && !FLock.IsOwned())
+    for (const TItem& Item : Taken) Item->Token = *EndToken;
 }
 
 void TZqLogAppenderList::Notification(TComponent* AComponent, TOperation AOperation) {
@@ -640,17 +638,17 @@ void TZqLogBase::LeaveLists() {
   if (RefCount() == 0) return;
   FEndedByCount = FEndedByCount || AutoDestroy();
   SetAutoDestroy(false);
-  TWalks Left;
+  const auto Over = std::make_shared<TSimpleEvent>();
   {
     const TLockScope Ending(EndLock);
-    const struct TCollecting {
-      ~TCollecting() { Walks = Outer; }
-      TWalks* Outer;
-    } Collecting{std::exchange(Walks, &Left)};
+    const std::shared_ptr<const void> Token(nullptr, [Over](auto) { Over->SetEvent(); });
+    const struct TGiving {
+      ~TGiving() { EndToken = Outer; }
+      const std::shared_ptr<const void>* Outer;
+    } Giving{std::exchange(EndToken, &Token)};
     TellWatchers();
   }
-  const auto IsOver = [](const auto& AWalk) { return AWalk.use_count() == 1; };
-  for (Cardinal i = 0; i < cLockTries && !std::all_of(Left.begin(), Left.end(), IsOver); ++i) Sleep(1);
+  Over->WaitFor(cLockWait);
 }
 
 std::vector<TZqLogBase*> LiveAppenders() {

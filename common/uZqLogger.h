@@ -464,6 +464,7 @@ class ZQ_API TZqLogAppenderList : public TComponent {
   friend class TZqLogger;
   // A step of a walk shares the entry instead of counting the appender once more, which spares two calls to it.
   struct TEntry {
+    mutable std::shared_ptr<const void> Token = nullptr;  // of an appender that ends, which waits until it is dropped
     IntfRef<IZqLogAppender> Appender;
     TComponent* Component;  // of the appender, asked for once: that is host code
     [[nodiscard]] bool IsSame(const TEntry& AOther) const noexcept {
