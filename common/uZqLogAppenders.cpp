@@ -72,7 +72,7 @@ void TZqBaseAppender::SetLayout(TZqLogBaseClass ALayout) {
   SetLayout(Made.As<IZqLogLayout>());
 }
 
-void TZqBaseAppender::SetLayout(const ShortString& ALayout) { SetLayout(RegisteredLayouts()->GetClass(ALayout)); }
+void TZqBaseAppender::SetLayout(const TText& ALayout) { SetLayout(RegisteredLayouts()->GetClass(ALayout)); }
 
 // ---------------------------------------------------------------------------------------- TZqTextFile
 

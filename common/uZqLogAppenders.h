@@ -32,7 +32,7 @@ class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZq
   /// An empty reference takes the layout away.
   void SetLayout(const IntfRef<IZqLogLayout>& ALayout) override;
   void SetLayout(TZqLogBaseClass ALayout) override;
-  void SetLayout(const ShortString& ALayout) override;
+  void SetLayout(const TText& ALayout) override;
 
   /// Several operations as one; other threads' messages wait meanwhile. May be nested.
   void Lock() const noexcept { FLock.Enter(); }

@@ -175,7 +175,7 @@ IntfRef<IZqLogAppender> TZqLogAppenderList::Add(TZqLogBaseClass AAppender) {
   return Result;
 }
 
-IntfRef<IZqLogAppender> TZqLogAppenderList::Add(const ShortString& AAppender) {
+IntfRef<IZqLogAppender> TZqLogAppenderList::Add(const TText& AAppender) {
   return Add(RegisteredAppenders()->GetClass(AAppender));
 }
 
@@ -185,7 +185,7 @@ IntfRef<IZqLogAppender> TZqLogAppenderList::Add(TZqLogBaseClass AAppender, TZqLo
   return Result;
 }
 
-IntfRef<IZqLogAppender> TZqLogAppenderList::Add(const ShortString& AAppender, const ShortString& ALayout) {
+IntfRef<IZqLogAppender> TZqLogAppenderList::Add(const TText& AAppender, const TText& ALayout) {
   IntfRef<IZqLogAppender> Result = Add(AAppender);
   Result.As<IZqLogAppenderEx>()->SetLayout(ALayout);
   return Result;
@@ -520,8 +520,8 @@ void TZqLogger::Debug(const TText& AMessage, const Exception& AValue) { Log(llDe
 ZQ_HOT void TZqLogger::Info(const TText& ALogMessage) { DoLog(FFullName, llInfo, ALogMessage, nullptr, liIndentNone); }
 void TZqLogger::Warn(const TText& ALogMessage) { Log(llWarn, ALogMessage); }
 void TZqLogger::Error(const TText& ALogMessage) { Log(llError, ALogMessage); }
-void TZqLogger::Error(const TText& ALogMessage, const Exception& AException) {
-  Log(llError, ALogMessage.ToString() + u"\r\n" + AException.Message());
+void IZqLogger::Error(const TText& ALogMessage, const std::exception& AException) {
+  Log(llError, ALogMessage.ToString() + u"\r\n" + VarRecText(AException));
 }
 void TZqLogger::Fatal(const TText& ALogMessage) { Log(llFatal, ALogMessage); }
 void TZqLogger::Fatal(const TText& ALogMessage, TVarArgs AArgs) { Log(llFatal, Format(ALogMessage.ToString(), AArgs)); }
@@ -660,7 +660,7 @@ void TZqLogBaseClassList::Add(TZqLogBaseClass AClass) {
   if (std::find(FList.begin(), FList.end(), AClass) == FList.end()) FList.push_back(AClass);
 }
 
-TZqLogBaseClass TZqLogBaseClassList::GetClass(const ShortString& AClassName) const {
+TZqLogBaseClass TZqLogBaseClassList::GetClass(const TText& AClassName) const {
   const UnicodeString Name = AClassName.ToString();
   for (const TZqLogBaseClass& Class : FList)
     if (SameText(Class.ClassName(), Name)) return Class;

@@ -162,7 +162,7 @@ struct ZQ_API IZqLogAppenderEx : Extends<IZqLogAppender> {
   virtual void SetLayout(const IntfRef<IZqLogLayout>& ALayout) = 0;
   virtual void SetLayout(TZqLogBaseClass ALayout) = 0;
   /// Raises EListError for a name that is not registered.
-  virtual void SetLayout(const ShortString& ALayout) = 0;
+  virtual void SetLayout(const TText& ALayout) = 0;
 
  protected:
   ~IZqLogAppenderEx() = default;
@@ -356,6 +356,12 @@ struct ZQ_API IZqLogger : Extends<IInterface> {
   void Warn(const TText& ALogMessage, TVarArgs AArgs) { Log(llWarn, ALogMessage, AArgs); }
   void Error(const TText& ALogMessage, TVarArgs AArgs) { Log(llError, ALogMessage, AArgs); }
   void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, TVarArgs AArgs, TZqLogIndent ALogIndent = liIndentNone);
+  /// The exception's message on a line of its own.
+  void Error(const TText& ALogMessage, const std::exception& AException);
+  // Exceptions of the standard library, for the operations that take the library's own.
+  void Debug(const TText& ALogMessage, const std::exception& AValue) { Log(llDebug, ALogMessage, AValue); }
+  void Fatal(const std::exception& AException) { Log(llFatal, VarRecText(AException), AException); }
+  void Fatal(const TText& ALogMessage, const std::exception& AException) { Log(llFatal, ALogMessage, AException); }
   template <detail::TNumber T>
   void Log(TZqLogLevel ALogLevel, const TText& ALogMessage, T AValue, TZqLogIndent ALogIndent = liIndentNone) {
     Log(ALogLevel, ALogMessage, Variant(AValue), ALogIndent);
@@ -441,10 +447,10 @@ class ZQ_API TZqLogAppenderList : public TComponent {
   /// appender, EInvalidOperation for an empty one.
   IntfRef<IZqLogAppender> Add(TZqLogBaseClass AAppender);
   /// Of a registered class, whatever the case of the name; raises EListError if there is none.
-  IntfRef<IZqLogAppender> Add(const ShortString& AAppender);
+  IntfRef<IZqLogAppender> Add(const TText& AAppender);
   /// The same with a layout.
   IntfRef<IZqLogAppender> Add(TZqLogBaseClass AAppender, TZqLogBaseClass ALayout);
-  IntfRef<IZqLogAppender> Add(const ShortString& AAppender, const ShortString& ALayout);
+  IntfRef<IZqLogAppender> Add(const TText& AAppender, const TText& ALayout);
   /// Raises EAssertionFailed for an empty reference.
   void Remove(const IntfRef<IZqLogAppender>& AAppender);
   void Clear();
@@ -544,8 +550,6 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   void Info(const TText& ALogMessage) override;
   void Warn(const TText& ALogMessage) override;
   void Error(const TText& ALogMessage) override;
-  /// The message of AException on a line of its own behind ALogMessage.
-  void Error(const TText& ALogMessage, const Exception& AException);
   void Fatal(const TText& ALogMessage) override;
   void Fatal(const TText& ALogMessage, TVarArgs AArgs) override;
   void Fatal(const Exception& AException) override;
@@ -664,7 +668,7 @@ class ZQ_API TZqLogBaseClassList : public TObject {
   /// Adds a class once.
   void Add(TZqLogBaseClass AClass);
   /// Whatever the case of the name; raises EListError if there is none.
-  [[nodiscard]] TZqLogBaseClass GetClass(const ShortString& AClassName) const;
+  [[nodiscard]] TZqLogBaseClass GetClass(const TText& AClassName) const;
   [[nodiscard]] Integer Count() const noexcept { return static_cast<Integer>(FList.size()); }
 
  private:

@@ -87,7 +87,7 @@ TEST_F(AppenderFile, NameAndExtensionFollowEachOther) {
 }
 
 TEST_F(AppenderFile, BlankNameOrNoLayoutGivesNoOutput) {
-  const auto Bare = Log->GetAppenders()->Add(ZqFileAppender).As<IZqFileAppender>();
+  const auto Bare = Log->GetAppenders()->Add(std::u16string(u"tzqfileappender")).As<IZqFileAppender>();
   Bare->SetFileName(Folder.File("bare.log"));
   File->SetFileName(u"   ");
   File->SetFileExt(u"");

@@ -162,6 +162,8 @@ INSTANTIATE_TEST_SUITE_P(Forms, LoggerCalls,
             u"Exception:broke"},
         TCallCase{"ErrorException", [](IZqLogger& L) { dynamic_cast<TZqLogger&>(L).Error(u"m", cFault); },
             "root.p Error m\r\nbroke", liIndentNone, u"none"},
+        TCallCase{"FatalStandardException", [](IZqLogger& L) { L.Fatal(std::out_of_range("brök")); },
+            "root.p Fatal brök", liIndentNone, u"brök"},
         TCallCase{
             "Count", [](IZqLogger& L) { L.Count(u"hits", 3); }, "root.p Debug #counter::hits#", liIndentNone, u"3"},
         TCallCase{"EnterMethod", [](IZqLogger& L) { L.EnterMethod(&cShop, u"Sell(%d)", {2}, llInfo); },
@@ -331,7 +333,7 @@ TEST(AppenderRegistry, FindsClassesInAnyCaseAndNamesWhatIsMissing) {
   EXPECT_EQ(RaisedBy([] { static_cast<void>(RegisteredAppenders()->GetClass(ZqLogViewerAppenderClient)); }),
       u"EListError: Class TZqLogViewerAppenderClient not found!");
   const TLoggerFixture Fixture(u"p");
-  EXPECT_THROW(Fixture.Log->GetAppenders()->Add("TZqNone"), EListError);
+  EXPECT_THROW(Fixture.Log->GetAppenders()->Add(u"TZqNone"), EListError);
   std::thread([&] { EXPECT_EQ(Fixture.Log->LockAppenders()->Count(), 0), Fixture.Log->UnLockAppenders(); }).join();
 }
 

@@ -223,6 +223,7 @@ class ZQ_API TText {
   TText(const char16_t* AText ZQ_LIFETIMEBOUND) noexcept : TText(std::u16string_view(AText == nullptr ? u"" : AText)) {}
   TText(std::string_view AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.data(), AText.size(), Utf8) {}
   TText(const std::string& AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.data(), AText.size(), Utf8) {}
+  TText(const ShortString& AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.View()) {}
   TText(const char* AText ZQ_LIFETIMEBOUND) noexcept : TText(std::string_view(AText == nullptr ? "" : AText)) {}
   TText(const UTF8String& AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.View()) {}
   TText(std::u8string_view AText ZQ_LIFETIMEBOUND) noexcept : TText(AText.data(), AText.size(), Utf8) {}
