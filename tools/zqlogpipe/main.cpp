@@ -242,10 +242,10 @@ class TPipeAppender : public TZqRollingFileAppender {
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override {
     for (;; Wait(-1, static_cast<int>(std::min(Retry, cMostSeconds) * 1000))) try {
         TZqRollingFileAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+        if (!FFileStream) throw Exception(u"The file isn't open: " + GetFileName());  // since a roll
         ++Written;
         return;
       } catch (const Exception& e) {
-        if (!FFileStream) Close();  // a roll that couldn't open its new file: the next line tries again
         if (Retry == 0 || StopSignal != 0) {
           if (Failed++ == 0) Failure = e.Message();
           throw;
@@ -333,6 +333,7 @@ class TPipe {
     Appender->SetMaxFileSize(FOptions.MaxSize);
     Appender->SetMaxBackupCount(FOptions.Backups);
     Appender->SetAppendExisting(FOptions.Append);
+    Appender->SetRetryInterval(1);  // after a roll that couldn't open its new file
     Appender->Retry = FOptions.Retry;
     Appender->SetLayout(FOptions.Time ? TZqLogBaseClass::Of<TZqSimpleLayout>() : TZqLogBaseClass::Of<TNoTimeLayout>());
     Appender->Initialize();  // a file that can't be opened shows here, before the first line
