@@ -75,7 +75,8 @@ class TDescriptor {
   ~TDescriptor() {
     if (IsOpen()) iconv_close(FHandle);
   }
-  [[nodiscard]] bool IsOpen() const noexcept { return FHandle != cClosed; }
+  // NOLINTNEXTLINE(performance-no-int-to-ptr)
+  [[nodiscard]] bool IsOpen() const noexcept { return FHandle != reinterpret_cast<iconv_t>(-1); }
 
   // Bytes written, from the initial state and back to it; -1 and the reason in errno where it can't.
   template <std::size_t cRoom>
@@ -90,7 +91,6 @@ class TDescriptor {
   }
 
  private:
-  static inline const iconv_t cClosed = reinterpret_cast<iconv_t>(-1);  // NOLINT(performance-no-int-to-ptr)
   iconv_t FHandle;
 };
 
