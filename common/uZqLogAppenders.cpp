@@ -22,6 +22,7 @@ constinit TStartCount Starts;
 constexpr Word cVista = 601;
 constexpr Integer cCommonDocuments = 46;
 constexpr std::size_t cKeptLine = 1 << 16;  // bytes
+constexpr std::size_t cLayoutState = 192;   // bytes that a layout is likely to read for a line
 
 bool IsBlank(const TFileName& AName) { return Trim(AName).IsEmpty(); }
 
@@ -233,7 +234,10 @@ ZQ_HOT bool TZqFileAppender::PrepareWrite() { return true; }
 
 ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeString& ALoggerName,
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  Prefetch(this, sizeof *this);
   const TScope Scope(FLock);
+  Prefetch(FFileStream.get(), sizeof(TZqTextFile));
+  Prefetch(FByteLayout.Get(), cLayoutState);
   if (!PrepareWrite()) return;
   TZqBaseAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
   if (!FFileStream && FInitialized) [[unlikely]]
@@ -246,7 +250,7 @@ ZQ_HOT void TZqFileAppender::Write(const UnicodeString& ASender, const UnicodeSt
   else Line.Append(FLayout->FormatLine(ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent));
   if (!Line.IsEmpty() && FFileStream) {
     Line.AppendBytes("\r\n");
-    FFileStream->WriteBytes(Line.View());
+    FFileStream->FFile.WriteBytes(Line.View());  // by FLock it is nobody else's
   }
   if (Line.Room() <= cKeptLine) FSpareLine = std::move(Line);
 }

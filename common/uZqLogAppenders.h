@@ -114,6 +114,7 @@ class ZQ_API TZqTextFile : public TObject {
   void Close();
 
  private:
+  friend class TZqFileAppender;
   TTextFile FFile;
   Int64 FFound = 0;  // bytes that the file had when it was opened
   mutable TCriticalSection FCritSect;

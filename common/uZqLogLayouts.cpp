@@ -36,8 +36,8 @@ UnicodeString NowText() {
   }
 }
 
-void AppendAscii(utf8::TBuffer& ALine, std::string_view AText) { ALine.AppendBytes(AText); }
-void AppendAscii(UnicodeString& ALine, std::string_view AText) { ALine.Append(FromUTF8(AText)); }
+void AppendUtf8(utf8::TBuffer& ALine, std::string_view AText) { ALine.AppendBytes(AText); }
+void AppendUtf8(UnicodeString& ALine, std::string_view AText) { ALine.Append(FromUTF8(AText)); }
 
 }  // namespace
 
@@ -58,33 +58,36 @@ void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
   if (ALogIndent == liIndentDecrease) FIndent.SetLength(FIndent.Length() - static_cast<Integer>(cIndentStep.size()));
 }
 
-// Most lines come in the second of the one before: then the milliseconds alone are written anew, and nobody asks for
-// the time zone.
-ZQ_HOT std::string_view TZqSimpleLayout::TimeNow() {
+// Most lines begin like the one before, but for the milliseconds: then those alone are written anew, and nobody asks
+// for the time zone.
+ZQ_HOT std::string_view TZqSimpleLayout::Front(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel) {
   const Int64 Milliseconds = UtcMilliseconds();
-  if (Milliseconds < FSecond || Milliseconds > FSecond + 999) {
-    const Int64 Second = Milliseconds - (Milliseconds % 1000 + 1000) % 1000;
-    FTime = LocalText(Second) + ":zzz - ";
-    FSecond = Second;
-  }
+  if (Milliseconds < FSecond || Milliseconds > FSecond + 999 || ALogLevel != FLevel || ALoggerName != FLoggerName)
+      [[unlikely]]
+    RenewFront(Milliseconds, ALoggerName, ALogLevel);
   const auto Rest = static_cast<Integer>(Milliseconds - FSecond);
-  char* const Digits = FTime.data() + FTime.size() - 6;
+  char* const Digits = FFront.data() + FTime.size();
   Digits[0] = static_cast<char>('0' + Rest / 100);
   Digits[1] = static_cast<char>('0' + Rest / 10 % 10);
   Digits[2] = static_cast<char>('0' + Rest % 10);
-  return FTime;
+  return FFront;
+}
+
+void TZqSimpleLayout::RenewFront(Int64 AMilliseconds, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel) {
+  const Int64 Second = AMilliseconds - (AMilliseconds % 1000 + 1000) % 1000;
+  if (Second != FSecond) FTime = LocalText(Second) + ":";
+  FLoggerName = ALoggerName;
+  FLevel = ALogLevel;
+  FFront = FTime + "zzz - " + ToUTF8(ZqLogLevels[ALogLevel]) + " " + ToUTF8(ALoggerName) + " - ";
+  FSecond = Second;
 }
 
 template <class TLine>
 ZQ_HOT void TZqSimpleLayout::Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
-  ChangeIndent(ALogIndent);
+  if (ALogIndent != liIndentNone) ChangeIndent(ALogIndent);
   if (!FIndent.IsEmpty()) ALine.Append(FIndent);
-  AppendAscii(ALine, TimeNow());
-  ALine.Append(ZqLogLevels[ALogLevel]);
-  AppendAscii(ALine, " ");
-  ALine.Append(ALoggerName);
-  AppendAscii(ALine, " - ");
+  AppendUtf8(ALine, Front(ALoggerName, ALogLevel));
   ALine.Append(ALogMessage);
   if (AValue != nullptr) ALine.Append(u" - " + ZqDataRecToString(AValue));
 }

@@ -43,15 +43,20 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
   };
 
   void ChangeIndent(TZqLogIndent ALogIndent);
-  std::string_view TimeNow();
+  std::string_view Front(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel);
+  void RenewFront(Int64 AMilliseconds, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel);
   template <class TLine>
   void Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
       PZqDataRec AValue, TZqLogIndent ALogIndent);
 
   TByteLayout FByteLayout{*this};
   UnicodeString FIndent;
-  Int64 FSecond = std::numeric_limits<Int64>::min();  // the one that FTime shows, in milliseconds, UTC
-  std::string FTime;                                  // how the last line began: "yyyy-mm-dd hh:mm:ss:zzz - "
+  // How the last line began, in UTF-8: "yyyy-mm-dd hh:mm:ss:zzz - Level logger - ", and what that was made from.
+  std::string FFront;
+  Int64 FSecond = std::numeric_limits<Int64>::min();  // in milliseconds, UTC
+  std::string FTime;                                  // up to the milliseconds
+  UnicodeString FLoggerName;
+  TZqLogLevel FLevel = llAll;
 };
 
 namespace uZqLogLayouts {

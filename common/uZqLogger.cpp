@@ -438,11 +438,14 @@ inline void TZqLogger::WriteToAppenders(TZqLogWalk& AWalk, const UnicodeString& 
       }
 }
 
-// Level and count are tested first, so that a message that nobody writes takes no lock and isn't even made.
+// Level and count are tested first, so that a message that nobody writes takes no lock and isn't even made. Nothing is
+// left to do behind the write: each frame to return into costs, see WriteWhole.
 ZQ_HOT void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const TText& ALogMessage,
     PZqDataRec AValue, TZqLogIndent ALogIndent) {
-  if (TZqLogger* const First = NextToWrite(this, ALogLevel))
-    WriteUpwards(First, ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
+  TZqLogger* const First = NextToWrite(this, ALogLevel);
+  if (First == nullptr) return;
+  if (!ALogMessage.IsWhole()) return WriteConverted(First, ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
+  WriteWhole(First, ASender, ALogLevel, ALogMessage.AsWhole(), AValue, ALogIndent);
 }
 
 // The nearest logger on the way up, from ALogger on, that has appenders for a message of that level.
@@ -483,14 +486,10 @@ class TMessageRoom {
 
 }  // namespace
 
-inline void TZqLogger::WriteUpwards(TZqLogger* AFirst, const UnicodeString& ASender, TZqLogLevel ALogLevel,
-    const TText& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
-  if (!ALogMessage.IsWhole()) {
-    TMessageRoom Room;
-    return WriteWhole(AFirst, ASender, ALogLevel, ALogMessage.In(Room.Text), AValue, ALogIndent);
-  }
-  UnicodeString None;
-  WriteWhole(AFirst, ASender, ALogLevel, ALogMessage.In(None), AValue, ALogIndent);
+ZQ_HOT [[gnu::noinline]] void TZqLogger::WriteConverted(TZqLogger* AFirst, const UnicodeString& ASender,
+    TZqLogLevel ALogLevel, const TText& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  TMessageRoom Room;
+  WriteWhole(AFirst, ASender, ALogLevel, ALogMessage.In(Room.Text), AValue, ALogIndent);
 }
 
 // Each lock is left before the message goes on to the parent. Flat, because after a system call each return into one

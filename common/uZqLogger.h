@@ -598,7 +598,7 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   [[nodiscard]] TZqLogger* Upwards() const noexcept {
     return FAdditive.load(std::memory_order_relaxed) ? FParent.load(std::memory_order_relaxed) : nullptr;
   }
-  void WriteUpwards(TZqLogger* AFirst, const UnicodeString& ASender, TZqLogLevel ALogLevel, const TText& ALogMessage,
+  void WriteConverted(TZqLogger* AFirst, const UnicodeString& ASender, TZqLogLevel ALogLevel, const TText& ALogMessage,
       PZqDataRec AValue, TZqLogIndent ALogIndent);
   void WriteWhole(TZqLogger* AFirst, const UnicodeString& ASender, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent);

@@ -241,10 +241,11 @@ class ZQ_API TText {
 
   /// The text itself, in ARoom where it has to be made.
   [[nodiscard]] const UnicodeString& In(UnicodeString& ARoom ZQ_LIFETIMEBOUND) const ZQ_LIFETIMEBOUND {
-    return IsWhole() ? *static_cast<const UnicodeString*>(FData) : Make(ARoom);
+    return IsWhole() ? AsWhole() : Make(ARoom);
   }
-  /// A UnicodeString of the caller's: In needs no room.
+  /// A UnicodeString of the caller's, which AsWhole returns.
   [[nodiscard]] bool IsWhole() const noexcept { return FForm == Whole; }
+  [[nodiscard]] const UnicodeString& AsWhole() const noexcept { return *static_cast<const UnicodeString*>(FData); }
   [[nodiscard]] UnicodeString ToString() const {
     UnicodeString Room;
     return In(Room);
