@@ -151,10 +151,13 @@ char* CopyPlain(const char16_t* ASource, int ACount, char* ADest) noexcept {
   return ADest + utf8::Encode(ASource, static_cast<std::size_t>(ACount), ADest);
 }
 
-// Copies the plain run and has ARest convert what is behind it, into what is left of the destination.
+// Copies the plain run and has ARest convert what is behind it, into what is left of the destination. A short run isn't
+// worth a step of its own.
 template <class TFrom, class TTo, class TRest>
 int AfterPlainRun(const TCodePage& APage, const TFrom* ASource, int ACount, TTo* ADest, int ACapacity, TRest ARest) {
-  const auto Run = static_cast<int>(PlainRun(APage, ASource, static_cast<std::size_t>(ACount)));
+  constexpr int cShort = 16;
+  auto Run = static_cast<int>(PlainRun(APage, ASource, static_cast<std::size_t>(ACount)));
+  if (Run < std::min(cShort, ACount)) Run = 0;
   if (ADest != nullptr && Run > 0) {
     if (Run > ACapacity) return Refuse(ERROR_INSUFFICIENT_BUFFER);
     ADest = CopyPlain(ASource, Run, ADest);
