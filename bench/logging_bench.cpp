@@ -171,20 +171,19 @@ class THostByteLayout : public Implements<THostTextLayout, IZqLogByteLayout> {
   ~THostByteLayout() override = default;
 };
 
-// A line by a host's layout against the same line by the simple one: time to time.
-void HostLayoutToSimple(benchmark::State& AState, TZqLogBaseClass ALayout) {
+// A line by another appender and layout against the same line by the rolling one and the simple one: time to time.
+void OtherToSimple(benchmark::State& AState, TZqLogBaseClass AAppender, TZqLogBaseClass ALayout) {
   constexpr std::size_t cLines = 5000;
   const TLogging Simple;
-  const auto Host = New<TZqFileAppender>(Logger(), u"host");
-  const IntfRef<IZqFileAppender> File(Host);
-  File->SetFileName(FromUTF8(Simple.Folder.Path + "/host.log"));
+  const auto Host = IntfRef<IZqLogBase>(AAppender.Create(Logger(), u"host")).As<IZqLogAppenderEx>();
+  Host.As<IZqFileAppender>()->SetFileName(FromUTF8(Simple.Folder.Path + "/host.log"));
   Host->SetLayout(ALayout);
   const UnicodeString Message = cMessage;
   std::vector<double> Ratios;
   for (auto _ : AState) {
     const double Own = Seconds([&] { Lines(cLines, [&] { Simple.Log->Info(Message); }); });
     Logger()->ClearAppenders();
-    Logger()->AddAppender(IntfRef<IZqLogAppender>(Host));
+    Logger()->AddAppender(Host.As<IZqLogAppender>());
     const double Hosts = Seconds([&] { Lines(cLines, [&] { Simple.Log->Info(Message); }); });
     Logger()->ClearAppenders();
     Logger()->AddAppender(Simple.Appender);
@@ -192,12 +191,13 @@ void HostLayoutToSimple(benchmark::State& AState, TZqLogBaseClass ALayout) {
   }
   AState.counters["ratio"] = Median(Ratios);
 }
-BENCHMARK_CAPTURE(HostLayoutToSimple, bytes, TZqLogBaseClass::Of<THostByteLayout>())
-    ->Unit(benchmark::kMillisecond)
-    ->Iterations(101);
-BENCHMARK_CAPTURE(HostLayoutToSimple, text, TZqLogBaseClass::Of<THostTextLayout>())
-    ->Unit(benchmark::kMillisecond)
-    ->Iterations(101);
+void Rounds(benchmark::internal::Benchmark* ABenchmark) { ABenchmark->Unit(benchmark::kMillisecond)->Iterations(101); }
+constexpr auto cAppender = TZqLogBaseClass::Of<TZqFileAppender>;
+BENCHMARK_CAPTURE(OtherToSimple, bytes_of_a_host, cAppender(), TZqLogBaseClass::Of<THostByteLayout>())->Apply(Rounds);
+BENCHMARK_CAPTURE(OtherToSimple, text_of_a_host, cAppender(), TZqLogBaseClass::Of<THostTextLayout>())->Apply(Rounds);
+BENCHMARK_CAPTURE(OtherToSimple, rolling_by_date, TZqLogBaseClass::Of<TZqDailyRollingFileAppender>(),
+    TZqLogBaseClass::Of<TZqSimpleLayout>())
+    ->Apply(Rounds);
 
 // Threads on one appender, against the same bytes written under one std::mutex: lines per second to lines per second.
 void ThreadsOnOneAppenderToOneMutex(benchmark::State& AState) {

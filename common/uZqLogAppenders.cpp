@@ -10,7 +10,9 @@
 #include "runtime/core/start_count.h"
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"
+#include "runtime/io/streams.h"
 #include "runtime/platform/disk_service.h"
+#include "runtime/text/datetime.h"
 #include "runtime/text/local_time.h"
 #include "runtime/text/numbers.h"
 
@@ -23,6 +25,12 @@ constexpr Word cVista = 601;
 constexpr Integer cCommonDocuments = 46;
 constexpr std::size_t cKeptLine = 1 << 16;  // bytes
 constexpr std::size_t cLayoutState = 192;   // bytes that a layout is likely to read for a line
+
+constexpr bool IsDigit(Char AChar) noexcept { return AChar >= u'0' && AChar <= u'9'; }
+
+bool IsNumber(std::u16string_view AText) noexcept {
+  return !AText.empty() && AText.size() <= 9 && std::ranges::all_of(AText, IsDigit);
+}
 
 bool IsBlank(const TFileName& AName) { return Trim(AName).IsEmpty(); }
 
@@ -209,13 +217,13 @@ namespace {
 
 // The file ends as ALayout ends one, whatever the time was.
 bool EndsWithFooter(const TFileName& AFileName, IZqLogLayout& ALayout) {
-  const auto IsDigit = [](char c) { return c >= '0' && c <= '9'; };
   const std::string Footer = ALayout.GetFooter().ToUTF8();
   std::string Tail(Footer.size(), '\0');
   const Int64 Count = Service<TDiskService>().ReadTail(ToSystemPath(AFileName).c_str(), Tail.data(), Tail.size());
   return Count == static_cast<Int64>(Tail.size()) &&
-         std::equal(Tail.begin(), Tail.end(), Footer.begin(),
-             [&](char a, char b) { return a == b || (IsDigit(a) && IsDigit(b)); });
+         std::equal(Tail.begin(), Tail.end(), Footer.begin(), [&](char a, char b) {
+           return a == b || (IsDigit(static_cast<Byte>(a)) && IsDigit(static_cast<Byte>(b)));
+         });
 }
 
 }  // namespace
@@ -321,15 +329,16 @@ std::unique_ptr<TZqFileInfo> TZqRollingFileAppender::CreateFileInfo(const Unicod
   return Result;
 }
 
-bool TZqRollingFileAppender::IsOfSeries(const UnicodeString& AFileName) const {
-  if (ExtractFileExt(AFileName) != ExtractFileExt(FFileName)) return false;
+std::optional<UnicodeString> TZqRollingFileAppender::SuffixOf(const UnicodeString& AFileName) const {
   const UnicodeString Stem = ChangeFileExt(AFileName, u"");
-  const UnicodeString Left = Base();
-  if (Stem == Left) return true;
-  if (!Stem.View().starts_with((Left + u".").View())) return false;
-  const std::u16string_view Number = Stem.View().substr(Left.size() + 1);
-  return !Number.empty() && Number.size() <= 9 &&
-         std::all_of(Number.begin(), Number.end(), [](Char c) { return c >= u'0' && c <= u'9'; });
+  const UnicodeString Left = Base() + u".";
+  if (ExtractFileExt(AFileName) != ExtractFileExt(FFileName) || !Stem.View().starts_with(Left.View())) return {};
+  return Stem.Copy(Left.Length() + 1, Stem.Length());
+}
+
+bool TZqRollingFileAppender::IsOfSeries(const UnicodeString& AFileName) const {
+  const auto Suffix = SuffixOf(AFileName);
+  return Suffix ? IsNumber(Suffix->View()) : AFileName == ExtractFileName(FFileName);
 }
 
 // In order of their numbers, the log file first. False, with errno, where the folder couldn't be read to its end: what
@@ -377,23 +386,32 @@ void TZqRollingFileAppender::Complain(const UnicodeString& AWhat) {
   ZqLogTrouble(this, AWhat + u" " + FFileName + u": " + Reason);
 }
 
-// Makes room for the new file before it is begun, so the series is never longer than it may be; and only when all
-// before it have moved, so that a roll that fails costs no file. The open file stays open until it has its footer.
-void TZqRollingFileAppender::RollOver() {
-  const TZqLogWalk Walk;
-  const TScope Scope(FLock);
-  if (FMaxBackupCount == 0 || (FFileStream && (FInitializing != 0 || FFileStream->IsInherited()))) return;
-  if (!MoveUp()) {
-    Complain(u"The roll failed:");
-    FFailedRoll = {FFileStream ? FFileStream->Size() : 0, UtcMilliseconds()};
-    if (!FFileStream && FInitializing == 0) OpenFile(true);
-    return;
-  }
+bool TZqRollingFileAppender::MayRoll() const {
+  return FMaxBackupCount != 0 && !(FFileStream && (FInitializing != 0 || FFileStream->IsInherited()));
+}
+
+void TZqRollingFileAppender::RollFailed() {
+  Complain(u"The roll failed:");
+  FFailedRoll = {FFileStream ? FFileStream->Size() : 0, UtcMilliseconds()};
+  if (!FFileStream && FInitializing == 0) OpenFile(true);
+}
+
+void TZqRollingFileAppender::EndRolled() {
   FFailedRoll.reset();
   try {
     EndFile();
   } catch (const Exception&) {  // a footer that can't be written: the roll may be what makes room again
   }
+}
+
+// Makes room for the new file before it is begun, so the series is never longer than it may be; and only when all
+// before it have moved, so that a roll that fails costs no file. The open file stays open until it has its footer.
+void TZqRollingFileAppender::RollOver() {
+  const TZqLogWalk Walk;
+  const TScope Scope(FLock);
+  if (!MayRoll()) return;
+  if (!MoveUp()) return RollFailed();
+  EndRolled();
   Prune(FMaxBackupCount - std::size_t{1});
   if (FInitializing == 0) Initialize();
   CheckBackupCount();
@@ -475,8 +493,203 @@ void TZqRollingFileAppender::SetMaxBackupCount(Word AValue) {
   CheckBackupCount();
 }
 
+// ---------------------------------------------------------------------------------------- TZqDailyRollingFileAppender
+
+namespace {
+
+constexpr Cardinal cMostSize = 2147483647;
+constexpr std::size_t cHead = 1024;  // bytes of a file in which its first date is looked for
+
+TDateTime LocalTime(Int64 AUtcMilliseconds) { return UnixMillisecondsToDateTime(LocalMilliseconds(AUtcMilliseconds)); }
+
+// "yyyy-mm-dd hh:mm:ss" at the front of AText.
+std::optional<TDateTime> DateAtFront(std::string_view AText) {
+  constexpr std::string_view cShape = "0000-00-00 00:00:00";
+  if (AText.size() < cShape.size()) return {};
+  for (std::size_t i = 0; i < cShape.size(); ++i)
+    if (cShape[i] == '0' ? !IsDigit(static_cast<Byte>(AText[i])) : AText[i] != cShape[i]) return {};
+  const auto Number = [&](std::size_t AAt, std::size_t ALength) {
+    Integer Result = 0;
+    for (const char c : AText.substr(AAt, ALength)) Result = 10 * Result + (c - '0');
+    return static_cast<Word>(Result);
+  };
+  try {
+    return EncodeDate(Number(0, 4), Number(5, 2), Number(8, 2)) +
+           EncodeTime(Number(11, 2), Number(14, 2), Number(17, 2), 0);
+  } catch (const EConvertError&) {  // digits, but no date
+    return {};
+  }
+}
+
+// What a date pattern makes of a date: runs of digits, of letters, and single other characters.
+enum class TRunKind : Byte { Digits, Letters, Other };
+struct TRun {
+  TRunKind Kind = TRunKind::Other;
+  std::u16string_view Text;
+};
+
+TRunKind KindOf(Char AChar) noexcept {
+  if (IsDigit(AChar)) return TRunKind::Digits;
+  const bool Letter = AChar >= 0x80 || (AChar >= u'A' && AChar <= u'Z') || (AChar >= u'a' && AChar <= u'z');
+  return Letter ? TRunKind::Letters : TRunKind::Other;
+}
+
+TRun TakeRun(std::u16string_view& ARest) noexcept {
+  if (ARest.empty()) return {};
+  const TRunKind Kind = KindOf(ARest[0]);
+  std::size_t Length = 1;
+  while (Kind != TRunKind::Other && Length < ARest.size() && KindOf(ARest[Length]) == Kind) ++Length;
+  const std::u16string_view Text = ARest.substr(0, Length);
+  ARest.remove_prefix(Length);
+  return {Kind, Text};
+}
+
+// Whether AText could come of the pattern that made AShort and ALong of two dates, one with numbers as short and one
+// with numbers as long as can be. Names may be any.
+bool IsOfPattern(std::u16string_view AText, std::u16string_view AShort, std::u16string_view ALong) noexcept {
+  while (!AText.empty() && !AShort.empty() && !ALong.empty()) {
+    const TRun Run = TakeRun(AText), Short = TakeRun(AShort), Long = TakeRun(ALong);
+    const std::size_t Size = Run.Text.size();
+    if (Run.Kind != Short.Kind || (Run.Kind == TRunKind::Other && Run.Text != Short.Text)) return false;
+    if (Run.Kind == TRunKind::Digits && (Size < Short.Text.size() || Size > Long.Text.size())) return false;
+  }
+  return AText.empty() && AShort.empty();
+}
+
+}  // namespace
+
+TZqDailyRollingFileAppender::TZqDailyRollingFileAppender(TZqLogger* ALogger, const UnicodeString& AName)
+    : Implements(ALogger, AName) {
+  FMaxFileSize = cMostSize;
+}
+
+// Empty where the calendar ends: nothing rolls there, and no line is lost.
+UnicodeString TZqDailyRollingFileAppender::TextOf(TDateTime AMoment) const {
+  try {
+    return FormatDateTime(FDatePattern, AMoment);
+  } catch (const EConvertError&) {
+    return {};
+  }
+}
+
+// Made once a second, or a millisecond where the pattern shows those.
+ZQ_HOT const UnicodeString& TZqDailyRollingFileAppender::TextOfNow() {
+  const Int64 Now = UtcMilliseconds();
+  if (Now < FNowFrom || Now > FNowTo) [[unlikely]] {
+    const bool ShowsMilliseconds = LowerCase(FDatePattern).Pos(u"z") != 0;
+    FNowText = TextOf(LocalTime(Now));
+    FNowFrom = ShowsMilliseconds ? Now : Now - (Now % 1000 + 1000) % 1000;
+    FNowTo = ShowsMilliseconds ? Now : FNowFrom + 999;
+  }
+  return FNowText;
+}
+
+std::optional<TDateTime> TZqDailyRollingFileAppender::DateInFile() const {
+  try {
+    TFileStream File(FFileName, fmOpenRead | fmShareDenyNone);
+    std::string Head(cHead, '\0');
+    Head.resize(static_cast<std::size_t>(File.Read(Head.data(), static_cast<Integer>(Head.size()))));
+    for (std::string_view Rest = Head; !Rest.empty(); Rest.remove_prefix(1))
+      if (const auto Date = DateAtFront(Rest)) return Date;
+  } catch (const Exception&) {  // it can't be read: then its last change has to do
+  }
+  return {};
+}
+
+std::optional<TDateTime> TZqDailyRollingFileAppender::TimeBegun() const {
+  TDiskFacts Facts;
+  if (Service<TDiskService>().Stat(ToSystemPath(FFileName).c_str(), true, Facts) != 0) return {};
+  if (Facts.CreatedTime != 0) return LocalTime(Facts.CreatedTime / 1000);
+  if (const auto Date = DateInFile()) return Date;
+  return LocalTime(Facts.ModifiedTime / 1000);
+}
+
+// Onto no file that is there. A text that no file name can hold is the pattern's fault, and another roll wouldn't help.
+TZqDailyRollingFileAppender::TMoved TZqDailyRollingFileAppender::MoveToDate() {
+  if (!FileExists(FFileName)) return TMoved::Moved;
+  const auto Begun = TimeBegun();
+  if (!Begun) return TMoved::Refused;
+  const UnicodeString Text = TextOf(*Begun);
+  const UnicodeString Name = Folder() + Base() + u"." + Text + ExtractFileExt(FFileName);
+  if (Text.IsEmpty() || FileExists(Name)) return TMoved::Refused;
+  return RenameFile(FFileName, Name) ? TMoved::Moved : TMoved::Kept;
+}
+
+void TZqDailyRollingFileAppender::RollOver() {
+  const TZqLogWalk Walk;
+  const TScope Scope(FLock);
+  if (!MayRoll()) return;
+  switch (MoveToDate()) {
+    case TMoved::Refused: return TZqRollingFileAppender::RollOver();
+    case TMoved::Kept: return RollFailed();
+    case TMoved::Moved: break;
+  }
+  EndRolled();
+  if (FInitializing == 0) Initialize();
+}
+
+ZQ_HOT void TZqDailyRollingFileAppender::CheckRollover() {
+  const TScope Scope(FLock);
+  TZqRollingFileAppender::CheckRollover();
+  if (FFileStream && TextOfNow() != FCurrent && IsRollDue()) RollOver();
+}
+
+void TZqDailyRollingFileAppender::Initialize() {
+  const TZqLogWalk Walk;
+  const TScope Scope(FLock);
+  const TInitializing Initializing(*this);
+  const auto Begun = IsBlank(FFileName) || FFileStream ? std::nullopt : TimeBegun();
+  if (Begun && TextOf(*Begun) != TextOfNow()) {
+    FCurrent = TextOf(*Begun);
+    RollOver();
+  }
+  TZqRollingFileAppender::Initialize();
+  FCurrent = TextOfNow();
+}
+
+void TZqDailyRollingFileAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
+  const TScope Scope(FLock);
+  TZqRollingFileAppender::SetConfig(AConfig);
+}
+
+std::unique_ptr<TZqFileInfo> TZqDailyRollingFileAppender::CreateFileInfo(const UnicodeString& AFileName) {
+  const TScope Scope(FLock);
+  auto Result = TZqRollingFileAppender::CreateFileInfo(AFileName);
+  if (Result->Index == 0) Result->FileNameRight = u"." + ZqCleanupFileName(FCurrent);
+  return Result;
+}
+
+// Beside what the numeric roll makes: a date, or a number and a date.
+bool TZqDailyRollingFileAppender::IsOfSeries(const UnicodeString& AFileName) const {
+  if (TZqRollingFileAppender::IsOfSeries(AFileName)) return true;
+  const auto Suffix = SuffixOf(AFileName);
+  if (!Suffix) return false;
+  const UnicodeString Short = ZqCleanupFileName(TextOf(EncodeDate(2001, 2, 3) + EncodeTime(4, 5, 6, 7)));
+  const UnicodeString Long = ZqCleanupFileName(TextOf(EncodeDate(2012, 12, 23) + EncodeTime(14, 15, 16, 178)));
+  const auto IsDate = [&](std::u16string_view AText) {
+    return !AText.empty() && IsOfPattern(AText, Short.View(), Long.View());
+  };
+  const std::size_t Dot = Suffix->View().find(u'.');
+  return IsDate(Suffix->View()) || (Dot != std::u16string_view::npos && IsNumber(Suffix->View().substr(0, Dot)) &&
+                                       IsDate(Suffix->View().substr(Dot + 1)));
+}
+
+UnicodeString TZqDailyRollingFileAppender::GetDatePattern() const {
+  const TScope Scope(FLock);
+  return FDatePattern;
+}
+
+void TZqDailyRollingFileAppender::SetDatePattern(const TText& AValue) {
+  const TZqLogWalk Walk;
+  const TScope Scope(FLock);
+  FDatePattern = AValue.ToString();
+  FNowTo = FNowFrom - 1;
+  if (FFileStream && TextOfNow() != FCurrent) RollOver();
+}
+
 void uZqLogAppenders::Start() {
   if (!Starts.Begins()) return;
+  RegisteredAppenders()->Add(TZqLogBaseClass::Of<TZqDailyRollingFileAppender>());
   RegisteredAppenders()->Add(TZqLogBaseClass::Of<TZqFileAppender>());
   RegisteredAppenders()->Add(TZqLogBaseClass::Of<TZqRollingFileAppender>());
 }

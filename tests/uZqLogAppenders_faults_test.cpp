@@ -37,8 +37,9 @@ std::map<std::string, std::string> Contents(const TTempFolder& AFolder) {
   return Result;
 }
 
+template <class TAppender = TZqRollingFileAppender>
 IntfRef<IZqRollingFileAppender> AddRolling(const IntfRef<IZqLogger>& ALog, const TTempFolder& AFolder, Word ABackups) {
-  const auto Result = AddFile<TZqRollingFileAppender>(ALog, AFolder.File("app.log")).As<IZqRollingFileAppender>();
+  const auto Result = AddFile<TAppender>(ALog, AFolder.File("app.log")).template As<IZqRollingFileAppender>();
   Result->SetMaxBackupCount(ABackups);
   return Result;
 }
@@ -47,6 +48,13 @@ struct TFaultCase {
   const char* Name;
   std::vector<const char*> Before;  // files of the folder, each holding its name
   std::function<void(const IntfRef<IZqLogger>&, const IntfRef<IZqRollingFileAppender>&)> Action;
+  decltype(&AddRolling<>) Add = AddRolling<>;
+};
+constexpr Int64 cDay = 86400 * Int64{1000000};  // as the clock counts
+TScriptedClock* FaultClock = nullptr;
+const auto cMidnight = [](const IntfRef<IZqLogger>& ALog, const IntfRef<IZqRollingFileAppender>&) {
+  FaultClock->Microseconds += cDay;
+  ALog->Info(u"of the next day");
 };
 const auto cLine = [](const IntfRef<IZqLogger>& ALog, const IntfRef<IZqRollingFileAppender>& AFile) {
   AFile->SetMaxFileSize(1);
@@ -72,9 +80,13 @@ TEST_P(LogFaults, OfEachCallCostNothingThatIsKept) {
       SCOPED_TRACE(testing::Message() << "call " << Call << " fails with " << Error);
       const TFailures Failures;
       const TLoggerFixture Fixture;
+      TScriptedClock Time;
+      FaultClock = &Time;
+      TFaultyDisk Young;
+      Young.CreatedTime = 0;
       const TTempFolder Folder(GetParam().Before);
       std::filesystem::create_directory(Folder.Path() / "app.9.log");
-      const auto File = AddRolling(Fixture.Log, Folder, 20);
+      const auto File = GetParam().Add(Fixture.Log, Folder, 20);
       Fixture.Log->Info(u"acknowledged");
       const auto Before = Contents(Folder);
       {
@@ -94,7 +106,10 @@ TEST_P(LogFaults, OfEachCallCostNothingThatIsKept) {
 INSTANTIATE_TEST_SUITE_P(Calls, LogFaults,
     testing::Values(TFaultCase{"RollByALine", {"app.1.log", "app.2.log"}, cLine},
         TFaultCase{"RollByACall", {"app.2.log", "app.4.log", "app.007.log", "apple.log", "app.xsl"}, cCall},
-        TFaultCase{"StartAnew", {"app.1.log", "app.3.log"}, cStart}),
+        TFaultCase{"StartAnew", {"app.1.log", "app.3.log"}, cStart},
+        TFaultCase{"RollByDate", {"app.2021-12-21.log"}, cMidnight, AddRolling<TZqDailyRollingFileAppender>},
+        TFaultCase{"RollByDateOfATakenName", {"app.1.log", "app.2021-12-23.log"}, cMidnight,
+            AddRolling<TZqDailyRollingFileAppender>}),
     [](const auto& AInfo) { return std::string(AInfo.param.Name); });
 
 // ---------------------------------------------------------------------------------------- failures are told

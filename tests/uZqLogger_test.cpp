@@ -449,7 +449,7 @@ TEST(LogPackage, AModuleStartedByItselfKeepsWhatItHas) {
       if (Unit.Start != nullptr) (Starting ? Unit.Start : Unit.Stop)();
     EXPECT_TRUE(ZqGetExceptionClass(u"package", 1));
     EXPECT_EQ(LiveAppenders().size(), 1U);
-    EXPECT_EQ(RegisteredAppenders()->Count(), 2);
+    EXPECT_EQ(RegisteredAppenders()->Count(), 3);
   }
 }
 
@@ -460,7 +460,7 @@ TEST(LogPackage, StopWritesTheFootersOfTheRootsAppenders) {
   Finalize();
   EXPECT_TRUE(SplitLines(Folder.Read("app.log")).back().starts_with("Log stopped on : "));
   Initialize();
-  EXPECT_EQ(RegisteredAppenders()->Count(), 2);
+  EXPECT_EQ(RegisteredAppenders()->Count(), 3);
 }
 
 }  // namespace

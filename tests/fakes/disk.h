@@ -2,15 +2,17 @@
 
 #include <cerrno>
 #include <functional>
+#include <optional>
 
 #include "runtime/platform/disk_service.h"
 
 namespace zq {
 
-/// The real disk, in its seam as long as it lives, of which one call fails: the one that FailAt counts, from 1.
+/// The real disk, in its seam as long as it lives, of which one call fails: the one that FailAt counts, from 1; 0 for
+/// none.
 class TFaultyDisk final : public TDiskService {
  public:
-  explicit TFaultyDisk(int AFailAt, int AError) : FailAt(AFailAt), Error(AError) {}
+  explicit TFaultyDisk(int AFailAt = 0, int AError = 0) : FailAt(AFailAt), Error(AError) {}
 
   int Open(const char* APath, int AFlags, Cardinal AMode) override {
     return Fails() ? -1 : FReal.Open(APath, AFlags, AMode);
@@ -31,7 +33,9 @@ class TFaultyDisk final : public TDiskService {
   int MakeFolder(const char* APath) override { return Fails() ? -1 : FReal.MakeFolder(APath); }
   int RemoveFolder(const char* APath) override { return Fails() ? -1 : FReal.RemoveFolder(APath); }
   int Stat(const char* APath, bool AFollow, TDiskFacts& AFacts) override {
-    return Fails() ? -1 : FReal.Stat(APath, AFollow, AFacts);
+    const int Result = Fails() ? -1 : FReal.Stat(APath, AFollow, AFacts);
+    if (CreatedTime) AFacts.CreatedTime = *CreatedTime;
+    return Result;
   }
   void* OpenFolder(const char* APath) override { return Fails() ? nullptr : FReal.OpenFolder(APath); }
   const char* ReadFolder(void* AFolder) override { return Fails() ? nullptr : FReal.ReadFolder(AFolder); }
@@ -40,6 +44,7 @@ class TFaultyDisk final : public TDiskService {
   /// The faulty call has been made.
   [[nodiscard]] bool HasFailed() const noexcept { return FCalls >= FailAt; }
 
+  std::optional<Int64> CreatedTime;  // said of each file
   const int FailAt;
   const int Error;
 

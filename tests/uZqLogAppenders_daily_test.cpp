@@ -1,0 +1,166 @@
+// The appender that rolls by date: where lines go, and under which name, as the clock walks on.
+
+#include <gmock/gmock.h>
+
+#include "common/uZqLogAppenders.h"
+#include "tests/fakes/clock.h"
+#include "tests/fakes/disk.h"
+#include "tests/support/logging.h"
+
+namespace zq {
+namespace {
+
+constexpr Int64 cSecond = 1000000, cHour = 3600 * cSecond, cDay = 24 * cHour;  // as the clock counts
+constexpr Int64 cMidnight = 1640217600 * cSecond;                              // 2021-12-23 00:00, UTC
+
+// A file system that keeps no time of creation, and a clock just before midnight.
+struct LogDaily : testing::Test, TLoggerFixture {
+  LogDaily() { Disk.CreatedTime = 0; }
+  IntfRef<IZqDailyRollingFileAppender> Add() {
+    return AddFile<TZqDailyRollingFileAppender>(Log, Folder.File("app.log")).As<IZqDailyRollingFileAppender>();
+  }
+  void LogAt(Int64 AMicroseconds, const char* AText) {
+    Clock.Microseconds = AMicroseconds;
+    Log->Info(AText);
+  }
+  // The texts of the lines in a file, run together.
+  [[nodiscard]] std::string Texts(const std::string& AName) const {
+    std::string Result;
+    for (const std::string& Line : SplitLines(Folder.Read(AName)))
+      if (const auto At = Line.find("root.test - "); At != Line.npos) Result += Line.substr(At + 12);
+    return Result;
+  }
+  using TFiles = std::vector<std::pair<std::string, std::string>>;
+  [[nodiscard]] TFiles Files() const {
+    TFiles Result;
+    for (const std::string& Name : Folder.Names())
+      if (!std::filesystem::is_directory(Folder.Path() / Name)) Result.emplace_back(Name, Texts(Name));
+    return Result;
+  }
+  TScriptedClock Clock{cMidnight - 1};
+  TFaultyDisk Disk;
+  const TTempFolder Folder;
+};
+
+TEST_F(LogDaily, TheFirstMessageOfADayRollsAndTheFileIsNamedByItsOwn) {
+  const auto File = Add();
+  EXPECT_EQ(File->GetMaxFileSize(), 2147483647U);
+  LogAt(cMidnight - 1, "a");
+  LogAt(cMidnight, "b");
+  LogAt(cMidnight + cDay - 1, "c");
+  EXPECT_EQ(Files(), (TFiles{{"app.2021-12-22.log", "a"}, {"app.log", "bc"}}));
+  EXPECT_THAT(Folder.Read("app.2021-12-22.log"), testing::HasSubstr("a\r\nLog stopped on : 2021-12-23"));
+  LogAt(cMidnight + 3 * cDay, "d");
+  EXPECT_EQ(Files(), (TFiles{{"app.2021-12-22.log", "a"}, {"app.2021-12-23.log", "bc"}, {"app.log", "d"}}));
+}
+
+TEST_F(LogDaily, TheFileSystemsTimeOfCreationLeads) {
+  Disk.CreatedTime = cMidnight - 2 * cDay - 1;
+  Folder.Write("app.log", "Log started on : 2021-12-01 10:00:00\r\n");
+  const auto File = Add();
+  LogAt(cMidnight, "a");
+  EXPECT_EQ(Folder.Names(), (std::vector<std::string>{"app.2021-12-20.log", "app.log"}));
+}
+
+TEST_F(LogDaily, AFileOfAnEarlierDayIsRolledAtTheStart) {
+  const std::pair<const char*, const char*> cFiles[] = {
+      {"Log started on : 2021-12-01 10:00:00\r\n", "app.2021-12-01.log"},
+      {"2021-02-31 10:00:00 is no date, 2021-02-28 23:59:59 is\r\n", "app.2021-02-28.log"}};
+  for (const bool Appends : {true, false})
+    for (const auto& [Content, Name] : cFiles) {
+      Folder.Write("app.log", Content);
+      const auto File = Add();
+      File->SetAppendExisting(Appends);
+      LogAt(cMidnight, "a");
+      EXPECT_EQ(Folder.Read(Name), Content);
+      EXPECT_EQ(Texts("app.log"), "a");
+      Log->ClearAppenders();
+      for (const std::string& Left : Folder.Names()) std::filesystem::remove(Folder.Path() / Left);
+    }
+}
+
+TEST_F(LogDaily, ThePeriodIsThePatterns) {
+  const std::tuple<const char16_t*, Int64, bool> cCases[] = {{u"yyyy-mm", 8 * cDay, false},
+      {u"yyyy-mm", 9 * cDay, true}, {u"yyyy-mm-dd-hh", cHour - 1, false}, {u"yyyy-mm-dd-hh", cHour, true},
+      {u"yyyymmdd hhnnss", cSecond - 1, false}, {u"yyyymmdd hhnnss", cSecond, true}, {u"hhnnsszzz", 999, false},
+      {u"hhnnsszzz", 1000, true}};
+  for (const auto& [Pattern, Later, Rolls] : cCases) {
+    const auto File = Add();
+    File->SetDatePattern(Pattern);
+    LogAt(cMidnight, "a");
+    LogAt(cMidnight + Later, "b");
+    EXPECT_EQ(Folder.Names().size(), Rolls ? 2U : 1U) << Later;
+    EXPECT_EQ(Texts("app.log"), Rolls ? "b" : "ab");
+    Log->ClearAppenders();
+    for (const std::string& Name : Folder.Names()) std::filesystem::remove(Folder.Path() / Name);
+  }
+}
+
+TEST_F(LogDaily, AnotherPatternRollsAtOnceWhereItTellsAnotherText) {
+  const auto File = Add();
+  LogAt(cMidnight, "a");
+  File->SetDatePattern("yyyy-mm-dd");
+  EXPECT_EQ(Folder.Names().size(), 1U);
+  File->SetDatePattern(u"yyyy");
+  EXPECT_EQ(Files(), (TFiles{{"app.2021.log", "a"}, {"app.log", ""}}));
+}
+
+// By size within one day, and with the clock set back behind midnight: a name that is taken ends in a number.
+TEST_F(LogDaily, ANameThatIsTakenEndsInANumberedBackup) {
+  const auto File = Add();
+  File->SetMaxFileSize(1);
+  for (const char* Text : {"a", "b", "c", "d"}) LogAt(cMidnight, Text);
+  EXPECT_EQ(Files(), (TFiles{{"app.1.2021-12-23.log", "b"}, {"app.2.2021-12-23.log", "a"}, {"app.2021-12-23.log", "c"},
+                         {"app.log", "d"}}));
+  File->SetMaxFileSize(0);
+  LogAt(cMidnight - cHour, "e");
+  LogAt(cMidnight + cHour, "f");
+  EXPECT_EQ(Texts("app.1.2021-12-23.log") + Texts("app.2021-12-22.log") + Texts("app.log"), "def");
+}
+
+TEST_F(LogDaily, WhatCannotBeNamedGoesOnAndIsTriedAgainAfterAMinute) {
+  const auto File = Add();
+  std::filesystem::create_directory(Folder.Path() / "app.2021-12-22.log");
+  LogAt(cMidnight - 1, "a");
+  LogAt(cMidnight, "b");
+  EXPECT_EQ(Files(), (TFiles{{"app.log", "ab"}}));
+  std::filesystem::remove(Folder.Path() / "app.2021-12-22.log");
+  LogAt(cMidnight + 60 * cSecond - 1000, "c");
+  EXPECT_EQ(Files(), (TFiles{{"app.log", "abc"}}));
+  LogAt(cMidnight + 60 * cSecond, "d");
+  EXPECT_EQ(Files(), (TFiles{{"app.2021-12-22.log", "abc"}, {"app.log", "d"}}));
+  File->SetDatePattern("yyyy/mm/dd");
+  LogAt(cMidnight + cDay, "e");
+  EXPECT_EQ(Texts("app.log"), "de");
+}
+
+TEST_F(LogDaily, DatedFilesCountWhereTheCountIsSetAndForeignOnesStay) {
+  const auto File = Add();
+  LogAt(cMidnight, "a");
+  const std::vector<const char*> cForeign = {"app..log", "app.1-2-3.log", "app.1.x.log", "app.2021-12-2.log",
+      "app.2021-12-22.log.gz", "app.2021-12-22.old.log", "app.2021-12-22x.log", "app.2021_12_22.log",
+      "app.x.2021-12-22.log", "apple.2021-12-22.log"};
+  for (const char* Name : cForeign) Folder.Write(Name, Name);
+  for (const char* Name : {"app.2021-12-21.log", "app.3.log", "app.1.2021-12-20.log"}) Folder.Write(Name, "mine");
+  File->SetMaxBackupCount(1);
+  EXPECT_EQ(Folder.Names().size(), cForeign.size() + 1);
+  for (const char* Name : {"app.9.2.2021.log", "app.10.12.2021.log"}) Folder.Write(Name, "mine");
+  File->SetDatePattern("d.m.yyyy");  // which rolls
+  File->SetMaxBackupCount(1);
+  std::vector<std::string> Left(cForeign.begin(), cForeign.end());
+  Left.push_back("app.log");
+  EXPECT_THAT(Folder.Names(), testing::UnorderedElementsAreArray(Left));
+}
+
+TEST_F(LogDaily, BehindTheYear9999NothingRollsAndNoLineIsLost) {
+  const auto File = Add();
+  LogAt(cMidnight, "a");
+  LogAt(253402300800 * cSecond, "b");
+  LogAt(253402300800 * cSecond + cDay, "c");
+  std::string All;
+  for (const auto& [Name, Text] : Files()) All += Text;
+  EXPECT_EQ(All.size(), 3U);
+}
+
+}  // namespace
+}  // namespace zq
