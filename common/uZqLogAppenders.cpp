@@ -34,6 +34,13 @@ bool IsNumber(std::u16string_view AText) noexcept {
 
 bool IsBlank(const TFileName& AName) { return Trim(AName).IsEmpty(); }
 
+// What AConfig tells of an appender, read by ARead.
+template <class TRead>
+auto Configured(IZqLogConfigurator& AConfig, const TZqBaseAppender& AAppender, const char16_t* AKey,
+    TZqMainTypeKind AKind, const Variant& ADefault, TRead ARead) {
+  return ARead(AConfig.GetAppenderValue(AAppender.GetName(), AKey, AKind, ADefault));
+}
+
 }  // namespace
 
 // ---------------------------------------------------------------------------------------- TZqBaseAppender
@@ -66,7 +73,11 @@ void TZqBaseAppender::Write(
   if (!FInitialized && FInitializing == 0) Initialize();
 }
 
-void TZqBaseAppender::SetConfig(const IntfRef<IZqLogConfigurator>&) {}
+void TZqBaseAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
+  if (!AConfig) return;
+  const UnicodeString Layout = Configured(*AConfig, *this, u"Layout", mtkString, u"", VarToUStr);
+  if (!Layout.IsEmpty()) SetLayout(ShortString(Layout.ToUTF8()));
+}
 
 void TZqBaseAppender::SetLayout(const IntfRef<IZqLogLayout>& ALayout) {
   auto Bytes = ALayout.Supports<IZqLogByteLayout>();  // first: it asks the layout, which may raise
@@ -190,8 +201,16 @@ void TZqFileAppender::SetLayout(const IntfRef<IZqLogLayout>& ALayout) {
   TZqBaseAppender::SetLayout(ALayout);
 }
 
+// The extension first: a file name's own one leads, and that of a layout, which comes last, before both.
 void TZqFileAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
   const TScope Scope(FLock);
+  if (AConfig) {
+    FAppendExisting = Configured(*AConfig, *this, u"AppendExisting", mtkBoolean, true, VarToBool);
+    const UnicodeString Name = Configured(*AConfig, *this, u"FileName", mtkString, u"", VarToUStr);
+    const UnicodeString Ext = Configured(*AConfig, *this, u"FileExt", mtkString, u"", VarToUStr);
+    if (!Ext.IsEmpty()) SetFileExt(Ext);
+    if (!Name.IsEmpty()) SetFileName(Name);
+  }
   TZqBaseAppender::SetConfig(AConfig);
 }
 
@@ -465,6 +484,11 @@ void TZqRollingFileAppender::Initialize() {
 void TZqRollingFileAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
   const TScope Scope(FLock);
   TZqFileAppender::SetConfig(AConfig);
+  if (!AConfig) return;
+  FMaxFileSize =
+      static_cast<Cardinal>(Configured(*AConfig, *this, u"MaxFileSize", mtkInteger, Int64{FMaxFileSize}, VarToInt64));
+  SetMaxBackupCount(static_cast<Word>(
+      Configured(*AConfig, *this, u"MaxBackupCount", mtkInteger, Integer{FMaxBackupCount}, VarToInteger)));
 }
 
 Cardinal TZqRollingFileAppender::GetMaxFileSize() const {
@@ -650,6 +674,9 @@ void TZqDailyRollingFileAppender::Initialize() {
 void TZqDailyRollingFileAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
   const TScope Scope(FLock);
   TZqRollingFileAppender::SetConfig(AConfig);
+  if (!AConfig) return;
+  FDatePattern = Configured(*AConfig, *this, u"DatePattern", mtkString, FDatePattern, VarToUStr);
+  FNowTo = FNowFrom - 1;
 }
 
 std::unique_ptr<TZqFileInfo> TZqDailyRollingFileAppender::CreateFileInfo(const UnicodeString& AFileName) {

@@ -23,7 +23,8 @@ class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZq
 
   /// Opens what the appender writes to; the first Write does so too. Raises what the opening raises.
   virtual void Initialize();
-  /// For descendants that read settings; nothing here.
+  /// Takes what AConfig tells of the appender's name; null changes nothing. Raises EListError for a layout that nobody
+  /// has registered, and what the conversion of a value raises.
   virtual void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig);
   /// Initialises the appender if need be; a descendant calls it first and then writes.
   void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,

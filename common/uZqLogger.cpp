@@ -374,9 +374,36 @@ void TZqLogger::ReplaceConfig(
     const IntfRef<IZqLogConfigurator>& AConfig, std::vector<IntfRef<IZqLogConfigurator>>& AFormer) {
   const TLogLockScope Scope(FLock, FFullName, u".SetConfig");
   AFormer.push_back(SetConfigurator(AConfig));
-  if (AConfig) return;
+  if (AConfig) return TakeConfig(AConfig);
   const TLogLockScope Children(FChildLoggers.FLock, FFullName, u".SetConfig");
   for (TZqLogger* const Child : FChildLoggers.FList) Child->ReplaceConfig(nullptr, AFormer);
+}
+
+void TZqLogger::TakeConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
+  if (const auto Configuring = AConfig.Supports<IZqLogConfiguratorEx>()) Configuring->ConfigureLogger(this);
+  const auto ValueOf = [&](const char16_t* AKey, TZqMainTypeKind AKind, const Variant& ADefault) {
+    return AConfig->GetLoggerValue(FFullName, AKey, AKind, ADefault);
+  };
+  const Integer Level = VarToInteger(ValueOf(u"Level", mtkInteger, static_cast<Integer>(llDoNotLog)));
+  if (Level < 0 || Level > static_cast<Integer>(llDoNotLog))
+    throw EConvertError(u"%d is no log level, for the logger %s", {Level, FFullName});
+  SetLevel(static_cast<TZqLogLevel>(Level));
+  SetAdditive(VarToBool(ValueOf(u"Additive", mtkBoolean, GetAdditive())));
+  const Variant Names = ValueOf(u"Appenders", mtkArray, VarArrayOf({}));
+  const Integer Count = ZqVarArrayCount(Names);
+  const Integer First = Count == 0 ? 0 : VarArrayLowBound(Names, 1);
+  for (Integer i = 0; i < Count; ++i) AddNamed(AConfig, VarToUStr(VarArrayGet(Names, {First + i})));
+}
+
+// An appender that is alive under that name, whoever made it and as it is, or else a new one of the class that is told,
+// which configures itself.
+void TZqLogger::AddNamed(const IntfRef<IZqLogConfigurator>& AConfig, const UnicodeString& AName) {
+  const UnicodeString Class = VarToUStr(AConfig->GetAppenderValue(AName, u"class", mtkString, u""));
+  for (TZqLogBase* const Live : LiveAppenders())
+    if (Live->GetName() == AName) return AddAppender(IntfRef<IZqLogBase>(Live).As<IZqLogAppender>());
+  if (Class.IsEmpty()) return;
+  const TZqLogBaseClass Found = RegisteredAppenders()->GetClass(ShortString(Class.ToUTF8()));
+  AddAppender(IntfRef<IZqLogBase>(Found.Create(this, AName)).As<IZqLogAppender>());
 }
 
 IntfRef<TZqLogger> TZqLogger::FindOrMakeChild(const UnicodeString& AName, bool& AMade) {

@@ -187,7 +187,13 @@ struct ZQ_API _IZqLogLayout : Extends<IInterface> {
   ~_IZqLogLayout() = default;
 };
 
-/// Provided by a host: settings by the name of a logger or an appender.
+/// Provided by a host: settings by the name of a logger, its full one, or of an appender.
+///
+/// A logger asks for "Level" (0 to 7; llDoNotLog where nothing is told), "Additive" and "Appenders", an array of names;
+/// of each name that no live appender bears for "class". An appender asks for "Layout", one with a file for
+/// "AppendExisting", "FileName" and "FileExt", one that rolls for "MaxFileSize" and "MaxBackupCount", one that rolls by
+/// date for "DatePattern". It is asked on any thread that asks for a new logger or makes an appender, under the
+/// logger's lock and the appender's: it must not wait for another thread that logs.
 struct ZQ_API IZqLogConfigurator : Extends<IInterface> {
   static constexpr TGUID IID = "{28A992A8-9491-4F32-B3BC-851901F67357}"_guid;
   /// The value stored for that name and key, ADefault if there is none. AKind tells what the caller expects.
@@ -205,7 +211,7 @@ struct ZQ_API IZqLogConfigurator : Extends<IInterface> {
 
 struct ZQ_API IZqLogConfiguratorEx : Extends<IZqLogConfigurator> {
   static constexpr TGUID IID = "{A57D0CA9-7632-4A0E-8333-DAF4BDA6CF3E}"_guid;
-  /// To set up a logger that is given this configurator. The library doesn't call it yet.
+  /// Called with each logger that is given this configurator, before that asks for its keys.
   virtual void ConfigureLogger(TZqLogger* ALogger) = 0;
 
  protected:
@@ -609,6 +615,8 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   void CollectAppenders(std::vector<IntfRef<IZqLogAppender>>& AFound);
   IntfRef<IZqLogConfigurator> SetConfigurator(IntfRef<IZqLogConfigurator> AConfig);
   void ReplaceConfig(const IntfRef<IZqLogConfigurator>& AConfig, std::vector<IntfRef<IZqLogConfigurator>>& AFormer);
+  void TakeConfig(const IntfRef<IZqLogConfigurator>& AConfig);
+  void AddNamed(const IntfRef<IZqLogConfigurator>& AConfig, const UnicodeString& AName);
 
   // In this order, so that the children's list goes first at the end. What a message reads on its way up lies together.
   UnicodeString FName;

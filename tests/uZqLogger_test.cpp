@@ -3,10 +3,12 @@
 #include <gtest/gtest.h>
 
 #include <chrono>
+#include <map>
 #include <thread>
 
 #include "common/rZqCommon.h"
 #include "common/uZqSysUtils.h"
+#include "common/uZqTypes.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/format.h"
 #include "runtime/text/numbers.h"
@@ -337,28 +339,115 @@ TEST(AppenderRegistry, FindsClassesInAnyCaseAndNamesWhatIsMissing) {
   std::thread([&] { EXPECT_EQ(Fixture.Log->LockAppenders()->Count(), 0), Fixture.Log->UnLockAppenders(); }).join();
 }
 
-// ---------------------------------------------------------------------------------------- configuration's first steps
+// ---------------------------------------------------------------------------------------- configuration
 
-struct TConfig : Implements<TInterfacedObject, IZqLogConfigurator> {
+// Answers from a table by "name.key", and notes what it was asked.
+struct TConfig : Implements<TInterfacedObject, IZqLogConfiguratorEx> {
   using TText = const UnicodeString&;
-  Variant GetLoggerValue(TText, TText, TZqMainTypeKind, const Variant& A) override { return A; }
-  Variant GetAppenderValue(TText, TText, TZqMainTypeKind, const Variant& A) override { return A; }
+  Variant GetLoggerValue(TText AName, TText AKey, TZqMainTypeKind AKind, const Variant& A) override {
+    return Answer(AName, AKey, AKind, A);
+  }
+  Variant GetAppenderValue(TText AName, TText AKey, TZqMainTypeKind AKind, const Variant& A) override {
+    return Answer(AName, AKey, AKind, A);
+  }
   Variant GetValue(TText, TText, TZqMainTypeKind, const Variant& A) override { return A; }
+  void ConfigureLogger(TZqLogger* ALogger) override { Asked.push_back("configure " + ALogger->GetName().ToUTF8()); }
+  Variant Answer(TText AName, TText AKey, TZqMainTypeKind AKind, const Variant& ADefault) {
+    const UnicodeString Default = AKind == mtkArray ? IntToStr(ZqVarArrayCount(ADefault)) : VarToUStr(ADefault);
+    Asked.push_back(Format(u"%s.%s %d %s", {AName, AKey, static_cast<Integer>(AKind), Default}).ToUTF8());
+    const auto Found = Values.find((AName + u"." + AKey).ToUTF8());
+    return Found == Values.end() ? ADefault : Found->second;
+  }
+  std::map<std::string, Variant> Values;
+  TNotes Asked;
   IntfRef<IZqLogger> Kept;  // goes with the configurator
 };
 
-TEST(LoggerConfig, NewChildrenGetTheRootsAndNilGoesDown) {
+struct LoggerConfig : testing::Test {
+  ~LoggerConfig() override {
+    Logger()->SetConfig(nullptr);
+    Logger()->SetLevel(llDebug);
+    Logger()->ClearAppenders();
+  }
+  static Variant Names(std::initializer_list<const char16_t*> ANames) {
+    TArray<Variant> Items;
+    for (const char16_t* Name : ANames) Items.push_back(Variant(UnicodeString(Name)));
+    return VarArrayOf(Items);
+  }
+  IntfRef<IZqLogConfigurator> Config{New<TConfig>()};
+  TConfig& Told = dynamic_cast<TConfig&>(*Config);
+};
+
+TEST_F(LoggerConfig, NewChildrenGetTheRootsAndNilGoesDown) {
   const auto Parent = Logger()->GetLogger(u"p");
-  auto* const Config = New<TConfig>();
-  for (const char16_t* const Name : {u"p.k", u"k"}) Config->Kept = Logger()->GetLogger(Name);
-  Logger()->SetConfig(IntfRef<IZqLogConfigurator>(Config));
+  for (const char16_t* const Name : {u"p.k", u"k"}) Told.Kept = Logger()->GetLogger(Name);
+  Logger()->SetConfig(Config);
   const auto Child = Parent->GetLogger(u"c");
   const auto ConfigOf = [](const IntfRef<IZqLogger>& ALog) { return dynamic_cast<TZqLogger&>(*ALog).Configurator(); };
   EXPECT_TRUE(ConfigOf(Child));
   EXPECT_FALSE(ConfigOf(Parent)) << "not handed to children that exist";
+  Config.Reset();
   Logger()->SetConfig(nullptr);
   EXPECT_FALSE(ConfigOf(Child));
   EXPECT_EQ(Logger()->GetChildLoggers()->Count(), 1);
+  EXPECT_EQ(Child->GetLevel(), llDoNotLog) << "stays";
+}
+
+TEST_F(LoggerConfig, AsksForExactlyTheseKeysInThisOrder) {
+  Told.Values = {{"root.c.Level", 1}, {"root.c.Appenders", Names({u"daily", u"nobody"})},
+      {"daily.class", UnicodeString(u"tzqDAILYrollingfileappender")}};
+  const auto Log = Logger()->GetLogger(u"c");
+  Log->SetConfig(Config);
+  EXPECT_EQ(
+      Told.Asked, (TNotes{"configure root.c", "root.c.Level 1 7", "root.c.Additive 4 True", "root.c.Appenders 6 0",
+                      "daily.class 3 ", "daily.AppendExisting 4 True", "daily.FileName 3 ", "daily.FileExt 3 ",
+                      "daily.Layout 3 ", "daily.MaxFileSize 1 2147483647", "daily.MaxBackupCount 1 5",
+                      "daily.DatePattern 3 yyyy-mm-dd", "nobody.class 3 "}));
+  EXPECT_EQ(Log->GetAppenders()->Count(), 1);
+  EXPECT_EQ(Log->GetLevel(), llTrace);
+}
+
+TEST_F(LoggerConfig, AppendersAreMadeOnceAndTakeTheirSettings) {
+  const TTempFolder Folder;
+  const UnicodeString Path = Folder.File("log");
+  Told.Values = {{"root.a.Level", 3}, {"root.b.Level", UnicodeString(u"2")}, {"root.a.Additive", false},
+      {"root.a.Appenders", Names({u"file"})}, {"root.b.Appenders", Names({u"file", u"FILE"})},
+      {"file.class", UnicodeString(u"TZqRollingFileAppender")}, {"file.Layout", UnicodeString(u"tzqsimplelayout")},
+      {"file.FileName", Path}, {"file.FileExt", UnicodeString(u"txt")},
+      {"file.AppendExisting", UnicodeString(u"False")}, {"file.MaxFileSize", Int64{0x100000400}},
+      {"file.MaxBackupCount", 7}};
+  Logger()->SetConfig(Config);
+  const auto A = Logger()->GetLogger(u"a"), B = Logger()->GetLogger(u"b");
+  ASSERT_EQ(B->GetAppenders()->Count(), 1);
+  const auto File = A->GetAppenders()->GetAppender(0).As<IZqRollingFileAppender>();
+  EXPECT_EQ(B->GetAppenders()->GetAppender(0), A->GetAppenders()->GetAppender(0));
+  EXPECT_EQ(File->GetFileName(), Path + u".txt");
+  EXPECT_TRUE(!File->GetAppendExisting() && File->GetMaxFileSize() == 0x400 && File->GetMaxBackupCount() == 7);
+  EXPECT_TRUE(!A->GetAdditive() && B->GetAdditive() && A->GetLevel() == llInfo && B->GetLevel() == llDebug);
+  A->Info(u"written");
+  EXPECT_NE(Folder.Read("log.txt").find("root.a - written"), std::string::npos);
+  A->SetConfig(Config);
+  EXPECT_EQ(A->GetAppenders()->Count(), 1);
+}
+
+TEST_F(LoggerConfig, WhatItCannotTakeIsRaisedAndTheLockIsFree) {
+  const std::tuple<const char*, Variant, const char16_t*> cCases[] = {
+      {"x.class", UnicodeString(u"TNone"), u"EListError: Class TNone not found!"},
+      {"x.Layout", UnicodeString(u"TNone"), u"EListError: Class TNone not found!"},
+      {"root.e.Level", 8, u"EConvertError: 8 is no log level, for the logger root.e"},
+      {"root.e.Level", -1, u"EConvertError: -1 is no log level, for the logger root.e"},
+      {"root.e.Level", UnicodeString(u"Info"), u"EVariantTypeCast"},
+      {"root.e.Additive", UnicodeString(u"maybe"), u"EVariantTypeCast"},
+      {"x.MaxFileSize", UnicodeString(u"big"), u"EVariantTypeCast"}};
+  for (const auto& [Key, Value, Error] : cCases) {
+    Told.Values = {{"root.e.Level", 3}, {"root.e.Appenders", Names({u"x"})},
+        {"x.class", UnicodeString(u"TZqRollingFileAppender")}};
+    Told.Values[Key] = Value;
+    const auto Log = Logger()->GetLogger(u"e");
+    EXPECT_TRUE(RaisedBy([&] { Log->SetConfig(Config); }).View().starts_with(UnicodeString(Error).View())) << Key;
+    std::thread([&] { Logger()->GetLogger(u"e.below"); }).join();
+    EXPECT_EQ(LiveAppenders().size(), 0U);
+  }
 }
 
 // ---------------------------------------------------------------------------------------- values and events
