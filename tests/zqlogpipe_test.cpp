@@ -106,6 +106,18 @@ TEST_F(Pipe, OptionsOfFormAndOutput) {
   EXPECT_THAT(Run("-h"), StartsWith("0: usage: "));
 }
 
+TEST_F(Pipe, AFileOfAnEarlierPeriodIsNamedByItsDate) {
+  Folder.Write("in", "one\n");
+  Folder.Write("app.log", "old");
+  std::this_thread::sleep_for(std::chrono::milliseconds(1100));
+  EXPECT_EQ(Run("--pattern=hhnnss --quiet --file app in"), "0: ");
+  std::vector<std::string> Names = Folder.Names();
+  ASSERT_EQ(Names.size(), 3U);
+  EXPECT_EQ(Folder.Read(Names[0]), "old");
+  EXPECT_TRUE(Names[0].starts_with("app.") && Names[0].size() == std::string("app.hhnnss.log").size());
+  EXPECT_EQ(Texts(Folder.Read("app.log")), std::vector<std::string>{"one"});
+}
+
 TEST_F(Pipe, SignalsBeginTheFileAgainAndEndIt) {
   Folder.Write("script", "see() { until grep -q $1 $2 2>/dev/null; do sleep 0.05; done; }; mkfifo f; " ZQ_TEST_LOGPIPE
                          " --file app.log <f & p=$!; exec 3>f; echo one >&3; see one app.log; mv app.log old.log; "

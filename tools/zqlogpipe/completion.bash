@@ -7,10 +7,10 @@ _zqlogpipe() {
     --level)
       mapfile -t COMPREPLY < <(compgen -W 'trace debug info warn warning error fatal' -- "$word")
       return ;;
-    --max-size | --backups | --logger | --retry) return ;;
+    --max-size | --backups | --pattern | --logger | --retry) return ;;
   esac
   if [[ $word == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--file --max-size --backups --no-append --logger --level --detect-level
+    mapfile -t COMPREPLY < <(compgen -W '--file --max-size --backups --daily --pattern --no-append --logger --level --detect-level
       --no-time --tee --retry --quiet --version --help' -- "$word")
   else
     compopt -o filenames

@@ -41,6 +41,10 @@ constexpr char cHelp[] =
     "  --max-size BYTES  a file that has reached this size is rolled, 0 for never (10M); K, M and G behind the number\n"
     "                    stand for its powers of 1024\n"
     "  --backups COUNT   files of the series, FILE among them, 1 to 65535 (5)\n"
+    "  --daily           roll at midnight too, and name the old file by the day on which it was begun; the size is "
+    "unlimited\n"
+    "                    then unless --max-size is given\n"
+    "  --pattern TEXT    the same for the period that this pattern of a date tells (yyyy-mm-dd)\n"
     "  --no-append       begin a new FILE; one that exists becomes a backup\n"
     "  --logger NAME     dotted path of the logger below the root (zqlogpipe)\n"
     "  --level LEVEL     level of the lines: trace, debug, info, warn or warning, error, fatal (info)\n"
@@ -75,7 +79,8 @@ class TUsageError : public std::runtime_error {
 struct TOptions {
   std::vector<std::string> Files;
   std::vector<std::string> Inputs;
-  Cardinal MaxSize = 10485760;
+  std::optional<Cardinal> MaxSize;  // the appender's own
+  std::string Pattern;              // of the date that names old files; empty where the size alone rolls
   Word Backups = 5;
   bool Append = true;
   std::string Logger = "zqlogpipe";
@@ -152,6 +157,8 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
     if (Word == "--file") Result.Files.push_back(Value());
     else if (Word == "--max-size") Result.MaxSize = Bytes(Word, Value());
     else if (Word == "--backups") Result.Backups = Number<zq::Word>(Word, Value(), 1);
+    else if (Word == "--daily") Result.Pattern = "yyyy-mm-dd";
+    else if (Word == "--pattern") Result.Pattern = Value();
     else if (Word == "--no-append") Result.Append = false;
     else if (Word == "--logger") Result.Logger = Value();
     else if (Word == "--detect-level") Result.DetectLevel = true;
@@ -228,41 +235,51 @@ class TNoTimeLayout : public Implements<TZqSimpleLayout, IZqLogByteLayout> {
   ~TNoTimeLayout() override = default;
 };
 
-/// Counts rolls, and keeps the failures that a logger never shows. A line that can't be written is tried again, where
-/// that is wanted, until a signal ends the tool.
-class TPipeAppender : public TZqRollingFileAppender {
- public:
-  using TZqRollingFileAppender::TZqRollingFileAppender;
-  void RollOver() override {
-    const Cardinal Before = FFileStream ? FFileStream->Size() : 0;
-    TZqRollingFileAppender::RollOver();
-    if (!FFileStream || FFileStream->Size() < Before) ++Rolls;  // not where the file goes on
-  }
-  void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
-      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override {
-    for (;; Wait(-1, static_cast<int>(std::min(Retry, cMostSeconds) * 1000))) try {
-        TZqRollingFileAppender::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
-        if (!FFileStream) throw Exception(u"The file isn't open: " + GetFileName());  // since a roll
-        ++Written;
-        return;
-      } catch (const Exception& e) {
-        if (Retry == 0 || StopSignal != 0) {
-          if (Failed++ == 0) Failure = e.Message();
-          throw;
-        }
-        if (Waits++ == 0) std::fprintf(stderr, "zqlogpipe: waiting: %s\n", e.what());
-      }
-  }
-  static constexpr Cardinal cMostSeconds = 86400;
-  Cardinal Retry = 0;  // seconds
-  std::size_t Waits = 0;
+/// What became of an appender's lines.
+struct TCounts {
   std::size_t Rolls = 0;
   std::size_t Written = 0;
   std::size_t Failed = 0;
-  UnicodeString Failure;
+  UnicodeString Failure;  // the first
+};
+
+/// Counts rolls, and keeps the failures that a logger never shows. A line that can't be written is tried again, where
+/// that is wanted, until a signal ends the tool.
+template <class TRolling>
+class TPipeAppender : public TRolling {
+ public:
+  TPipeAppender(TCounts& ACounts, Cardinal ARetry)
+      : TRolling(Logger(), u""), FCounts(ACounts), FRetry(std::min(ARetry, cMostSeconds)) {}
+  void RollOver() override {
+    const Cardinal Before = Size();
+    TRolling::RollOver();
+    if (!this->FFileStream || Size() < Before) ++FCounts.Rolls;  // not where the file goes on
+  }
+  void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override {
+    for (;; Wait(-1, static_cast<int>(FRetry * 1000))) try {
+        TRolling::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
+        if (!this->FFileStream) throw Exception(u"The file isn't open: " + this->GetFileName());  // since a roll
+        ++FCounts.Written;
+        return;
+      } catch (const Exception& e) {
+        if (FRetry == 0 || StopSignal != 0) {
+          if (FCounts.Failed++ == 0) FCounts.Failure = e.Message();
+          throw;
+        }
+        if (!std::exchange(FWaiting, true)) std::fprintf(stderr, "zqlogpipe: waiting: %s\n", e.what());
+      }
+  }
 
  protected:
   ~TPipeAppender() override = default;
+
+ private:
+  static constexpr Cardinal cMostSeconds = 86400;
+  [[nodiscard]] Cardinal Size() const { return this->FFileStream ? this->FFileStream->Size() : 0; }
+  TCounts& FCounts;
+  const Cardinal FRetry;  // seconds
+  bool FWaiting = false;
 };
 
 /// The text of a line: UTF-8, with each byte that is none taken as the character of its code.
@@ -311,32 +328,28 @@ class TPipe {
   }
 
   [[nodiscard]] std::size_t Read() const { return FRead; }
-  [[nodiscard]] std::size_t Sum(std::size_t TPipeAppender::*AField) const {
-    std::size_t Result = 0;
-    for (const TPipeAppender* const Appender : FPipes) Result += Appender->*AField;
-    return Result;
-  }
-  [[nodiscard]] std::string Failure() const {
-    for (const TPipeAppender* const Appender : FPipes)
-      if (Appender->Failed != 0) return Appender->Failure.ToUTF8();
-    return {};
-  }
+  [[nodiscard]] const TCounts& Counts() const { return FCounts; }
 
  private:
   static std::string Reason(const std::string& AName) { return AName + ": " + std::strerror(errno); }
 
   void AddAppender(const std::string& AFile) {
-    auto* const Appender = New<TPipeAppender>(Logger(), u"");
-    FAppenders.emplace_back(Appender);
-    FPipes.push_back(Appender);
-    Appender->SetFileName(utf8::Decode(AFile, utf8::TMalformed::Escape));
-    Appender->SetMaxFileSize(FOptions.MaxSize);
-    Appender->SetMaxBackupCount(FOptions.Backups);
-    Appender->SetAppendExisting(FOptions.Append);
-    Appender->SetRetryInterval(1);  // after a roll that couldn't open its new file
-    Appender->Retry = FOptions.Retry;
-    Appender->SetLayout(FOptions.Time ? TZqLogBaseClass::Of<TZqSimpleLayout>() : TZqLogBaseClass::Of<TNoTimeLayout>());
-    Appender->Initialize();  // a file that can't be opened shows here, before the first line
+    if (FOptions.Pattern.empty())
+      return Add(AFile, New<TPipeAppender<TZqRollingFileAppender>>(FCounts, FOptions.Retry));
+    auto* const Appender = New<TPipeAppender<TZqDailyRollingFileAppender>>(FCounts, FOptions.Retry);
+    Appender->SetDatePattern(FOptions.Pattern);
+    Add(AFile, Appender);
+  }
+
+  void Add(const std::string& AFile, TZqRollingFileAppender* AAppender) {
+    FAppenders.emplace_back(AAppender);
+    AAppender->SetFileName(utf8::Decode(AFile, utf8::TMalformed::Escape));
+    if (FOptions.MaxSize) AAppender->SetMaxFileSize(*FOptions.MaxSize);
+    AAppender->SetMaxBackupCount(FOptions.Backups);
+    AAppender->SetAppendExisting(FOptions.Append);
+    AAppender->SetRetryInterval(1);  // after a roll that couldn't open its new file
+    AAppender->SetLayout(FOptions.Time ? TZqLogBaseClass::Of<TZqSimpleLayout>() : TZqLogBaseClass::Of<TNoTimeLayout>());
+    AAppender->Initialize();  // a file that can't be opened shows here, before the first line
     FLogger->AddAppender(FAppenders.back());
   }
 
@@ -364,9 +377,9 @@ class TPipe {
   }
 
   const TOptions& FOptions;
+  TCounts FCounts;
   IntfRef<IZqLogger> FLogger;
   std::vector<IntfRef<IZqLogAppender>> FAppenders;
-  std::vector<TPipeAppender*> FPipes;
   std::size_t FRead = 0;
 };
 
@@ -391,12 +404,13 @@ int Pipe(const TOptions& AOptions) {
   } catch (const Exception& e) {
     Complain(e.what());
   }
-  if (const std::size_t Failed = Pipe.Sum(&TPipeAppender::Failed))
-    Complain(std::to_string(Failed) + " lines were not written: " + Pipe.Failure());
+  const TCounts& Counts = Pipe.Counts();
+  if (Counts.Failed != 0)
+    Complain(std::to_string(Counts.Failed) + " lines were not written: " + Counts.Failure.ToUTF8());
   const std::chrono::duration<double> Seconds = std::chrono::steady_clock::now() - Begin;
   if (!AOptions.Quiet)
     std::fprintf(stderr, "zqlogpipe: %zu lines read, %zu lines written, %zu files rolled, %.3f s\n", Pipe.Read(),
-        Pipe.Sum(&TPipeAppender::Written), Pipe.Sum(&TPipeAppender::Rolls), Seconds.count());
+        Counts.Written, Counts.Rolls, Seconds.count());
   return StopSignal != 0 ? 128 + StopSignal : Status;
 }
 
