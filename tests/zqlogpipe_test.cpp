@@ -1,7 +1,9 @@
 #include <gmock/gmock.h>
 #include <sys/wait.h>
 
+#include <chrono>
 #include <cstdio>
+#include <thread>
 
 #include "tests/support/support.h"
 
