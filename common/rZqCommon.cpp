@@ -17,6 +17,7 @@ constexpr TPackageUnit cUnits[] = {
     {u"uZqSysUtils", uZqSysUtils::Start, uZqSysUtils::Stop},
     {u"uZqTypes", uZqTypes::Start, uZqTypes::Stop},
     {u"uZqClasses", uZqClasses::Start, uZqClasses::Stop},
+    {u"uZqBase64", nullptr, nullptr},
     {u"uZqWindows", nullptr, nullptr},
     {u"uZqLogLayouts", uZqLogLayouts::Start, uZqLogLayouts::Stop},
     {u"uZqLogger", uZqLogger::Start, uZqLogger::Stop},
@@ -43,7 +44,7 @@ const TPackageInfo& GetPackageInfoTable() {
   static const TPackageInfo& Table = *new TPackageInfo{
       cUnits, {TypeInfo<TZqLogLevel>(), TypeInfo<TZqLogIndent>(), TypeInfo<TZqTypeKind>(), TypeInfo<TZqMainTypeKind>(),
                   TypeInfo<TZqNullableBool>(), TypeInfo<TZqCharCase>(), TypeInfo<TZqBitness>(),
-                  TypeInfo<TZqAutoDestroy>(), TypeInfo<TZqObjectOwnership>()}};
+                  TypeInfo<TZqAutoDestroy>(), TypeInfo<TZqObjectOwnership>(), TypeInfo<TZqBinEncoding>()}};
   return Table;
 }
 

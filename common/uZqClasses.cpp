@@ -13,6 +13,7 @@ void uZqClasses::Start() {
   if (!Starts.Begins()) return;
   DescribeType<TZqAutoDestroy>(u"uZqClasses").EnumNames({u"radComputed", u"radFalse", u"radTrue"});
   DescribeType<TZqObjectOwnership>(u"uZqClasses").EnumNames({u"ooReference", u"ooOwned"});
+  DescribeType<TZqBinEncoding>(u"uZqClasses").EnumNames({u"beBase64", u"beHexEncoded"});
 }
 
 void uZqClasses::Stop() { Starts.Ends(); }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "common/uZqClasses/component.h"
+#include "common/uZqClasses/hex.h"
 #include "common/uZqClasses/objects.h"
 #include "runtime/component/bindings.h"  // what Bind raises
 
