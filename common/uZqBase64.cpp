@@ -57,12 +57,13 @@ __m128i Load16(const void* AFrom) noexcept { return _mm_loadu_si128(static_cast<
 }
 
 // 24 bytes at a time, as long as there are the 28 that are read for them.
-[[gnu::target("avx2")]] void EncodeRunAvx2(base64::TEncoder& AEncoder) noexcept {
+[[gnu::target("avx2")]] base64::TEncoder EncodeRunAvx2(base64::TEncoder AEncoder) noexcept {
   for (; AEncoder.Left() >= 28; AEncoder.From += 24, AEncoder.To += 32) {
     const __m256i Bytes =
         _mm256_inserti128_si256(_mm256_castsi128_si256(Load16(AEncoder.From)), Load16(AEncoder.From + 12), 1);
     _mm256_storeu_si256(reinterpret_cast<__m256i*>(AEncoder.To), ToCharacters(Split(Bytes)));
   }
+  return AEncoder;
 }
 
 // A character is in the alphabet when its high and its low half agree. Each high half is of a class, a bit:
@@ -75,7 +76,7 @@ __m128i Load16(const void* AFrom) noexcept { return _mm_loadu_si128(static_cast<
 }
 
 // 32 characters at a time, as long as all of them are in the alphabet and the 32 bytes that are written for them fit.
-[[gnu::target("avx2")]] void DecodeRunAvx2(base64::TDecoder& ADecoder) noexcept {
+[[gnu::target("avx2")]] base64::TDecoder DecodeRunAvx2(base64::TDecoder ADecoder) noexcept {
   constexpr char cCapital = -'A';
   constexpr char cSmall = 26 - 'a';
   // By the high half, one less for "/".
@@ -96,21 +97,20 @@ __m128i Load16(const void* AFrom) noexcept { return _mm_loadu_si128(static_cast<
     _mm256_storeu_si256(reinterpret_cast<__m256i*>(ADecoder.To),
         _mm256_permutevar8x32_epi32(Bytes, _mm256_setr_epi32(0, 1, 2, 4, 5, 6, 7, 7)));
   }
+  return ADecoder;
 }
 
 std::size_t Encode(std::span<const Byte> ASource, char* ADest) noexcept {
   base64::TEncoder Encoder{ASource.data(), ASource.data() + ASource.size(), ADest};
-  if (HasAvx2()) EncodeRunAvx2(Encoder);
+  if (HasAvx2()) Encoder = EncodeRunAvx2(Encoder);
   const auto Rest = static_cast<std::size_t>(Encoder.Left());
   return static_cast<std::size_t>(Encoder.To - ADest) + base64::Encode(Encoder.From, Rest, Encoder.To);
 }
 
 std::size_t Decode(std::string_view AText, Byte* ADest) noexcept {
   if (!HasAvx2()) return base64::Decode(AText, ADest);
-  return base64::Decode(AText, ADest, [](base64::TDecoder& ADecoder) {
-    DecodeRunAvx2(ADecoder);
-    base64::DecodeRun(ADecoder);
-  });
+  return base64::Decode(
+      AText, ADest, [](const base64::TDecoder& ADecoder) { return base64::DecodeRun(DecodeRunAvx2(ADecoder)); });
 }
 
 #else

@@ -45,6 +45,8 @@ inline void StoreBigEndian(Byte* ATo, std::uint64_t AValue) noexcept {
 
 [[nodiscard]] constexpr std::size_t EncodedSize(std::size_t ASize) noexcept { return (ASize + 2) / 3 * 4; }
 
+// Steps take where they stand and return it: behind a reference it would be fetched again after each character written.
+
 /// Where an encoder stands. To has room for the EncodedSize of what is left.
 struct TEncoder {
   const Byte* From;
@@ -55,28 +57,32 @@ struct TEncoder {
 };
 
 /// Six bytes at a time, as long as there are the eight that are read for them.
-inline void EncodeRun(TEncoder& AEncoder) noexcept {
+[[nodiscard]] inline TEncoder EncodeRun(TEncoder AEncoder) noexcept {
   for (; AEncoder.Left() >= 8; AEncoder.From += 6, AEncoder.To += 8) {
     const std::uint64_t Bits = LoadBigEndian(AEncoder.From);
-    for (unsigned i = 0; i < 4; ++i) std::memcpy(AEncoder.To + 2 * i, &cPairs[Bits >> (52 - 12 * i) & 0xFFF], 2);
+    const auto Pair = [&](std::size_t AIndex) {
+      std::memcpy(AEncoder.To + 2 * AIndex, &cPairs[Bits >> (52 - 12 * AIndex) & 0xFFFU], 2);
+    };
+    Pair(0), Pair(1), Pair(2), Pair(3);
   }
+  return AEncoder;
 }
 
 /// One, two or three bytes, the last of a text padded.
-inline void EncodeGroup(TEncoder& AEncoder) noexcept {
+[[nodiscard]] inline TEncoder EncodeGroup(TEncoder AEncoder) noexcept {
   const std::size_t Count = AEncoder.Left() < 3 ? static_cast<std::size_t>(AEncoder.Left()) : 3;
   std::uint32_t Bits = 0;
   for (std::size_t i = 0; i < 3; ++i) Bits = Bits << 8U | (i < Count ? AEncoder.From[i] : 0U);
   for (std::size_t i = 0; i < 4; ++i) AEncoder.To[i] = i <= Count ? cAlphabet[Bits >> (18 - 6 * i) & 63U] : '=';
   AEncoder.From += Count;
   AEncoder.To += 4;
+  return AEncoder;
 }
 
 /// Returns the characters written, which are EncodedSize(ASize).
 inline std::size_t Encode(const Byte* ASource, std::size_t ASize, char* ADest) noexcept {
-  TEncoder Encoder{ASource, ASource + ASize, ADest};
-  EncodeRun(Encoder);
-  while (Encoder.Left() > 0) EncodeGroup(Encoder);
+  TEncoder Encoder = EncodeRun({ASource, ASource + ASize, ADest});
+  while (Encoder.Left() > 0) Encoder = EncodeGroup(Encoder);
   return static_cast<std::size_t>(Encoder.To - ADest);
 }
 
@@ -94,27 +100,35 @@ struct TDecoder {
   [[nodiscard]] std::ptrdiff_t Left() const noexcept { return End - From; }
 };
 
-/// The 24 bits of four characters; not all of the bits above are 0 where one of them is not in the alphabet.
+/// The bits of each character at each of the four places of a group; all 32 of them where it has no value.
+inline constexpr std::array<std::array<std::uint32_t, 256>, 4> cPlaced = [] {
+  std::array<std::array<std::uint32_t, 256>, 4> Result{};
+  for (std::size_t Place = 0; Place < 4; ++Place)
+    for (std::size_t i = 0; i < 256; ++i)
+      Result[Place][i] = cValues[i] == cNoValue ? ~std::uint32_t{0} : std::uint32_t{cValues[i]} << (18 - 6 * Place);
+  return Result;
+}();
+
+/// The 24 bits of four characters; more where one of them is not in the alphabet.
 inline std::uint32_t GroupBits(const char* AFrom) noexcept {
-  const auto Value = [AFrom](int AIndex) {  // all bits are 1 for cNoValue
-    return static_cast<std::uint32_t>(static_cast<std::int8_t>(cValues[static_cast<Byte>(AFrom[AIndex])]));
-  };
-  return Value(0) << 18U | Value(1) << 12U | Value(2) << 6U | Value(3);
+  const auto Placed = [AFrom](std::size_t APlace) { return cPlaced[APlace][static_cast<Byte>(AFrom[APlace])]; };
+  return Placed(0) | Placed(1) | Placed(2) | Placed(3);
 }
 
 /// Eight characters at a time, as long as all of them are in the alphabet and the eight bytes that are written for them
 /// fit.
-inline void DecodeRun(TDecoder& ADecoder) noexcept {
+[[nodiscard]] inline TDecoder DecodeRun(TDecoder ADecoder) noexcept {
   for (; ADecoder.Left() >= 12; ADecoder.From += 8, ADecoder.To += 6) {
     const std::uint32_t High = GroupBits(ADecoder.From);
     const std::uint32_t Low = GroupBits(ADecoder.From + 4);
-    if ((High | Low) >> 24U != 0) return;
+    if ((High | Low) >> 24U != 0) break;
     StoreBigEndian(ADecoder.To, std::uint64_t{High} << 40U | std::uint64_t{Low} << 16U);
   }
+  return ADecoder;
 }
 
 /// The next four characters of the alphabet, or as many as there are, past all that is not in it.
-inline void DecodeGroup(TDecoder& ADecoder) noexcept {
+[[nodiscard]] inline TDecoder DecodeGroup(TDecoder ADecoder) noexcept {
   std::uint32_t Bits = 0;
   unsigned Count = 0;
   for (; ADecoder.Left() > 0 && Count < 4; ++ADecoder.From) {
@@ -124,6 +138,7 @@ inline void DecodeGroup(TDecoder& ADecoder) noexcept {
     ++Count;
   }
   for (unsigned i = 0; i < Count * 6 / 8; ++i) *ADecoder.To++ = static_cast<Byte>(Bits >> (16 - 8 * i));
+  return ADecoder;
 }
 
 /// Decodes a text whose length is a multiple of 4 into the room of its DecodedCapacity, and returns the bytes written.
@@ -131,10 +146,7 @@ inline void DecodeGroup(TDecoder& ADecoder) noexcept {
 template <class TRun>
 std::size_t Decode(std::string_view AText, Byte* ADest, TRun ARun) noexcept {
   TDecoder Decoder{AText.data(), AText.data() + AText.size(), ADest};
-  while (Decoder.Left() > 0) {
-    ARun(Decoder);
-    DecodeGroup(Decoder);
-  }
+  while (Decoder.Left() > 0) Decoder = DecodeGroup(ARun(Decoder));
   return static_cast<std::size_t>(Decoder.To - ADest);
 }
 inline std::size_t Decode(std::string_view AText, Byte* ADest) noexcept { return Decode(AText, ADest, DecodeRun); }
