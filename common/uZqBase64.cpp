@@ -216,7 +216,6 @@ TBytes ZqDecodeBase64(const WideString& AValue) { return ZqDecodeBase64(TZqEncod
 void* ZqDecodeBase64(std::string_view AValue, NativeUInt& ASize) {
   ASize = 0;
   TestLength(AValue);
-  if (AValue.empty()) return nullptr;
   std::unique_ptr<void, decltype(&FreeMem)> Block(GetMem(base64::DecodedCapacity(AValue.size())), &FreeMem);
   ASize = Decode(AValue, static_cast<Byte*>(Block.get()));
   return ASize == 0 ? nullptr : Block.release();
