@@ -5,7 +5,6 @@
 #endif
 
 #include <algorithm>
-#include <cstdlib>
 #include <memory>
 #include <optional>
 #include <span>
