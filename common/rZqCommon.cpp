@@ -3,6 +3,7 @@
 #include <iterator>
 
 #include "common/uZqClasses.h"
+#include "common/uZqDateTimeUtils.h"
 #include "common/uZqLogAppenders.h"
 #include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
@@ -15,6 +16,7 @@ namespace {
 
 constexpr TPackageUnit cUnits[] = {
     {u"uZqSysUtils", uZqSysUtils::Start, uZqSysUtils::Stop},
+    {u"uZqDateTimeUtils", uZqDateTimeUtils::Start, uZqDateTimeUtils::Stop},
     {u"uZqTypes", uZqTypes::Start, uZqTypes::Stop},
     {u"uZqClasses", uZqClasses::Start, uZqClasses::Stop},
     {u"uZqBase64", nullptr, nullptr},
@@ -44,6 +46,8 @@ const TPackageInfo& GetPackageInfoTable() {
   static const TPackageInfo& Table = *new TPackageInfo{
       cUnits, {TypeInfo<TZqLogLevel>(), TypeInfo<TZqLogIndent>(), TypeInfo<TZqTypeKind>(), TypeInfo<TZqMainTypeKind>(),
                   TypeInfo<TZqNullableBool>(), TypeInfo<TZqCharCase>(), TypeInfo<TZqBitness>(),
+                  TypeInfo<TZqWeekFormat>(), TypeInfo<TZqDatePeriod>(), TypeInfo<TZqWorkDayAdjustment>(),
+                  TypeInfo<TZqDecodeType>(), TypeInfo<TZqTimeRange>(), TypeInfo<TZqTimeFormat>(),
                   TypeInfo<TZqAutoDestroy>(), TypeInfo<TZqObjectOwnership>(), TypeInfo<TZqBinEncoding>()}};
   return Table;
 }

@@ -52,10 +52,6 @@ std::optional<TSystemTime> PartsOf(TDateTime AValue) noexcept {
   return Result;
 }
 
-TDateTime Joined(TDateTime ADate, TDateTime ATime) noexcept {
-  return ADate.Value < 0 ? ADate.Value - ATime.Value : ADate.Value + ATime.Value;
-}
-
 }  // namespace
 
 bool TryEncodeDate(Word AYear, Word AMonth, Word ADay, TDateTime& AResult) noexcept {
@@ -112,8 +108,19 @@ TSystemTime DateTimeToSystemTime(TDateTime AValue) {
 }
 
 TDateTime SystemTimeToDateTime(const TSystemTime& AValue) {
-  return Joined(EncodeDate(AValue.Year, AValue.Month, AValue.Day),
+  return JoinDateTime(EncodeDate(AValue.Year, AValue.Month, AValue.Day),
       EncodeTime(AValue.Hour, AValue.Minute, AValue.Second, AValue.Milliseconds));
+}
+
+TDateTime JoinDateTime(TDateTime ADate, TDateTime ATime) noexcept {
+  return ADate.Value < 0 ? ADate.Value - ATime.Value : ADate.Value + ATime.Value;
+}
+
+TDateTime ShiftDateTime(TDateTime AValue, double ADays) noexcept {
+  // Below 0 day and fraction have one sign, though the fraction counts forward; between, the number just grows.
+  const double Grows = AValue < 0 ? 2 * std::trunc(AValue) - AValue.Value : AValue.Value;
+  const double Sum = Grows + ADays;
+  return Sum < 0 ? 2 * std::floor(Sum) - Sum : Sum;
 }
 
 TDateTime FileDateToDateTime(Integer AFileDate) {
@@ -444,7 +451,7 @@ bool TryStrToDateTime(const UnicodeString& AText, TDateTime& AResult, const TFor
   TDateTime Date;
   TDateTime Time;
   if (!Reader.ReadDate(Date) || !Reader.ReadTime(Time) || !Reader.AtEnd()) return false;
-  AResult = Joined(Date, Time);
+  AResult = JoinDateTime(Date, Time);
   return true;
 }
 

@@ -65,6 +65,10 @@ ZQ_API void DecodeTime(TDateTime AValue, Word& AHour, Word& AMinute, Word& ASeco
 [[nodiscard]] ZQ_API TSystemTime DateTimeToSystemTime(TDateTime AValue);
 /// DayOfWeek plays no part. Raises EConvertError.
 [[nodiscard]] ZQ_API TDateTime SystemTimeToDateTime(const TSystemTime& AValue);
+/// ADate at ATime, a time of day from 0 on. Their sum is that only from 1899-12-30 on.
+[[nodiscard]] ZQ_API TDateTime JoinDateTime(TDateTime ADate, TDateTime ATime) noexcept;
+/// The moment so many days later, also across 1899-12-30, where the sum of the numbers is another moment.
+[[nodiscard]] ZQ_API TDateTime ShiftDateTime(TDateTime AValue, double ADays) noexcept;
 /// The date of a file as two packed words: year since 1980, month, day; hour, minute, seconds by two. Raises
 /// EConvertError.
 [[nodiscard]] ZQ_API TDateTime FileDateToDateTime(Integer AFileDate);
