@@ -276,37 +276,46 @@ Integer ZqStrToTimeToInt(
 
 namespace {
 
+constexpr std::size_t cISOLength = 23;
 constexpr std::u16string_view cMonths = u"JANFEBMARAPRMAYJUNJULAUGSEPOCTNOVDEC";
 
-// A short text of fields with fixed widths.
+// A text of fields with fixed widths, written where it stays.
 class TFieldWriter {
  public:
-  TFieldWriter& Number(unsigned AValue, std::size_t AWidth, char16_t APad = u'0') noexcept {
-    FLength += AWidth;
-    char16_t* Place = FText.data() + FLength;
+  explicit TFieldWriter(std::size_t ALength) : FText(ALength, u' '), FNext(FText.data()) {}
+
+  TFieldWriter& Number(unsigned AValue, std::ptrdiff_t AWidth, char16_t APad = u'0') noexcept {
+    char16_t* const First = FNext;
+    FNext += AWidth;
+    char16_t* Place = FNext;
     *--Place = static_cast<char16_t>(u'0' + AValue % 10);
-    for (std::size_t i = 1; i < AWidth; ++i) {
+    while (Place != First) {
       AValue /= 10;
       *--Place = AValue == 0 ? APad : static_cast<char16_t>(u'0' + AValue % 10);
     }
     return *this;
   }
   TFieldWriter& Text(std::u16string_view AText) noexcept {
-    FLength += AText.copy(FText.data() + FLength, AText.size());
+    FNext += AText.copy(FNext, AText.size());
     return *this;
   }
   TFieldWriter& Date(const TSystemTime& AParts) noexcept {
-    return Number(AParts.Year, 4).Text(u"-").Number(AParts.Month, 2).Text(u"-").Number(AParts.Day, 2);
+    return Number(AParts.Year, 4).Mark(u'-').Number(AParts.Month, 2).Mark(u'-').Number(AParts.Day, 2);
   }
   TFieldWriter& Time(const TSystemTime& AParts) noexcept {
-    Text(u"T").Number(AParts.Hour, 2).Text(u":").Number(AParts.Minute, 2).Text(u":").Number(AParts.Second, 2);
-    return Text(u".").Number(AParts.Milliseconds, 3);
+    Mark(u'T').Number(AParts.Hour, 2).Mark(u':').Number(AParts.Minute, 2).Mark(u':').Number(AParts.Second, 2);
+    return Mark(u'.').Number(AParts.Milliseconds, 3);
   }
-  [[nodiscard]] UnicodeString Result() const { return {FText.data(), FLength}; }
+  [[nodiscard]] UnicodeString Take() noexcept { return std::move(FText); }
 
  private:
-  std::array<char16_t, 26> FText{};
-  std::size_t FLength = 0;
+  TFieldWriter& Mark(char16_t AChar) noexcept {
+    *FNext++ = AChar;
+    return *this;
+  }
+
+  UnicodeString FText;
+  char16_t* FNext;  // in FText
 };
 
 // The twelve-hour clock's hour as one of the day.
@@ -337,11 +346,11 @@ TDateTime ConvertLUOToDateTime(const UnicodeString& AText) {
 UnicodeString ConvertDateTimeToLUO(TDateTime ADate) {
   const TSystemTime Parts = DateTimeToSystemTime(ADate);
   const unsigned Hour = Parts.Hour % 12U;
-  TFieldWriter Writer;
+  TFieldWriter Writer(26);
   Writer.Text(cMonths.substr((Parts.Month - 1U) * 3, 3)).Text(u" ").Number(Parts.Day, 2, u' ').Text(u" ");
   Writer.Number(Parts.Year, 4, u' ').Text(u" ").Number(Hour == 0 ? 12 : Hour, 2, u' ').Text(u":");
   Writer.Number(Parts.Minute, 2).Text(u":").Number(Parts.Second, 2).Text(u":").Number(Parts.Milliseconds, 3);
-  return Writer.Text(Parts.Hour < 12 ? u"AM" : u"PM").Result();
+  return Writer.Text(Parts.Hour < 12 ? u"AM" : u"PM").Take();
 }
 
 TDateTime ZqStrToDateTime(const UnicodeString& AText) {
@@ -370,16 +379,16 @@ UnicodeString ZqShortDateFormatY2k() {
   }
 }
 
-UnicodeString ZqDateToISOStr(TDateTime ADate) { return TFieldWriter().Date(DateTimeToSystemTime(ADate)).Result(); }
+UnicodeString ZqDateToISOStr(TDateTime ADate) { return TFieldWriter(10).Date(DateTimeToSystemTime(ADate)).Take(); }
 
 UnicodeString ZqTimeToISOStr(TDateTime ADate) {
   static constexpr TSystemTime cBaseDate{.Year = 1899, .Month = 12, .Day = 30};
-  return TFieldWriter().Date(cBaseDate).Time(DateTimeToSystemTime(ADate)).Result();
+  return TFieldWriter(cISOLength).Date(cBaseDate).Time(DateTimeToSystemTime(ADate)).Take();
 }
 
 UnicodeString ZqDateTimeToISOStr(TDateTime ADate) {
   const TSystemTime Parts = DateTimeToSystemTime(ADate);
-  return TFieldWriter().Date(Parts).Time(Parts).Result();
+  return TFieldWriter(cISOLength).Date(Parts).Time(Parts).Take();
 }
 
 namespace {

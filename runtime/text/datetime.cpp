@@ -23,8 +23,7 @@ struct TMoment {
 };
 
 std::optional<TMoment> MomentOf(TDateTime AValue) noexcept {
-  const double Day = std::trunc(AValue.Value);
-  if (!(Day >= cFirstDay && Day <= cLastDay)) return std::nullopt;
+  if (!(AValue.Value > cFirstDay - 1 && AValue.Value < cLastDay + 1)) return std::nullopt;
   const std::chrono::sys_time<std::chrono::milliseconds> Time(
       std::chrono::milliseconds(DateTimeToUnixMilliseconds(AValue)));
   const auto Date = std::chrono::floor<std::chrono::days>(Time);

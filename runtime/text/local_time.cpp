@@ -43,10 +43,10 @@ TDateTime UnixMillisecondsToDateTime(Int64 AMilliseconds) noexcept {
 Int64 DateTimeToUnixMilliseconds(TDateTime AValue) noexcept {
   constexpr double MaxDay = 1e9;  // what doesn't fit is cut; no calendar goes so far
   const double Value = std::isnan(AValue.Value) ? 0 : std::clamp(AValue.Value, -MaxDay, MaxDay);
-  const double Day = std::trunc(Value);
-  const double Fraction = std::fabs(Value - Day);
-  return (static_cast<Int64>(Day) - cUnixEpoch) * cMillisecondsPerDay +
-         std::llround(Fraction * static_cast<double>(cMillisecondsPerDay));
+  const auto Day = static_cast<Int64>(Value);
+  const double Fraction = std::fabs(Value - static_cast<double>(Day));
+  return (Day - cUnixEpoch) * cMillisecondsPerDay +
+         static_cast<Int64>(Fraction * static_cast<double>(cMillisecondsPerDay) + 0.5);
 }
 
 const TTimeZone& TTimeZone::Local() noexcept {
