@@ -300,15 +300,17 @@ class TFieldWriter {
     return *this;
   }
   TFieldWriter& Date(const TSystemTime& AParts) noexcept {
-    return Number(AParts.Year, 4).Mark(u'-').Number(AParts.Month, 2).Mark(u'-').Number(AParts.Day, 2);
+    return Two(AParts.Year / 100U).Two(AParts.Year % 100U).Mark(u'-').Two(AParts.Month).Mark(u'-').Two(AParts.Day);
   }
   TFieldWriter& Time(const TSystemTime& AParts) noexcept {
-    Mark(u'T').Number(AParts.Hour, 2).Mark(u':').Number(AParts.Minute, 2).Mark(u':').Number(AParts.Second, 2);
-    return Mark(u'.').Number(AParts.Milliseconds, 3);
+    Mark(u'T').Two(AParts.Hour).Mark(u':').Two(AParts.Minute).Mark(u':').Two(AParts.Second).Mark(u'.');
+    return Digit(AParts.Milliseconds / 100U).Two(AParts.Milliseconds % 100U);
   }
   [[nodiscard]] UnicodeString Take() noexcept { return std::move(FText); }
 
  private:
+  TFieldWriter& Digit(unsigned AValue) noexcept { return Mark(static_cast<char16_t>(u'0' + AValue)); }
+  TFieldWriter& Two(unsigned AValue) noexcept { return Digit(AValue / 10).Digit(AValue % 10); }
   TFieldWriter& Mark(char16_t AChar) noexcept {
     *FNext++ = AChar;
     return *this;
@@ -414,37 +416,59 @@ Word DigitsOf(std::u16string_view AField) {
   return static_cast<Word>(Result);
 }
 
+// The number in AWidth characters from AFrom on, or in those that there are.
+template <std::size_t AWidth>
+Word NumberAt(std::u16string_view AText, std::size_t AFrom) {
+  if (AText.size() < AFrom + AWidth) return DigitsOf(FieldAt(AText, AFrom, AWidth));
+  unsigned Result = 0;
+  bool Refused = false;
+  for (std::size_t i = AFrom; i < AFrom + AWidth; ++i) {  // in plain steps: no call, no early end
+    const unsigned Digit = static_cast<unsigned>(AText[i]) - u'0';
+    Refused |= Digit > 9;
+    Result = Result * 10 + Digit;
+  }
+  if (Refused) Refuse(AText.substr(AFrom, AWidth));
+  return static_cast<Word>(Result);
+}
+
 TDateTime ReadDate(std::u16string_view AText) {
   std::array<char16_t, 8> Room{};
   std::size_t Count = 0;
   for (std::size_t i = 0; i < AText.size() && Count < Room.size(); ++i)
     if (AText[i] != u'-') Room[Count++] = AText[i];
   const std::u16string_view Digits(Room.data(), Count);
-  const Word Year = DigitsOf(FieldAt(Digits, 0, 4));
-  const Word Month = DigitsOf(FieldAt(Digits, 4, 2));
-  const Word Day = DigitsOf(FieldAt(Digits, 6, 2));
+  const Word Year = NumberAt<4>(Digits, 0);
+  const Word Month = NumberAt<2>(Digits, 4);
+  const Word Day = NumberAt<2>(Digits, 6);
   return (Year | Month | Day) == 0 ? TDateTime() : EncodeDate(Year, Month, Day);
+}
+
+// Where an offset from UTC begins, or the end.
+std::size_t SignIn(std::u16string_view AText) noexcept {
+  std::size_t Result = 0;
+  while (Result < AText.size() && AText[Result] != u'+' && AText[Result] != u'-') ++Result;
+  return Result;
 }
 
 // A count of milliseconds, with or without an offset behind it.
 Word ReadFraction(std::u16string_view AText) {
-  const std::u16string_view Digits = FieldAt(AText, 0, AText.find_first_of(u"+-"));
+  const std::u16string_view Digits = AText.substr(0, SignIn(AText));
   const Word Result = DigitsOf(Digits);
   return Digits.size() > 3 ? cNoField : Result;
 }
 
 TDateTime ReadTime(std::u16string_view AText) {
-  const Word Hour = DigitsOf(FieldAt(AText, 0, 2));
-  const Word Minute = DigitsOf(FieldAt(AText, 3, 2));
-  const Word Second = DigitsOf(FieldAt(AText, 6, 2));
-  const bool Fraction = FieldAt(AText, 8, 1) == u".";
+  const Word Hour = NumberAt<2>(AText, 0);
+  const Word Minute = NumberAt<2>(AText, 3);
+  const Word Second = NumberAt<2>(AText, 6);
+  const bool Fraction = AText.size() > 8 && AText[8] == u'.';
   return EncodeTime(Hour, Minute, Second, Fraction ? ReadFraction(AText.substr(9)) : Word{0});
 }
 
 // What local time is ahead of UTC, in days, by "+hh:mm" or "-hh:mm".
 double ReadZone(std::u16string_view AText) {
   if (AText.size() != 6 || AText[3] != u':') throw EConvertError(_STimeConvertError);
-  const double Offset = EncodeTime(DigitsOf(AText.substr(1, 2)), DigitsOf(AText.substr(4, 2)), 0, 0);
+  const double Offset = EncodeTime(NumberAt<2>(AText, 1), NumberAt<2>(AText, 4), 0, 0);
   return AText[0] == u'+' ? Offset : -Offset;
 }
 
@@ -474,7 +498,7 @@ TDateTime ZqISOStrToDateTime(const UnicodeString& AText) {
   if (Mark == Text.npos) return Utc ? ZqUTCToLocal(ReadDate(Date)) : ReadDate(Date);
   const std::u16string_view Time = Text.substr(Mark + 1);
   if (Utc) return ZqUTCToLocal(ReadDateAndTime(Date, Time));
-  const std::size_t Sign = std::min(Time.find_first_of(u"+-"), Time.size());
+  const std::size_t Sign = SignIn(Time);
   const TDateTime Moment = ReadDateAndTime(Date, Time.substr(0, Sign));
   return Sign == Time.size() ? Moment : ZqUTCToLocal(ShiftDateTime(Moment, -ReadZone(Time.substr(Sign))));
 }
