@@ -5,6 +5,7 @@
 #include <cmath>
 #include <limits>
 #include <string_view>
+#include <utility>
 
 #include "common/uZqSysUtils.h"
 #include "runtime/core/start_count.h"
@@ -349,7 +350,7 @@ UnicodeString ConvertDateTimeToLUO(TDateTime ADate) {
   const TSystemTime Parts = DateTimeToSystemTime(ADate);
   const unsigned Hour = Parts.Hour % 12U;
   TFieldWriter Writer(26);
-  Writer.Text(cMonths.substr((Parts.Month - 1U) * 3, 3)).Text(u" ").Number(Parts.Day, 2, u' ').Text(u" ");
+  Writer.Text(cMonths.substr(std::size_t{3} * (Parts.Month - 1U), 3)).Text(u" ").Number(Parts.Day, 2, u' ').Text(u" ");
   Writer.Number(Parts.Year, 4, u' ').Text(u" ").Number(Hour == 0 ? 12 : Hour, 2, u' ').Text(u":");
   Writer.Number(Parts.Minute, 2).Text(u":").Number(Parts.Second, 2).Text(u":").Number(Parts.Milliseconds, 3);
   return Writer.Text(Parts.Hour < 12 ? u"AM" : u"PM").Take();

@@ -2,6 +2,7 @@
 
 #include <concepts>
 
+#include "runtime/core/exceptions.h"
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
 
