@@ -45,8 +45,7 @@ Int64 DateTimeToUnixMilliseconds(TDateTime AValue) noexcept {
   const double Value = std::isnan(AValue.Value) ? 0 : std::clamp(AValue.Value, -MaxDay, MaxDay);
   const auto Day = static_cast<Int64>(Value);
   const double Fraction = std::fabs(Value - static_cast<double>(Day));
-  return (Day - cUnixEpoch) * cMillisecondsPerDay +
-         static_cast<Int64>(Fraction * static_cast<double>(cMillisecondsPerDay) + 0.5);
+  return (Day - cUnixEpoch) * cMillisecondsPerDay + std::llround(Fraction * static_cast<double>(cMillisecondsPerDay));
 }
 
 const TTimeZone& TTimeZone::Local() noexcept {
