@@ -1,5 +1,6 @@
 #pragma once
 
+#include "common/uZqWindows/processes.h"
 #include "runtime/core/exceptions.h"
 #include "runtime/core/strings.h"
 #include "runtime/core/types.h"
