@@ -74,7 +74,8 @@ TEST(CapturedOutput, KeepsWhatIsLongAndWhatAPieceCuts) {
       u"/", Command, [&](const UnicodeString& AOutput) { Pieces.push_back(AOutput); }, false);
   const UnicodeString First = StringOfChar(u'ä', 127) + u'\xFFFD', Last = u'\xFFFD' + StringOfChar(u'ä', 72);
   EXPECT_EQ(Pieces, (std::vector{First, Last}));
-  static Integer Calls = 0;
+  static Integer Calls;
+  Calls = 0;
   const TZqOnCmdOutputProc Count = [](const UnicodeString&) { ++Calls; };
   ZqRunProcessAndCaptureOutput(u"", u"true", Count, false);
   ZqRunProcessAndCaptureOutput(u"", u"echo", Count, false);
@@ -143,8 +144,9 @@ TEST(CapturedOutput, IsAskedForByTheCommandInterpreterInPieces) {
 TEST(ShellExec, StartsProgramsAndHandsOnTheRest) {
   const TTempFolder Folder({"-a b.txt"});
   for (const char* const Name : {"xdg-open", "pkexec"}) {
-    Folder.Write(
-        Name, "#!/bin/sh\nprintf '%s|' \"$0\" \"$@\" >\"${0%/*}/out\"\ncase $1 in /bin/*) exec \"$@\"; esac\nexit 5");
+    Folder.Write(Name,
+        "#!/bin/sh\ncd \"${0%/*}\"\nprintf '%s|' \"$0\" \"$@\" >new\nmv new out\n"
+        "case $1 in /bin/*) exec \"$@\"; esac\nexit 5");
     fs::permissions(Folder.Path() / Name, fs::perms::owner_all);
   }
   const std::string Here = Folder.Path().string();
@@ -233,7 +235,7 @@ TEST(ShellExec, BuildsItsArgumentsAndElevatesOnlyLimitedRights) {
 
 TEST(Processes, AreFoundAndEndedUnderAnyName) {
   const TTempFolder Folder;
-  const char* const Name = "a) S 1 (b\nlonger than is kept";
+  const std::string Name = "a) S 1 (b\nlonger than is kept" + std::to_string(::getpid());
   const UnicodeString Path = Folder.File(Name), ShortName = UpperCase(ExtractFileName(Path));
   tagPROCESSENTRY32W Entry;
   for (const int Way : {0, 1, 2, 3}) {

@@ -296,8 +296,9 @@ std::string FindProgram(const std::string& AName) {
   const std::string Folders = EnvironmentText("PATH");
   for (std::size_t Start = 0; Start <= Folders.size();) {
     const std::size_t End = std::min(Folders.find(':', Start), Folders.size());
-    const std::string Folder = End == Start ? "." : Folders.substr(Start, End - Start);
-    if (std::string Path = Folder + '/' + AName; IsProgram(Path)) return Path;
+    std::string Path = End == Start ? "." : Folders.substr(Start, End - Start);
+    Path.append("/").append(AName);
+    if (IsProgram(Path)) return Path;
     Start = End + 1;
   }
   return {};

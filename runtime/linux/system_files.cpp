@@ -6,7 +6,8 @@
 #include <algorithm>
 #include <cstdlib>
 #include <fstream>
-#include <iterator>
+#include <sstream>
+#include <utility>
 #include <vector>
 
 namespace zq {
@@ -33,8 +34,10 @@ std::string Unquoted(std::string_view AText) {
 }  // namespace
 
 std::string ReadSystemFile(const std::string& APath) {
-  std::ifstream File(APath, std::ios::binary);
-  return {std::istreambuf_iterator<char>(File), {}};
+  const std::ifstream File(APath, std::ios::binary);
+  std::ostringstream Content;
+  // A file of a process that ends meanwhile fails while it is read; this way it raises nothing.
+  return Content << File.rdbuf() ? std::move(Content).str() : std::string();
 }
 
 std::string_view TakeLine(std::string_view& AText) noexcept {
