@@ -37,7 +37,7 @@ std::string ReadSystemFile(const std::string& APath) {
   const std::ifstream File(APath, std::ios::binary);
   std::ostringstream Content;
   // A file of a process that ends meanwhile fails while it is read; this way it raises nothing.
-  return Content << File.rdbuf() ? std::move(Content).str() : std::string();
+  return (Content << File.rdbuf()) ? std::move(Content).str() : std::string();
 }
 
 std::string_view TakeLine(std::string_view& AText) noexcept {
