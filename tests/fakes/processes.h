@@ -23,10 +23,4 @@ struct TProcessesCalls : TProcessService {
 };
 using TScriptedProcesses = TScripted<TProcessService, TProcessesCalls>;
 
-struct TScriptedChild : TChildProcess {
-  MOCK_METHOD(Integer, ReadFile, (char*, Integer), (override));
-  MOCK_METHOD(bool, WaitForSingleObject, (Cardinal), (override));
-  MOCK_METHOD(Integer, GetExitCodeProcess, (), (override));
-};
-
 }  // namespace zq
