@@ -3,6 +3,7 @@
 #include "common/uZqClasses/component.h"
 #include "common/uZqClasses/hex.h"
 #include "common/uZqClasses/objects.h"
+#include "common/uZqClasses/streams.h"
 #include "runtime/component/bindings.h"  // what Bind raises
 
 namespace zq::uZqClasses {

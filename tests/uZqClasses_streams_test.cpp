@@ -1,0 +1,189 @@
+#include <gtest/gtest.h>
+
+#include <limits>
+
+#include "common/uZqClasses/streams.h"
+#include "tests/support/support.h"
+
+namespace zq {
+namespace {
+
+constexpr Int64 cFar = std::numeric_limits<Int64>::max();
+const UnicodeString cNoResize = u"Exception: It is not possible to resize the buffer!";
+const UnicodeString cEOF = u"Exception: Unexpected EOF";
+
+struct TOpenStream : TZqMemoryStream {
+  using TZqMemoryStream::SetBufSize;
+  using TZqMemoryStream::SetContentEnd;
+  using TZqMemoryStream::TZqMemoryStream;
+};
+
+void Fill(TStream& AStream, std::string_view AText) {
+  AStream.WriteBuffer(AText.data(), static_cast<Int64>(AText.size()));
+}
+
+TEST(MemoryStream, GrowsByStepsAndAlwaysKeepsAByteFree) {
+  struct TCase {
+    const char* Name;
+    void (*Do)(TOpenStream&);
+    NativeUInt Capacity;
+    Int64 Size, Position;
+  };
+  const TCase Cases[] = {{"15 fit", [](TOpenStream& s) { Fill(s, "0123456789abcde"); }, 16, 15, 15},
+      {"16 don't", [](TOpenStream& s) { Fill(s, "0123456789abcdef"); }, 32, 16, 16},
+      {"31 in one go ask for 32", [](TOpenStream& s) { Fill(s, std::string(31, 'x')); }, 48, 31, 31},
+      {"31 in two fit", [](TOpenStream& s) { Fill(s, std::string(16, 'x')), Fill(s, std::string(15, 'x')); }, 32, 31,
+          31},
+      {"SetSize", [](TOpenStream& s) { Fill(s, "abc"), s.SetSize(32); }, 48, 32, 3},
+      {"SetSize down", [](TOpenStream& s) { Fill(s, std::string(99, 'x')), s.SetSize(15); }, 16, 15, 15},
+      {"SetSize 0", [](TOpenStream& s) { Fill(s, "abc"), s.SetSize(0); }, 16, 0, 0},
+      {"Clear", [](TOpenStream& s) { Fill(s, std::string(99, 'x')), s.Clear(); }, 16, 0, 0},
+      {"step changed", [](TOpenStream& s) { s.SetBlockSize(10), Fill(s, std::string(16, 'x')); }, 20, 16, 16},
+      {"SetBufSize keeps", [](TOpenStream& s) { Fill(s, "abc"), s.SetBufSize(16); }, 32, 3, 3},
+      {"SetBufSize cuts", [](TOpenStream& s) { Fill(s, "abc"), s.SetBufSize(2); }, 16, 2, 2},
+      {"SetContentEnd", [](TOpenStream& s) { Fill(s, "abc"), s.SetContentEnd(2); }, 16, 2, 2},
+      {"in the middle", [](TOpenStream& s) { Fill(s, "abcd"), s.SetPosition(1), Fill(s, "xy"); }, 16, 4, 3}};
+  for (const TCase& Case : Cases) {
+    TOpenStream Stream(16);
+    Case.Do(Stream);
+    EXPECT_EQ(std::tuple(Stream.Capacity(), Stream.Size(), Stream.Position()),
+        std::tuple(Case.Capacity, Case.Size, Case.Position))
+        << Case.Name;
+  }
+}
+
+TEST(MemoryStream, KeepsItsBytesThroughManySteps) {
+  TZqMemoryStream Stream(7);
+  std::string Expected;
+  for (int i = 0; i < 1000; ++i) {
+    const std::string Piece(static_cast<std::size_t>(i % 19), static_cast<char>('a' + i % 26));
+    Fill(Stream, Piece);
+    Expected += Piece;
+  }
+  Stream.SetPosition(0);
+  Stream.Seek(0, soEnd);
+  Stream.Write(Stream.Buffer(), static_cast<Integer>(Expected.size()));  // its own block, which moves meanwhile
+  EXPECT_EQ(Stream.View(), Expected + Expected);
+  Stream.SetSize(5);
+  EXPECT_EQ(Stream.View(), Expected.substr(0, 5));
+}
+
+TEST(MemoryStream, SeeksAreClippedAtBothEnds) {
+  TZqMemoryStream Stream(16);
+  Fill(Stream, "0123456789");
+  const std::tuple<Int64, TSeekOrigin, Int64> Cases[] = {{100, soBeginning, 10}, {-1, soBeginning, 0},
+      {cFar, soBeginning, 10}, {3, soEnd, 7}, {-3, soEnd, 7}, {100, soEnd, 0}, {-cFar - 1, soEnd, 0}, {0, soEnd, 10},
+      {-4, soCurrent, 1}, {5, soCurrent, 10}, {4, soCurrent, 9}, {cFar, soCurrent, 10}, {-cFar - 1, soCurrent, 0}};
+  for (const auto& [Offset, Origin, Position] : Cases) {
+    Stream.SetPosition(5);
+    EXPECT_EQ(Stream.Seek(Offset, Origin), Position) << Offset << ' ' << static_cast<int>(Origin);
+    EXPECT_EQ(Stream.Position(), Position);
+  }
+}
+
+TEST(MemoryStream, NumbersAreLittleEndianAndNeverShort) {
+  TZqMemoryStream Stream(16);
+  Stream.WriteByte(1), Stream.WriteWord(0x0203), Stream.WriteLongWord(0x04050607), Stream.WriteInt64(-2);
+  Stream.WriteBytes({}), Stream.WriteBytes({8, 9});
+  EXPECT_EQ(Stream.View(), std::string("\1\3\2\7\6\5\4\xFE\xFF\xFF\xFF\xFF\xFF\xFF\xFF\x8\x9"));
+  Stream.SetPosition(0);
+  EXPECT_TRUE(Stream.ReadByte() == 1 && Stream.ReadWord() == 0x0203 && Stream.ReadLongWord() == 0x04050607);
+  EXPECT_TRUE(Stream.ReadInt64() == -2 && Stream.ReadBytes(2) == (TBytes{8, 9}));
+  EXPECT_EQ(RaisedBy([&] { Stream.ReadByte(); }), cEOF);
+  Stream.SetPosition(Stream.Size() - 5);
+  EXPECT_EQ(RaisedBy([&] { Stream.ReadInt64(); }), cEOF);
+  Byte Room = 7;
+  EXPECT_TRUE(Stream.Position() == Stream.Size() && Stream.Read(&Room, 1) == 0 && Stream.Read(&Room, -1) == 0);
+  EXPECT_EQ(RaisedBy([&] { (void)Stream.ReadBytes(1); }), cEOF);
+  EXPECT_THROW(Stream.ReadBytes(&Room, 0), EAssertionFailed);
+}
+
+TEST(MemoryStream, AWrappedBlockIsOverwrittenAndNeverResized) {
+  char Block[] = "abcd|";
+  TZqMemoryStream Stream = TZqMemoryStream::WrapBuffer(Block, 4);
+  EXPECT_EQ(Stream.Write("wxyz", 4), 4);
+  EXPECT_EQ(Block, std::string("wxyz|"));
+  EXPECT_EQ(RaisedBy([&] { Stream.Write("!", 1); }), cNoResize);
+  Stream.SetPosition(1);
+  EXPECT_EQ(RaisedBy([&] { Stream.Write("1234", 4); }), cNoResize);
+  EXPECT_EQ(RaisedBy([&] { Stream.Clear(); }), cNoResize);
+  EXPECT_EQ(RaisedBy([&] { Stream.SetSize(4); }), cNoResize);
+  EXPECT_TRUE(Block == std::string("wxyz|") && Stream.Size() == 4 && Stream.Position() == 1);
+  EXPECT_THROW(TZqMemoryStream::WrapBuffer(nullptr, 1), EAssertionFailed);
+}
+
+TEST(MemoryStream, WhatMemoryCantHoldIsRefusedAndChangesNothing) {
+  TZqMemoryStream Stream(16);
+  Fill(Stream, "abc");
+  for (const Int64 Size : {Int64{-1}, -cFar - 1, cFar, cFar / 2})
+    EXPECT_EQ(RaisedBy([&] { Stream.SetSize(Size); }), u"EStreamError: There is no memory for the stream") << Size;
+  void* Place = nullptr;
+  EXPECT_THROW((void)ZqStreamToWriteBuf(&Stream, Place, ~NativeUInt{}), EStreamError);
+  EXPECT_TRUE(Stream.View() == "abc" && Stream.Capacity() == 16 && Stream.Position() == 3);
+  TZqMemoryStream NoStep(0);
+  EXPECT_THROW(NoStep.WriteByte(1), EAssertionFailed);
+  EXPECT_THROW((void)ZqGetMem(~NativeUInt{}), std::bad_alloc);
+}
+
+TEST(StreamBuffers, MemoryIsReachedInPlaceAndOthersAreReadToTheirEnd) {
+  const TTempFolder Folder({"file"});
+  TFileStream File(Folder.File("file"), fmOpenRead);
+  TZqMemoryStream Zq(16);
+  TMemoryStream Memory;
+  Fill(Zq, "file"), Fill(Memory, "file");
+  for (TStream* const Stream : std::initializer_list<TStream*>{&File, &Zq, &Memory}) {
+    Stream->SetPosition(1);
+    void* Buffer = nullptr;
+    NativeUInt Size = 0;
+    const bool Owned = ZqStreamToReadBuf(Stream, Buffer, Size);
+    EXPECT_EQ(std::string_view(static_cast<char*>(Buffer), Size), "ile");
+    EXPECT_TRUE(Owned == (Stream == &File) && Stream->Position() == (Owned ? 4 : 1));
+    if (Owned) FreeMem(Buffer);
+  }
+  Memory.SetPosition(9);
+  EXPECT_EQ(TZqReadBuf(&Memory).Size(), 0U);
+  void* Place = nullptr;
+  EXPECT_FALSE(ZqStreamToWriteBuf(&Zq, Place, 20));
+  EXPECT_TRUE(Place == static_cast<char*>(Zq.Buffer()) + 1 && Zq.Size() == 21 && Zq.Position() == 1);
+  EXPECT_TRUE(ZqStreamToWriteBuf(&Memory, Place, 20));
+  FreeMem(Place);
+}
+
+TEST(StreamBuffers, CountedBuffersTakeWhatTheStreamHas) {
+  TZqMemoryStream Stream(16);
+  Fill(Stream, "0123456789");
+  const std::tuple<Int64, Int64, NativeUInt> Cases[] = {{0, -1, 10}, {0, 100, 10}, {8, -1, 2}, {8, 1, 1}, {0, 0, 0}};
+  for (const auto& [Offset, Count, Size] : Cases) {
+    const auto Buffer = ZqCreateMemoryBuffer(&Stream, Offset, Count);
+    EXPECT_EQ(Buffer->GetSize(), Size);
+    EXPECT_EQ(Stream.Position(), Offset + static_cast<Int64>(Size));
+  }
+  const auto Buffer = ZqCreateMemoryBuffer(&Stream, 2, 3);
+  Buffer->SetSize(2);
+  EXPECT_EQ(Buffer->GetAsByteArray(), (TBytes{'2', '3'}));
+  Buffer->SetAsByteArray({1, 2, 3});
+  EXPECT_THROW(Buffer->SetSize(~NativeUInt{}), std::bad_alloc);
+  EXPECT_EQ(Buffer->GetAsByteArray(), (TBytes{1, 2, 3}));
+  Buffer->SetSize(0);
+  EXPECT_TRUE(Buffer->GetBuffer() == nullptr && Buffer->GetAsByteArray().empty());
+  NativeUInt Size = 7;
+  EXPECT_EQ(ZqByteArrToBuf({}, Size), nullptr);
+  const auto Taken = ZqCreateMemoryBuffer(ZqByteArrToBuf({4, 5}, Size), 2);  // freed with it
+  EXPECT_TRUE(Size == 2 && Taken->GetAsByteArray() == (TBytes{4, 5}));
+  ZqReverseBuffer(Taken->GetBuffer(), 2);
+  EXPECT_EQ(ZqBufToByteArr(Taken->GetBuffer(), 1), (TBytes{5}));
+}
+
+TEST(HeapRecords, HoldSizeAndBytesInOneBlock) {
+  PZqMemoryBuffer Record = ZqGetMem(3);
+  EXPECT_EQ(ZqBufToByteArr(Record->Data(), Record->Size), (TBytes{0, 0, 0}));
+  std::memcpy(Record->Data(), "abc", 3);
+  ZqReallocateMem(Record, 2);
+  PZqMemoryBuffer Clone = ZqCloneMem(Record);
+  EXPECT_EQ(ZqBufToByteArr(Clone->Data(), Clone->Size), (TBytes{'a', 'b'}));
+  ZqFreeMem(Record), ZqFreeMem(Clone);
+  EXPECT_EQ(Record, nullptr);
+}
+
+}  // namespace
+}  // namespace zq
