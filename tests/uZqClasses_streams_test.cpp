@@ -109,7 +109,7 @@ TEST(MemoryStream, AWrappedBlockIsOverwrittenAndNeverResized) {
   EXPECT_EQ(RaisedBy([&] { Stream.Clear(); }), cNoResize);
   EXPECT_EQ(RaisedBy([&] { Stream.SetSize(4); }), cNoResize);
   EXPECT_TRUE(Block == std::string("wxyz|") && Stream.Size() == 4 && Stream.Position() == 1);
-  EXPECT_THROW(TZqMemoryStream::WrapBuffer(nullptr, 1), EAssertionFailed);
+  EXPECT_THROW((void)TZqMemoryStream::WrapBuffer(nullptr, 1), EAssertionFailed);
 }
 
 TEST(MemoryStream, WhatMemoryCantHoldIsRefusedAndChangesNothing) {
