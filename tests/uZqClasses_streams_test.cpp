@@ -91,7 +91,6 @@ TEST(MemoryStream, AWrappedBlockIsOverwrittenAndNeverResized) {
   TZqMemoryStream Stream = TZqMemoryStream::WrapBuffer(Block, 4);
   EXPECT_EQ(Stream.Write("wxyz", 4), 4);
   EXPECT_EQ(Block, std::string("wxyz|"));
-  EXPECT_EQ(RaisedBy([&] { Stream.Write("!", 1); }), cNoResize);
   Stream.SetPosition(1);
   EXPECT_EQ(RaisedBy([&] { Stream.Write("1234", 4); }), cNoResize);
   EXPECT_EQ(RaisedBy([&] { Stream.Clear(); }) + RaisedBy([&] { Stream.SetSize(4); }), cNoResize + cNoResize);
@@ -145,11 +144,10 @@ TEST(StreamBuffers, CountedBuffersTakeWhatTheStreamHas) {
     EXPECT_TRUE(Buffer->GetSize() == Size && Stream.Position() == Offset + static_cast<Int64>(Size));
   }
   const auto Buffer = ZqCreateMemoryBuffer(&Stream, 2, 3);
-  Buffer->SetSize(2);
-  EXPECT_EQ(Buffer->GetAsByteArray(), (TBytes{'2', '3'}));
-  Buffer->SetAsByteArray({1, 2, 3});
   EXPECT_THROW(Buffer->SetSize(~NativeUInt{}), std::bad_alloc);
-  EXPECT_EQ(Buffer->GetAsByteArray(), (TBytes{1, 2, 3}));
+  EXPECT_EQ(Buffer->GetAsByteArray(), (TBytes{'2', '3', '4'}));
+  Buffer->SetAsByteArray({1, 2, 3}), Buffer->SetSize(2);
+  EXPECT_EQ(Buffer->GetAsByteArray(), (TBytes{1, 2}));
   Buffer->SetSize(0);
   EXPECT_TRUE(Buffer->GetBuffer() == nullptr && Buffer->GetAsByteArray().empty());
   NativeUInt Size = 7;
@@ -160,15 +158,14 @@ TEST(StreamBuffers, CountedBuffersTakeWhatTheStreamHas) {
   EXPECT_EQ(ZqBufToByteArr(Taken->GetBuffer(), 1), (TBytes{5}));
 }
 
-TEST(HeapRecords, HoldSizeAndBytesInOneBlock) {
+TEST(StreamBuffers, HeapRecordsHoldSizeAndBytesInOneBlock) {
   PZqMemoryBuffer Record = ZqGetMem(3);
   EXPECT_EQ(ZqBufToByteArr(Record->Data(), Record->Size), (TBytes{0, 0, 0}));
-  std::memcpy(Record->Data(), "abc", 3);
-  ZqReallocateMem(Record, 2);
+  Record->Data()[1] = 7, ZqReallocateMem(Record, 2);
   PZqMemoryBuffer Clone = ZqCloneMem(Record);
-  EXPECT_EQ(ZqBufToByteArr(Clone->Data(), Clone->Size), (TBytes{'a', 'b'}));
-  ZqFreeMem(Record), ZqFreeMem(Clone);
-  EXPECT_EQ(Record, nullptr);
+  ZqFreeMem(Record);
+  EXPECT_TRUE(Record == nullptr && ZqBufToByteArr(Clone->Data(), Clone->Size) == (TBytes{0, 7}));
+  ZqFreeMem(Clone);
 }
 
 }  // namespace

@@ -15,6 +15,7 @@ namespace zq {
 namespace {
 
 constexpr Word cUtf16 = 1200;
+constexpr Word cUtf16BE = 1201;
 constexpr Word cUtf8 = 65001;
 
 Word MaxCharSize(Word ACodePage) noexcept {
@@ -22,6 +23,9 @@ Word MaxCharSize(Word ACodePage) noexcept {
   const TCodePage* const Page = FindCodePage(ActualCodePage(ACodePage));
   return Page == nullptr || !Page->IsServed() ? 1 : Page->Kind == TPageKind::Utf8 ? cOfUtf8 : Page->BytesPerUnit;
 }
+
+// By itself: a conversion refuses half a pair.
+Char BigEndianUnit(const Byte* ABytes) noexcept { return static_cast<Char>(ABytes[0] << 8U | ABytes[1]); }
 
 Integer Countable(NativeUInt ACount) {
   Assert(ACount <= static_cast<NativeUInt>(std::numeric_limits<Integer>::max()));
@@ -226,7 +230,8 @@ void TZqStringStream::SkipText(std::u16string_view AText) noexcept {
 // own is 3. 0 elsewhere.
 Char TZqStringStream::SecondUnit() const noexcept {
   const Byte* const At = CurPos();
-  const bool CanBe = FCodePage == cUtf8 && BytesLeft() > 0 && At - static_cast<const Byte*>(Buffer()) >= 3;
+  const bool CanBe =
+      ActualCodePage(FCodePage) == cUtf8 && BytesLeft() > 0 && At - static_cast<const Byte*>(Buffer()) >= 3;
   if (!CanBe || (At[0] & 0xC0U) != 0x80 || At[-3] < 0xF0) return 0;
   std::array<Char, 4> Units{};
   const std::size_t Count = utf8::Decode(reinterpret_cast<const char*>(At - 3), 4, Units.data());
@@ -235,6 +240,7 @@ Char TZqStringStream::SecondUnit() const noexcept {
 
 // The span may end within a character: some pages refuse it then, and a shorter one gives the same unit.
 Char TZqStringStream::PeekUnit() const {
+  if (FCodePage == cUtf16BE && BytesLeft() > 1) return BigEndianUnit(CurPos());
   std::array<Char, 8> Units{};
   const NativeUInt Longest = std::min<NativeUInt>(BytesLeft(), FCodePageMaxCharSize);
   for (NativeUInt Span = Longest; Span > 0; --Span)
@@ -273,6 +279,11 @@ AnsiChar TZqStringStream::ReadAChar() {
 // At most ALength units of what is behind the position, which isn't moved.
 UnicodeString TZqStringStream::PeekText(NativeUInt ALength) const {
   const NativeUInt Left = BytesLeft();
+  if (FCodePage == cUtf16BE) {
+    std::u16string Units(static_cast<std::size_t>(Countable(std::min(ALength, Left / 2))), u'\0');
+    for (std::size_t i = 0; i < Units.size(); ++i) Units[i] = BigEndianUnit(CurPos() + 2 * i);
+    return Units;
+  }
   const NativeUInt Span = ALength > Left / FCodePageMaxCharSize ? Left : ALength * FCodePageMaxCharSize;
   NativeUInt Count = Span;
   const auto EndsWithin = [&] {  // a character: some pages refuse that

@@ -89,7 +89,8 @@ class ZQ_API TZqStringStream : public TZqMemoryStream {
 
   // At the position. At the end of the content they give the character 0, or an empty string, and never raise.
   Char ReadChar() { return ReadWChar(); }
-  /// A UTF-16 unit. A character that takes two comes in two calls, which 65001 and the UTF-16 pages stand.
+  /// A UTF-16 unit. A character that takes two comes in two calls in 65001 and UTF-16; other pages lose the second
+  /// half.
   Char ReadWChar();
   /// In code page 0; "?" where that has no single byte for the character.
   AnsiChar ReadAChar();
