@@ -4,13 +4,12 @@
 #include <immintrin.h>
 #endif
 
-#include <algorithm>
 #include <memory>
-#include <optional>
 #include <span>
 #include <string>
 
 #include "common/uZqBase64/portable.h"
+#include "common/uZqClasses/streams.h"
 #include "common/uZqTypes.h"
 #include "runtime/core/objects.h"
 #include "runtime/io/streams.h"
@@ -123,47 +122,21 @@ std::size_t Decode(std::string_view AText, Byte* ADest) noexcept { return base64
 
 // ------------------------------------------------------------------------------------------------------- streams
 
-// The stream's own bytes behind its position, if it has them in a block; they are there until it is resized.
-std::optional<std::span<const Byte>> OwnBytes(TStream& AStream) {
-  const auto* const Memory = dynamic_cast<TCustomMemoryStream*>(&AStream);
-  if (Memory == nullptr) return std::nullopt;
-  const std::span All(static_cast<const Byte*>(Memory->Memory()), static_cast<std::size_t>(AStream.Size()));
-  return All.subspan(std::min(All.size(), static_cast<std::size_t>(AStream.Position())));
+std::string_view TextOf(const TZqReadBuf& ABuf) noexcept {
+  return {static_cast<const char*>(ABuf.Data()), ABuf.Size()};
 }
 
-// What stands behind the position of a stream: its own block, and the position stays, or a copy, and it is read to its
-// end.
-class TRemainder {
- public:
-  explicit TRemainder(TStream& AStream) {
-    if (const auto Own = OwnBytes(AStream)) {
-      FBytes = *Own;
-      return;
-    }
-    FCopy.resize(static_cast<std::size_t>(std::max<Int64>(AStream.Size() - AStream.Position(), 0)));
-    AStream.ReadBuffer(FCopy.data(), static_cast<Int64>(FCopy.size()));
-    FBytes = FCopy;
-  }
-  TRemainder(const TRemainder&) = delete;
-  TRemainder& operator=(const TRemainder&) = delete;
-
-  [[nodiscard]] std::span<const Byte> Bytes() const noexcept { return FBytes; }
-  [[nodiscard]] std::string_view Text() const noexcept {
-    return {reinterpret_cast<const char*>(FBytes.data()), FBytes.size()};
-  }
-
- private:
-  TBytes FCopy;
-  std::span<const Byte> FBytes;
-};
-
-// Has AFill, which returns their number, make at most ACapacity bytes for ADest.
+// Has AFill, which returns their number, make at most ACapacity bytes for ADest: in its own block, and the position
+// stays, or in one that is written to it.
 template <class TFill>
-void WriteTo(TStream& ADest, std::size_t ACapacity, TFill AFill) {
-  TBytes Room(ACapacity);
-  const std::size_t Count = AFill(Room.data());
+void WriteTo(TStream* ADest, std::size_t ACapacity, TFill AFill) {
+  void* Room = nullptr;
+  const bool Owned = ZqStreamToWriteBuf(ADest, Room, ACapacity);
+  const std::unique_ptr<void, decltype(&FreeMem)> Block(Owned ? Room : nullptr, &FreeMem);
+  const std::size_t Count = AFill(static_cast<Byte*>(Room));
   Assert(Count <= ACapacity);
-  ADest.WriteBuffer(Room.data(), static_cast<Int64>(Count));
+  if (Owned) ADest->WriteBuffer(Room, static_cast<Int64>(Count));
+  else ADest->SetSize(ADest->Position() + static_cast<Int64>(Count));
 }
 
 void TestLength(std::string_view AText) {
@@ -175,16 +148,16 @@ void TestLength(std::string_view AText) {
 // ------------------------------------------------------------------------------------------------------- encoding
 
 void ZqEncodeBase64(TStream* ASource, TStream* ADest) {
-  Assert(ASource != nullptr && ADest != nullptr && ASource != ADest);
-  const TRemainder Source(*ASource);
-  WriteTo(*ADest, base64::EncodedSize(Source.Bytes().size()),
-      [&](Byte* ARoom) { return Encode(Source.Bytes(), reinterpret_cast<char*>(ARoom)); });
+  Assert(ASource != ADest);
+  const TZqReadBuf Source(ASource);
+  WriteTo(ADest, base64::EncodedSize(Source.Size()), [&](Byte* ARoom) {
+    return Encode({static_cast<const Byte*>(Source.Data()), Source.Size()}, reinterpret_cast<char*>(ARoom));
+  });
 }
 
 AnsiString ZqEncodeBase64(TStream* ASource) {
-  Assert(ASource != nullptr);
-  const TRemainder Source(*ASource);
-  return ZqEncodeBase64(Source.Text());
+  const TZqReadBuf Source(ASource);
+  return ZqEncodeBase64(Source.Data(), Source.Size());
 }
 
 AnsiString ZqEncodeBase64(std::string_view AValue) { return ZqEncodeBase64(AValue.data(), AValue.size()); }
@@ -224,13 +197,13 @@ void ZqDecodeBase64(std::string_view AValue, TStream* AStream) {
   Assert(AStream != nullptr);
   TestLength(AValue);
   if (AValue.empty()) return;
-  WriteTo(*AStream, base64::DecodedCapacity(AValue.size()), [&](Byte* ARoom) { return Decode(AValue, ARoom); });
+  WriteTo(AStream, base64::DecodedCapacity(AValue.size()), [&](Byte* ARoom) { return Decode(AValue, ARoom); });
 }
 
 void ZqDecodeBase64(TStream* ASource, TStream* ADest) {
-  Assert(ASource != nullptr && ASource != ADest);
-  const TRemainder Source(*ASource);
-  ZqDecodeBase64(Source.Text(), ADest);
+  Assert(ASource != ADest);
+  const TZqReadBuf Source(ASource);
+  ZqDecodeBase64(TextOf(Source), ADest);
 }
 
 }  // namespace zq

@@ -9,8 +9,11 @@
 
 /// Base64 as of RFC 4648: the standard alphabet, padded with "=", no line breaks.
 ///
-/// Streams stay the caller's. Their forms begin at the position, and raise what the streams raise, EReadError and
-/// EWriteError. Two streams of one call are not the same (EAssertionFailed), and none is null. From any thread.
+/// Streams stay the caller's. Their forms begin at the position, and raise what the streams raise, EWriteError among
+/// it. Two streams of one call are not the same (EAssertionFailed), and none is null. From any thread.
+///
+/// A TZqMemoryStream is worked on in place: as a source it stays where it is, and what is put into one ends it and
+/// leaves its position in front.
 namespace zq {
 
 class TStream;

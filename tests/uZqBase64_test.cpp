@@ -5,6 +5,7 @@
 #include <bitset>
 
 #include "common/uZqBase64/portable.h"
+#include "common/uZqClasses/streams.h"
 #include "runtime/io/streams.h"
 #include "tests/support/support.h"
 
@@ -97,6 +98,19 @@ TEST(Base64, StreamsAreTakenFromThePositionOn) {
   Coded.SetPosition(0);
   EXPECT_EQ(RaisedBy([&] { ZqDecodeBase64(&Coded, &Plain); }), cRefusal);  // 13 characters
   EXPECT_THAT(RaisedBy([&] { ZqEncodeBase64(&Coded, &Coded); }).ToUTF8(), testing::StartsWith("EAssertionFailed"));
+}
+
+TEST(Base64, WorksInTheBlockOfAMemoryStream) {
+  TZqMemoryStream Plain(16), Coded(16);
+  Plain.WriteBuffer("xfoo", 4);
+  Plain.SetPosition(1);
+  Coded.WriteBuffer("12345old content of some length", 31);
+  Coded.SetPosition(5);
+  ZqEncodeBase64(&Plain, &Coded);
+  EXPECT_TRUE(Plain.Position() == 1 && Coded.Position() == 5);
+  EXPECT_EQ(ZqEncodeBase64("12345Zm9v"), ZqEncodeBase64(Coded.Buffer(), static_cast<NativeUInt>(Coded.Size())));
+  ZqDecodeBase64("Zg==", &Plain);  // of the three bytes that it might be one is left
+  EXPECT_EQ(Plain.Size(), 2);
 }
 
 }  // namespace

@@ -1,12 +1,10 @@
 #include "common/uZqClasses/hex.h"
 
-#include <cstring>
 #include <string>
 
 #include "common/uZqBase64.h"
+#include "common/uZqClasses/streams.h"
 #include "common/uZqTypes.h"
-#include "runtime/core/objects.h"
-#include "runtime/io/streams.h"
 #include "runtime/text/numbers.h"
 
 namespace zq {
@@ -67,11 +65,7 @@ TBytes ZqHexToBuf(std::string_view AValue) {
 
 void* ZqHexToBuf(std::string_view AValue, NativeUInt& ASize) {
   ASize = 0;
-  const TBytes Bytes = ZqHexToBuf(AValue);
-  if (Bytes.empty()) return nullptr;
-  void* const Result = GetMem(Bytes.size());
-  ASize = Bytes.size();
-  return std::memcpy(Result, Bytes.data(), Bytes.size());
+  return ZqByteArrToBuf(ZqHexToBuf(AValue), ASize);
 }
 
 void ZqHexToBuf(std::string_view AValue, TStream* AStream) {
