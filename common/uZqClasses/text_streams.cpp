@@ -27,6 +27,8 @@ Word MaxCharSize(Word ACodePage) noexcept {
 // By itself: a conversion refuses half a pair.
 Char BigEndianUnit(const Byte* ABytes) noexcept { return static_cast<Char>(ABytes[0] << 8U | ABytes[1]); }
 
+bool IsAligned(const void* AUnits) noexcept { return reinterpret_cast<std::uintptr_t>(AUnits) % alignof(Char) == 0; }
+
 Integer Countable(NativeUInt ACount) {
   Assert(ACount <= static_cast<NativeUInt>(std::numeric_limits<Integer>::max()));
   return static_cast<Integer>(ACount);
@@ -305,7 +307,10 @@ UnicodeString TZqStringStream::ReadWString(NativeUInt ALength) {
   if (BytesLeft() == 0 || ALength == 0) return Result;
   if (IsWide()) {
     const NativeUInt Count = ALength > BytesLeft() / 2 ? BytesLeft() : 2 * ALength;
-    Result = TZqEncoding::ConvertB(CurPos(), Count, FCodePage);
+    const void* const At = CurPos();
+    if (IsAligned(At))
+      Result = UnicodeString(static_cast<const Char*>(At), static_cast<std::size_t>(Countable(Count / 2)));
+    else Result = TZqEncoding::ConvertB(At, Count, FCodePage);
     Skip(Count);
   } else if (const Char Second = SecondUnit(); Second != 0) {
     Skip(1);
@@ -517,7 +522,7 @@ void ZqUTF8EncodeStream(TStream* ASource, TStream* ADest, bool AWritePrefix) {
   const std::size_t Length = Source.Size() / 2;
   const auto* Units = static_cast<const char16_t*>(Source.Data());
   std::u16string Aligned;
-  if (reinterpret_cast<std::uintptr_t>(Units) % alignof(char16_t) != 0) {
+  if (!IsAligned(Source.Data())) {
     Aligned.resize(Length);
     std::memcpy(Aligned.data(), Source.Data(), 2 * Length);
     Units = Aligned.data();
