@@ -6,6 +6,8 @@
 #include <string_view>
 #include <utility>
 
+#include "common/uZqClasses/text_streams.h"
+#include "common/uZqTypes.h"
 #include "runtime/com/registry.h"
 #include "runtime/containers/lists.h"
 #include "runtime/core/start_count.h"
@@ -417,6 +419,38 @@ std::unique_ptr<TResourceStream> ZqGetResource(const UnicodeString& AName, const
   auto Result = ZqFindResource(AName, AType);
   if (Result == nullptr) throw Exception(u"There is no resource with the name: " + AName);
   return Result;
+}
+
+UnicodeString ZqFindResource(const UnicodeString& AName, Word ACodePage, const WideChar* AType) {
+  const auto Resource = ZqFindResource(AName, AType);
+  if (Resource == nullptr) return {};
+  TZqStringStream Text(0);
+  Text.CopyFrom(*Resource, 0);
+  return TZqEncoding::ConvertA(Text.StringData(ACodePage), ACodePage);
+}
+
+UnicodeString ZqGetResource(const UnicodeString& AName, Word ACodePage, const WideChar* AType) {
+  UnicodeString Result = ZqFindResource(AName, ACodePage, AType);
+  if (Result.IsEmpty()) throw Exception(u"There is no resource with the name: " + AName);
+  return Result;
+}
+
+UnicodeString ZqLoadStringFromFile(const UnicodeString& AFile, Word AMode) {
+  return ZqStreamToWideString(new TFileStream(AFile, AMode), true, true, true);
+}
+
+void ZqSaveString(const UnicodeString& AFile, const WideString& AText, Word ACodePage, Boolean AWriteBOM) {
+  TZqStringStream::CreateEx(UnicodeString(AText.View())).SaveToFile(AFile, ACodePage, AWriteBOM);
+}
+
+void ZqSaveString(const UnicodeString& AFile, const AnsiString& AText, Word ASourceCodePage, Integer ADestCodePage,
+    Boolean AWriteBOM) {
+  const Word CodePage = ADestCodePage == -1 ? ASourceCodePage : static_cast<Word>(ADestCodePage);
+  TZqStringStream::CreateEx(AText, ASourceCodePage).SaveToFile(AFile, CodePage, AWriteBOM);
+}
+
+void ZqSaveString(const UnicodeString& AFile, const UTF8String& AText) {
+  TZqStringStream::CreateEx(AText).SaveToFile(AFile, 65001, true);
 }
 
 Boolean IsWow64() { return Service<TProcessFacts>().IsWow64Process().value_or(false); }

@@ -235,6 +235,24 @@ using enum TZqBitness;
 [[nodiscard]] ZQ_API std::unique_ptr<TResourceStream> ZqFindResource(const UnicodeString& AName, const WideChar* AType);
 /// The same, raising Exception where neither has it.
 [[nodiscard]] ZQ_API std::unique_ptr<TResourceStream> ZqGetResource(const UnicodeString& AName, const WideChar* AType);
+/// The resource as text: its bytes are in code page 0 and go through ACodePage, and what that lacks is "?". Empty where
+/// neither has it.
+[[nodiscard]] ZQ_API UnicodeString ZqFindResource(const UnicodeString& AName, Word ACodePage, const WideChar* AType);
+/// The same, raising Exception also for a resource that is empty.
+[[nodiscard]] ZQ_API UnicodeString ZqGetResource(const UnicodeString& AName, Word ACodePage, const WideChar* AType);
+
+/// A whole file as text: its byte order mark tells the encoding, without one it is in code page 0. AMode is that of
+/// TFileStream. Raises EFOpenError, and EOSError for bytes that are no text.
+[[nodiscard]] ZQ_API UnicodeString ZqLoadStringFromFile(const UnicodeString& AFile, Word AMode);
+/// A file with that text in ACodePage, one that exists replaced; with AWriteBOM the mark of ACodePage ahead of it.
+/// Raises EFCreateError and EWriteError, and EOSError for a code page without character data.
+ZQ_API void ZqSaveString(const UnicodeString& AFile, const WideString& AText, Word ACodePage, Boolean AWriteBOM);
+/// ADestCodePage -1: as the bytes come, which are in ASourceCodePage, whatever tag AText bears.
+ZQ_API void ZqSaveString(const UnicodeString& AFile, const AnsiString& AText, Word ASourceCodePage,
+    Integer ADestCodePage, Boolean AWriteBOM);
+/// In UTF-8, with its mark.
+ZQ_API void ZqSaveString(const UnicodeString& AFile, const UTF8String& AText);
+
 /// Whether this library is built for 64 bits.
 [[nodiscard]] constexpr Boolean IsCPU64() noexcept { return sizeof(void*) == 8; }
 /// Whether this is a 32-bit process on a 64-bit system.
