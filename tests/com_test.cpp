@@ -1,4 +1,3 @@
-#include <gtest/gtest.h>
 
 #include "runtime/com/registry.h"
 #include "tests/fakes/registry.h"

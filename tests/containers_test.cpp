@@ -1,6 +1,4 @@
-#include <gtest/gtest.h>
 
-#include <tuple>
 
 #include "runtime/containers/collection.h"
 #include "runtime/containers/lists.h"

@@ -1,13 +1,6 @@
 #include <dlfcn.h>
-#include <gtest/gtest.h>
 
-#include <functional>
-#include <memory>
-#include <string>
 #include <thread>
-#include <tuple>
-#include <utility>
-#include <vector>
 
 #include "runtime/core/delegates.h"
 #include "runtime/core/exceptions.h"

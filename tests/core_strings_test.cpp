@@ -1,6 +1,4 @@
-#include <gtest/gtest.h>
 
-#include <vector>
 
 #include "runtime/core/guid.h"
 #include "runtime/core/strings.h"

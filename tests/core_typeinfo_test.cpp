@@ -1,12 +1,6 @@
-#include <gtest/gtest.h>
 
 #include <future>
 #include <latch>
-#include <limits>
-#include <set>
-#include <string>
-#include <tuple>
-#include <utility>
 
 #include "runtime/values/typeinfo.h"
 #include "runtime/values/values.h"

@@ -1,10 +1,5 @@
-#include <gtest/gtest.h>
 
 #include <cmath>
-#include <limits>
-#include <string>
-#include <tuple>
-#include <utility>
 
 #include "runtime/text/encoding.h"
 #include "runtime/text/format_settings.h"

@@ -1,10 +1,7 @@
-#include <gtest/gtest.h>
 #include <sys/resource.h>
 
 #include <csignal>
 #include <fstream>
-#include <map>
-#include <set>
 
 #include "runtime/io/files.h"
 #include "runtime/io/paths.h"

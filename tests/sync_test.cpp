@@ -1,14 +1,9 @@
-#include <gtest/gtest.h>
 #include <sys/resource.h>
 
 #include <array>
 #include <atomic>
-#include <chrono>
-#include <functional>
 #include <iostream>
 #include <thread>
-#include <utility>
-#include <vector>
 
 #include "runtime/sync/event.h"
 #include "runtime/sync/thread.h"

@@ -1,6 +1,4 @@
-#include <gtest/gtest.h>
 
-#include <limits>
 
 #include "runtime/text/datetime.h"
 #include "runtime/text/local_time.h"

@@ -1,17 +1,9 @@
-#include <gtest/gtest.h>
 
-#include <chrono>
 #include <cmath>
 #include <cstdlib>
 #include <exception>
-#include <filesystem>
-#include <limits>
-#include <optional>
 #include <stdexcept>
-#include <string>
 #include <system_error>
-#include <utility>
-#include <vector>
 
 #include "runtime/text/casing.h"
 #include "runtime/text/encoding.h"

@@ -1,7 +1,5 @@
 #include <gmock/gmock.h>
 
-#include <memory>
-
 #include "common/uZqClasses.h"
 #include "runtime/core/objects.h"
 #include "runtime/io/streams.h"

@@ -1,6 +1,4 @@
-#include <gtest/gtest.h>
 
-#include <limits>
 
 #include "common/uZqClasses/streams.h"
 #include "tests/support/support.h"
@@ -146,14 +144,14 @@ TEST(StreamBuffers, CountedBuffersTakeWhatTheStreamHas) {
   const auto Buffer = ZqCreateMemoryBuffer(&Stream, 2, 3);
   EXPECT_THROW(Buffer->SetSize(~NativeUInt{}), std::bad_alloc);
   EXPECT_EQ(Buffer->GetAsByteArray(), (TBytes{'2', '3', '4'}));
-  Buffer->SetAsByteArray({1, 2, 3}), Buffer->SetSize(2);
+  Buffer->SetAsByteArray({9}), Buffer->SetAsString(beBase64, AnsiString("AQID")), Buffer->SetSize(2);
   EXPECT_EQ(Buffer->GetAsByteArray(), (TBytes{1, 2}));
   Buffer->SetSize(0);
   EXPECT_TRUE(Buffer->GetBuffer() == nullptr && Buffer->GetAsByteArray().empty());
   NativeUInt Size = 7;
   EXPECT_EQ(ZqByteArrToBuf({}, Size), nullptr);
   const auto Taken = ZqCreateMemoryBuffer(ZqByteArrToBuf({4, 5}, Size), 2);  // freed with it
-  EXPECT_TRUE(Size == 2 && Taken->GetAsByteArray() == (TBytes{4, 5}));
+  EXPECT_TRUE(Size == 2 && Taken->GetAsByteArray() == (TBytes{4, 5}) && Taken->GetAsString(beHexEncoded) == "0405");
   ZqReverseBuffer(Taken->GetBuffer(), 2);
   EXPECT_EQ(ZqBufToByteArr(Taken->GetBuffer(), 1), (TBytes{5}));
 }

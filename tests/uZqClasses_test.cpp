@@ -1,9 +1,6 @@
 #include "common/uZqClasses.h"
 
-#include <gtest/gtest.h>
-
 #include <thread>
-#include <utility>
 
 #include "runtime/values/typeinfo.h"
 #include "tests/support/support.h"

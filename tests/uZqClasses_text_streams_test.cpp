@@ -1,6 +1,4 @@
-#include <gtest/gtest.h>
 
-#include <map>
 
 #include "common/uZqClasses/text_streams.h"
 #include "common/uZqTypes.h"

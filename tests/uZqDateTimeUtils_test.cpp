@@ -1,7 +1,5 @@
 #include "common/uZqDateTimeUtils.h"
 
-#include <gtest/gtest.h>
-
 #include "common/uZqSysUtils.h"
 #include "runtime/io/files.h"
 #include "runtime/io/string_list.h"

@@ -1,13 +1,9 @@
 // What becomes of log lines and of the files of a series when one call to the system fails.
 
-#include <gtest/gtest.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <algorithm>
-#include <chrono>
 #include <cstdlib>
-#include <map>
 #include <thread>
 
 #include "common/uZqLogAppenders.h"

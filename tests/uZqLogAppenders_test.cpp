@@ -7,9 +7,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <atomic>
-#include <set>
 
 #include "common/uZqLogger/failures.h"
 #include "runtime/text/numbers.h"

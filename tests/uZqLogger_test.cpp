@@ -1,9 +1,5 @@
 #include "common/uZqLogger.h"
 
-#include <gtest/gtest.h>
-
-#include <chrono>
-#include <map>
 #include <thread>
 
 #include "common/rZqCommon.h"

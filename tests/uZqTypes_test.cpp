@@ -1,14 +1,6 @@
 #include "common/uZqTypes.h"
 
-#include <gtest/gtest.h>
-
-#include <functional>
 #include <iterator>
-#include <map>
-#include <string>
-#include <string_view>
-#include <tuple>
-#include <utility>
 
 #include "runtime/io/streams.h"
 #include "runtime/text/datetime.h"

@@ -1,7 +1,6 @@
 #include <gmock/gmock.h>
 #include <sys/wait.h>
 
-#include <chrono>
 #include <cstdio>
 #include <thread>
 

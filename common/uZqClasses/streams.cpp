@@ -93,8 +93,22 @@ void TZqMemoryBufferImpl::SetSize(NativeUInt AValue) {
 void TZqMemoryBufferImpl::SetAsByteArray(const TBytes& AValue) {
   NativeUInt Size = 0;
   void* const Block = ZqByteArrToBuf(AValue, Size);
-  FreeMem(std::exchange(FBuffer, Block));
-  FBufferSize = Size;
+  Take(Block, Size);
+}
+
+RawByteString TZqMemoryBufferImpl::GetAsString(TZqBinEncoding AEncoding) {
+  return ZqBufToString(FBuffer, FBufferSize, AEncoding);
+}
+
+void TZqMemoryBufferImpl::SetAsString(TZqBinEncoding AEncoding, const RawByteString& AValue) {
+  NativeUInt Size = 0;
+  void* const Block = ZqStringToBuf(AValue.View(), AEncoding, Size);
+  Take(Block, Size);
+}
+
+void TZqMemoryBufferImpl::Take(void* ABlock, NativeUInt ASize) noexcept {
+  FreeMem(std::exchange(FBuffer, ABlock));
+  FBufferSize = ASize;
 }
 
 IntfRef<IZqMemoryBuffer> ZqCreateMemoryBuffer(void* ABuffer, NativeUInt ASize) {

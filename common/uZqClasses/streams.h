@@ -5,6 +5,7 @@
 #include <limits>
 #include <string_view>
 
+#include "common/uZqClasses/hex.h"
 #include "runtime/core/interfaces.h"
 #include "runtime/io/streams.h"
 
@@ -41,11 +42,14 @@ struct ZQ_API IZqMemoryBuffer : Extends<IInterface> {
   /// The block, until the size or the content is set; nil when empty.
   virtual void* GetBuffer() = 0;
   virtual NativeUInt GetSize() = 0;
+  virtual RawByteString GetAsString(TZqBinEncoding AEncoding) = 0;
   /// A copy.
   virtual TBytes GetAsByteArray() = 0;
   /// Keeps the content as far as it fits; what is new is undefined. Raises std::bad_alloc, and nothing has changed
   /// then.
   virtual void SetSize(NativeUInt AValue) = 0;
+  /// Raises what ZqStringToBuf raises, and nothing has changed then.
+  virtual void SetAsString(TZqBinEncoding AEncoding, const RawByteString& AValue) = 0;
   virtual void SetAsByteArray(const TBytes& AValue) = 0;
 
  protected:
@@ -62,13 +66,17 @@ class ZQ_API TZqMemoryBufferImpl : public Implements<TInterfacedObject, IZqMemor
   void* GetBuffer() override { return FBuffer; }
   NativeUInt GetSize() override { return FBufferSize; }
   TBytes GetAsByteArray() override;
+  RawByteString GetAsString(TZqBinEncoding AEncoding) override;
   void SetSize(NativeUInt AValue) override;
   void SetAsByteArray(const TBytes& AValue) override;
+  void SetAsString(TZqBinEncoding AEncoding, const RawByteString& AValue) override;
 
  protected:
   ~TZqMemoryBufferImpl() override;
 
  private:
+  void Take(void* ABlock, NativeUInt ASize) noexcept;
+
   void* FBuffer = nullptr;  // GetMem's
   NativeUInt FBufferSize = 0;
 };

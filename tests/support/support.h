@@ -1,11 +1,22 @@
 #pragma once
 
+// What nearly every test uses comes along.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <chrono>
 #include <filesystem>
 #include <functional>
+#include <limits>
+#include <map>
+#include <memory>
 #include <optional>
 #include <ostream>
+#include <set>
 #include <string>
 #include <string_view>
+#include <tuple>
+#include <utility>
 #include <vector>
 
 #include "runtime/core/exceptions.h"
