@@ -3,7 +3,6 @@
 #include <thread>
 
 #include "runtime/core/delegates.h"
-#include "runtime/core/exceptions.h"
 #include "runtime/core/objects.h"
 #include "tests/plugin/plugin.h"
 #include "tests/support/support.h"

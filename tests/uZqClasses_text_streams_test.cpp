@@ -1,6 +1,7 @@
 
 
 #include "common/uZqClasses/text_streams.h"
+#include "common/uZqSysUtils.h"
 #include "common/uZqTypes.h"
 #include "tests/support/support.h"
 
@@ -234,6 +235,19 @@ TEST(WholeStreams, GoFromUtf16ToUtf8AndBack) {
     const UnicodeString NoUnicode = u"EConvertError: The sourcestream does not contain unicode data!";
     EXPECT_EQ(RaisedBy([&] { (void)ZqUTF8Decode(&Back); }), NoUnicode);
   }
+}
+
+TEST(TextFiles, AreWrittenInTheirCodePageAndReadByTheirMark) {
+  const TTempFolder Folder;
+  const UnicodeString File = Folder.File("f");
+  const auto Bytes = [&](auto... AArguments) { return ZqSaveString(File, AArguments...), Folder.Read("f"); };
+  EXPECT_EQ(
+      Bytes(WideString(u"ü€"), Word{1252}, true) + Bytes(AnsiString("\xFC"), Word{1252}, -1, false), "\xFC\x80\xFC");
+  EXPECT_EQ(Bytes(AnsiString("\xFC"), Word{1252}, 65001, true) + Bytes(UTF8String("ü")), "\xEF\xBB\xBFü\xEF\xBB\xBFü");
+  EXPECT_EQ(ZqLoadStringFromFile(File, fmOpenRead), u"ü");
+  EXPECT_EQ(Bytes(WideString(u"ü"), Word{1200}, true), std::string("\xFF\xFE\xFC\0", 4));
+  EXPECT_EQ(ZqLoadStringFromFile(File, fmOpenRead) + ZqFindResource(u"NONE", 65001, RT_RCDATA), u"ü");
+  EXPECT_THROW((void)ZqGetResource(u"NONE", 65001, RT_RCDATA), Exception);
 }
 
 }  // namespace
