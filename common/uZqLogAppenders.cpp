@@ -5,6 +5,7 @@
 #include <limits>
 #include <utility>
 
+#include "common/uZqDateTimeUtils.h"
 #include "common/uZqLogger/walk.h"
 #include "common/uZqWindows.h"
 #include "runtime/core/start_count.h"
@@ -455,7 +456,7 @@ void TZqRollingFileAppender::CheckBackupCount() {
 bool TZqRollingFileAppender::IsRollDue() const {
   constexpr Int64 cMinute = 60000;
   if (FFileStream->IsInherited()) return false;
-  if (!FFailedRoll || FFileStream->Size() >= FFailedRoll->Size + FMaxFileSize) return true;
+  if (!FFailedRoll || (FMaxFileSize != 0 && FFileStream->Size() >= FFailedRoll->Size + FMaxFileSize)) return true;
   const Int64 Waited = UtcMilliseconds() - FFailedRoll->Time;
   return Waited < 0 || Waited >= cMinute;
 }
@@ -532,14 +533,8 @@ std::optional<TDateTime> DateAtFront(std::string_view AText) {
   if (AText.size() < cShape.size()) return {};
   for (std::size_t i = 0; i < cShape.size(); ++i)
     if (cShape[i] == '0' ? !IsDigit(static_cast<Byte>(AText[i])) : AText[i] != cShape[i]) return {};
-  const auto Number = [&](std::size_t AAt, std::size_t ALength) {
-    Integer Result = 0;
-    for (const char c : AText.substr(AAt, ALength)) Result = 10 * Result + (c - '0');
-    return static_cast<Word>(Result);
-  };
   try {
-    return EncodeDate(Number(0, 4), Number(5, 2), Number(8, 2)) +
-           EncodeTime(Number(11, 2), Number(14, 2), Number(17, 2), 0);
+    return JoinDateTime(ZqISOStrToDate(FromUTF8(AText.substr(0, 10))), ZqISOStrToTime(FromUTF8(AText.substr(11, 8))));
   } catch (const EConvertError&) {  // digits, but no date
     return {};
   }

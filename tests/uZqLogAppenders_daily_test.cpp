@@ -111,6 +111,7 @@ TEST_F(LogDaily, ANameThatIsTakenEndsInANumberedBackup) {
 
 TEST_F(LogDaily, WhatCannotBeNamedGoesOnAndIsTriedAgainAfterAMinute) {
   const auto File = Add();
+  File->SetMaxFileSize(0);
   std::filesystem::create_directory(Folder.Path() / "app.2021-12-22.log");
   LogAt(cMidnight - 1, "a");
   LogAt(cMidnight, "b");

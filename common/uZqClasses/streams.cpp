@@ -81,6 +81,10 @@ TZqMemoryBufferImpl::TZqMemoryBufferImpl(NativeUInt ABufferSize)
 
 TZqMemoryBufferImpl::~TZqMemoryBufferImpl() { FreeMem(FBuffer); }
 
+RawByteString TZqMemoryBufferImpl::GetAsString(TZqBinEncoding AEncoding) {
+  return ZqBufToString(FBuffer, FBufferSize, AEncoding);
+}
+
 TBytes TZqMemoryBufferImpl::GetAsByteArray() { return ZqBufToByteArr(FBuffer, FBufferSize); }
 
 void TZqMemoryBufferImpl::SetSize(NativeUInt AValue) {
@@ -90,19 +94,15 @@ void TZqMemoryBufferImpl::SetSize(NativeUInt AValue) {
   FBufferSize = AValue;
 }
 
-void TZqMemoryBufferImpl::SetAsByteArray(const TBytes& AValue) {
-  NativeUInt Size = 0;
-  void* const Block = ZqByteArrToBuf(AValue, Size);
-  Take(Block, Size);
-}
-
-RawByteString TZqMemoryBufferImpl::GetAsString(TZqBinEncoding AEncoding) {
-  return ZqBufToString(FBuffer, FBufferSize, AEncoding);
-}
-
 void TZqMemoryBufferImpl::SetAsString(TZqBinEncoding AEncoding, const RawByteString& AValue) {
   NativeUInt Size = 0;
   void* const Block = ZqStringToBuf(AValue.View(), AEncoding, Size);
+  Take(Block, Size);
+}
+
+void TZqMemoryBufferImpl::SetAsByteArray(const TBytes& AValue) {
+  NativeUInt Size = 0;
+  void* const Block = ZqByteArrToBuf(AValue, Size);
   Take(Block, Size);
 }
 

@@ -65,11 +65,11 @@ class ZQ_API TZqMemoryBufferImpl : public Implements<TInterfacedObject, IZqMemor
 
   void* GetBuffer() override { return FBuffer; }
   NativeUInt GetSize() override { return FBufferSize; }
-  TBytes GetAsByteArray() override;
   RawByteString GetAsString(TZqBinEncoding AEncoding) override;
+  TBytes GetAsByteArray() override;
   void SetSize(NativeUInt AValue) override;
-  void SetAsByteArray(const TBytes& AValue) override;
   void SetAsString(TZqBinEncoding AEncoding, const RawByteString& AValue) override;
+  void SetAsByteArray(const TBytes& AValue) override;
 
  protected:
   ~TZqMemoryBufferImpl() override;

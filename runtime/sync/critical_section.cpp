@@ -11,6 +11,7 @@
 #include <cerrno>
 #include <ctime>
 #include <mutex>
+#include <utility>
 
 #include "runtime/sync/pause.h"
 
@@ -20,6 +21,7 @@ namespace {
 
 constexpr int cSpins = 2000;  // pauses in all, some 20 to 90 us
 constexpr int cLongestPause = 512;
+constexpr Cardinal cSlice = 10;  // milliseconds between two looks where a wake-up may be missed
 
 // Initial-exec: one load relative to the thread pointer, where a shared library would otherwise make a call.
 __attribute__((tls_model("initial-exec"))) constinit thread_local std::uint32_t ThreadId = 0;
@@ -38,6 +40,13 @@ bool WaitOn(void* AWord, std::uint32_t AValue, const timespec* ADeadline) noexce
   return ::syscall(SYS_futex, AWord, FUTEX_WAIT_BITSET_PRIVATE, AValue, ADeadline, nullptr, FUTEX_BITSET_MATCH_ANY) ==
              0 ||
          errno != ETIMEDOUT;
+}
+
+// The same for a while at most: a sandbox that was put up since has taken the barrier away.
+bool WaitASlice(void* AWord, std::uint32_t AValue, const timespec* ADeadline) noexcept {
+  const timespec Soon = After(cSlice);
+  const auto Key = [](const timespec& ATime) { return std::pair(ATime.tv_sec, ATime.tv_nsec); };
+  return WaitOn(AWord, AValue, &Soon) || ADeadline == nullptr || Key(Soon) < Key(*ADeadline);
 }
 
 // AWord is an address only: a lock that lies there by now takes the wake-up for a reason to look again.
@@ -116,8 +125,9 @@ bool TCriticalSection::Spin() noexcept {
   if (Spin()) return true;
   FSleepers.fetch_add(1);
   ParkedAt(this).fetch_add(1);
-  ::syscall(SYS_membarrier, MEMBARRIER_CMD_PRIVATE_EXPEDITED, 0, 0);
-  const bool Taken = Sleep(AMilliseconds == cForEver ? nullptr : &Deadline);
+  const bool Ordered = ::syscall(SYS_membarrier, MEMBARRIER_CMD_PRIVATE_EXPEDITED, 0, 0) == 0 ||
+                       (ParkedAt(this).load(std::memory_order_relaxed) & cFenced) != 0;
+  const bool Taken = Sleep(AMilliseconds == cForEver ? nullptr : &Deadline, Ordered);
   if (Taken) FOwner.fetch_and(~cWaking, std::memory_order_relaxed);  // who leaves wakes the next one
   ParkedAt(this).fetch_sub(1);
   FSleepers.fetch_sub(1);
@@ -126,7 +136,7 @@ bool TCriticalSection::Spin() noexcept {
 
 // While cWaking is set nobody wakes a second thread. So who isn't to come back takes it away, and who goes to sleep
 // takes it away before its last look; only more wake-ups than needed can come of that.
-bool TCriticalSection::Sleep(const timespec* ADeadline) noexcept {
+bool TCriticalSection::Sleep(const timespec* ADeadline, bool AOrdered) noexcept {
   for (bool InTime = true;;) {
     const std::uint32_t Owner = OwnerIn(FOwner.fetch_and(~cWaking));
     if (Owner == 0) {
@@ -134,7 +144,7 @@ bool TCriticalSection::Sleep(const timespec* ADeadline) noexcept {
     } else if (!InTime) {
       return false;
     } else {
-      InTime = WaitOn(&FOwner, Owner, ADeadline);
+      InTime = AOrdered ? WaitOn(&FOwner, Owner, ADeadline) : WaitASlice(&FOwner, Owner, ADeadline);
       if (InTime && Spin()) return true;
     }
   }

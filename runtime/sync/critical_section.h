@@ -76,7 +76,7 @@ class ZQ_API TCriticalSection {
   bool Take(std::uint32_t AThread) noexcept;
   bool Spin() noexcept;
   bool Wait(Cardinal AMilliseconds) noexcept;
-  bool Sleep(const timespec* ADeadline) noexcept;
+  bool Sleep(const timespec* ADeadline, bool AOrdered) noexcept;
   void LeaveAndWake() noexcept;
 
   static TCount ParkedCounts[cParkedCounts];  // sleepers on all locks of one hash; outlives every lock

@@ -353,8 +353,9 @@ int EncodeByTable(const TCodePage& APage, Cardinal AFlags, TSubstitute& ASubstit
   const bool Roomy = ADest != nullptr && static_cast<std::size_t>(ADestBytes) >= Most;
   const std::size_t Needed = Roomy ? 0 : Table->Encode(ASource, Chars, nullptr, Missing);
   const std::size_t Room = ADest == nullptr ? std::numeric_limits<int>::max() : static_cast<std::size_t>(ADestBytes);
+  if (Missing.Meets) return cMeets;
   if (Needed > Room) return Refuse(ERROR_INSUFFICIENT_BUFFER);
-  const std::size_t Result = ADest == nullptr || Missing.Meets ? Needed : Table->Encode(ASource, Chars, ADest, Missing);
+  const std::size_t Result = ADest == nullptr ? Needed : Table->Encode(ASource, Chars, ADest, Missing);
   if (Missing.Meets) return cMeets;
   ASubstitute.Used = ASubstitute.Used || Missing.Found;
   return static_cast<int>(Result);
