@@ -67,78 +67,72 @@ struct TSample {
   std::vector<char> ByteRoom;
 };
 
-void Count(benchmark::State& AState, std::size_t AExpected, std::int64_t AGot) {
-  if (AGot != static_cast<std::int64_t>(AExpected)) std::abort();
+// AConvert returns how many units or bytes it made, which must be AExpected.
+void Measure(benchmark::State& AState, std::size_t AExpected, auto AConvert) {
+  std::int64_t Got = 0;
+  for (auto Step : AState) {
+    Got = static_cast<std::int64_t>(AConvert());
+    benchmark::ClobberMemory();
+  }
+  if (Got != static_cast<std::int64_t>(AExpected)) std::abort();
   AState.SetItemsProcessed(AState.iterations() * AState.range(1));
 }
 
 void Utf8ToUtf16(benchmark::State& AState) {
   TSample Sample(AState);
-  Integer Got = 0;
-  for (auto Step : AState) {
-    Got = TZqEncoding::ConvertA(reinterpret_cast<const Byte*>(Sample.Bytes.data()),
+  Measure(AState, Sample.Text.size(), [&] {
+    return TZqEncoding::ConvertA(reinterpret_cast<const Byte*>(Sample.Bytes.data()),
         static_cast<Integer>(Sample.Bytes.size()), cUtf8, Sample.WideRoom.data(),
         static_cast<Integer>(Sample.WideRoom.size()));
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Text.size(), Got);
+  });
 }
 
 void IcuUtf8ToUtf16(benchmark::State& AState) {
   TSample Sample(AState);
-  std::int32_t Got = 0;
-  for (auto Step : AState) {
+  Measure(AState, Sample.Text.size(), [&] {
+    std::int32_t Got = 0;
     UErrorCode Error = U_ZERO_ERROR;
     u_strFromUTF8(Sample.WideRoom.data(), static_cast<std::int32_t>(Sample.WideRoom.size()), &Got, Sample.Bytes.data(),
         static_cast<std::int32_t>(Sample.Bytes.size()), &Error);
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Text.size(), Got);
+    return Got;
+  });
 }
 
 void Utf8Size(benchmark::State& AState) {
   const TSample Sample(AState);
-  Integer Got = 0;
-  for (auto Step : AState) {
-    Got = TZqEncoding::ConvertA(reinterpret_cast<const Byte*>(Sample.Bytes.data()),
+  Measure(AState, Sample.Text.size(), [&] {
+    return TZqEncoding::ConvertA(reinterpret_cast<const Byte*>(Sample.Bytes.data()),
         static_cast<Integer>(Sample.Bytes.size()), cUtf8, nullptr, 0);
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Text.size(), Got);
+  });
 }
 
 void IcuUtf8Size(benchmark::State& AState) {
   const TSample Sample(AState);
-  std::int32_t Got = 0;
-  for (auto Step : AState) {
+  Measure(AState, Sample.Text.size(), [&] {
+    std::int32_t Got = 0;
     UErrorCode Error = U_ZERO_ERROR;
     u_strFromUTF8(nullptr, 0, &Got, Sample.Bytes.data(), static_cast<std::int32_t>(Sample.Bytes.size()), &Error);
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Text.size(), Got);
+    return Got;
+  });
 }
 
 void Utf16ToUtf8(benchmark::State& AState) {
   TSample Sample(AState);
-  Integer Got = 0;
-  for (auto Step : AState) {
-    Got = TZqEncoding::ConvertW(Sample.Text.data(), static_cast<Integer>(Sample.Text.size()),
+  Measure(AState, Sample.Bytes.size(), [&] {
+    return TZqEncoding::ConvertW(Sample.Text.data(), static_cast<Integer>(Sample.Text.size()),
         reinterpret_cast<Byte*>(Sample.ByteRoom.data()), static_cast<Integer>(Sample.ByteRoom.size()), cUtf8);
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Bytes.size(), Got);
+  });
 }
 
 void IcuUtf16ToUtf8(benchmark::State& AState) {
   TSample Sample(AState);
-  std::int32_t Got = 0;
-  for (auto Step : AState) {
+  Measure(AState, Sample.Bytes.size(), [&] {
+    std::int32_t Got = 0;
     UErrorCode Error = U_ZERO_ERROR;
     u_strToUTF8(Sample.ByteRoom.data(), static_cast<std::int32_t>(Sample.ByteRoom.size()), &Got, Sample.Text.data(),
         static_cast<std::int32_t>(Sample.Text.size()), &Error);
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Bytes.size(), Got);
+    return Got;
+  });
 }
 
 void Texts(benchmark::internal::Benchmark* ABenchmark) {
@@ -193,50 +187,38 @@ struct TPageSample {
 
 void PageToUtf16(benchmark::State& AState) {
   TPageSample Sample(AState);
-  Integer Got = 0;
-  for (auto Step : AState) {
-    Got = TZqEncoding::ConvertA(reinterpret_cast<const Byte*>(Sample.Bytes.data()),
+  Measure(AState, Sample.Text.size(), [&] {
+    return TZqEncoding::ConvertA(reinterpret_cast<const Byte*>(Sample.Bytes.data()),
         static_cast<Integer>(Sample.Bytes.size()), Sample.Case.Page, Sample.WideRoom.data(),
         static_cast<Integer>(Sample.WideRoom.size()));
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Text.size(), Got);
+  });
 }
 
 void IcuPageToUtf16(benchmark::State& AState) {
   TPageSample Sample(AState);
-  std::int32_t Got = 0;
-  for (auto Step : AState) {
+  Measure(AState, Sample.Text.size(), [&] {
     UErrorCode Error = U_ZERO_ERROR;
-    Got = ucnv_toUChars(Sample.Converter, Sample.WideRoom.data(), static_cast<std::int32_t>(Sample.WideRoom.size()),
+    return ucnv_toUChars(Sample.Converter, Sample.WideRoom.data(), static_cast<std::int32_t>(Sample.WideRoom.size()),
         Sample.Bytes.data(), static_cast<std::int32_t>(Sample.Bytes.size()), &Error);
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Text.size(), Got);
+  });
 }
 
 void Utf16ToPage(benchmark::State& AState) {
   TPageSample Sample(AState);
-  Integer Got = 0;
-  for (auto Step : AState) {
-    Got = TZqEncoding::ConvertW(Sample.Text.data(), static_cast<Integer>(Sample.Text.size()),
+  Measure(AState, Sample.Bytes.size(), [&] {
+    return TZqEncoding::ConvertW(Sample.Text.data(), static_cast<Integer>(Sample.Text.size()),
         reinterpret_cast<Byte*>(Sample.ByteRoom.data()), static_cast<Integer>(Sample.ByteRoom.size()),
         Sample.Case.Page);
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Bytes.size(), Got);
+  });
 }
 
 void IcuUtf16ToPage(benchmark::State& AState) {
   TPageSample Sample(AState);
-  std::int32_t Got = 0;
-  for (auto Step : AState) {
+  Measure(AState, Sample.Bytes.size(), [&] {
     UErrorCode Error = U_ZERO_ERROR;
-    Got = ucnv_fromUChars(Sample.Converter, Sample.ByteRoom.data(), static_cast<std::int32_t>(Sample.ByteRoom.size()),
+    return ucnv_fromUChars(Sample.Converter, Sample.ByteRoom.data(), static_cast<std::int32_t>(Sample.ByteRoom.size()),
         Sample.Text.data(), static_cast<std::int32_t>(Sample.Text.size()), &Error);
-    benchmark::ClobberMemory();
-  }
-  Count(AState, Sample.Bytes.size(), Got);
+  });
 }
 
 void Pages(benchmark::internal::Benchmark* ABenchmark) {
