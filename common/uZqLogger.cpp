@@ -466,13 +466,13 @@ inline void TZqLogger::WriteToAppenders(TZqLogWalk& AWalk, const UnicodeString& 
 }
 
 // Level and count are tested first, so that a message that nobody writes takes no lock and isn't even made. Nothing is
-// left to do behind the write: each frame to return into costs, see WriteWhole.
-ZQ_HOT void TZqLogger::DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const TText& ALogMessage,
-    PZqDataRec AValue, TZqLogIndent ALogIndent) {
+// left to do behind the write, and all arguments fit into registers: no frame is kept to return into, see WriteWhole.
+ZQ_HOT void TZqLogger::DoLog(
+    TZqLogLevel ALogLevel, const TText& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   TZqLogger* const First = NextToWrite(this, ALogLevel);
   if (First == nullptr) return;
-  if (!ALogMessage.IsWhole()) return WriteConverted(First, ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
-  WriteWhole(First, ASender, ALogLevel, ALogMessage.AsWhole(), AValue, ALogIndent);
+  if (!ALogMessage.IsWhole()) return WriteConverted(First, ALogLevel, ALogMessage, AValue, ALogIndent);
+  WriteWhole(First, ALogLevel, ALogMessage.AsWhole(), AValue, ALogIndent);
 }
 
 // The nearest logger on the way up, from ALogger on, that has appenders for a message of that level.
@@ -485,48 +485,58 @@ inline TZqLogger* TZqLogger::NextToWrite(TZqLogger* ALogger, TZqLogLevel ALogLev
 namespace {
 
 // Room for a text that has to be made wide: the thread's own, so that a second call finds it, and taken out meanwhile,
-// for a message from within an appender comes here too.
+// for a message from within an appender comes here too. Messages may come after the end of a thread's objects.
 class TMessageRoom {
  public:
-  TMessageRoom() {
-    if (!Ended) std::swap(Text.Str(), Spare());
+  TMessageRoom() : FText(std::exchange(Spare, nullptr)) {
+    if (FText == nullptr) [[unlikely]]
+      FText = Make();
   }
   TMessageRoom(const TMessageRoom&) = delete;
   TMessageRoom& operator=(const TMessageRoom&) = delete;
   ~TMessageRoom() {
-    if (!Ended && Text.Str().capacity() <= cKept) std::swap(Text.Str(), Spare());
+    if (Ended || Spare != nullptr || FText->Str().capacity() > cKept) [[unlikely]]
+      delete FText;
+    else Spare = FText;
   }
-  UnicodeString Text;
+  [[nodiscard]] UnicodeString& Text() const noexcept { return *FText; }
 
  private:
   static constexpr std::size_t cKept = 1 << 15;
-  static inline constinit thread_local bool Ended = false;  // messages may come after the end of a thread's objects
-  static std::u16string& Spare() {
-    struct TSpare {
-      ~TSpare() { Ended = true; }
-      std::u16string Text;
+  // Initial-exec: no call where a shared library would otherwise make one.
+  __attribute__((tls_model("initial-exec"))) static inline constinit thread_local UnicodeString* Spare = nullptr;
+  __attribute__((tls_model("initial-exec"))) static inline constinit thread_local bool Ended = false;
+
+  [[gnu::noinline]] static UnicodeString* Make() {
+    struct TEnd {
+      ~TEnd() {
+        Ended = true;
+        delete std::exchange(Spare, nullptr);
+      }
     };
-    thread_local TSpare Kept;
-    return Kept.Text;
+    if (!Ended) thread_local const TEnd End;
+    return new UnicodeString;
   }
+
+  UnicodeString* FText;
 };
 
 }  // namespace
 
-ZQ_HOT [[gnu::noinline]] void TZqLogger::WriteConverted(TZqLogger* AFirst, const UnicodeString& ASender,
-    TZqLogLevel ALogLevel, const TText& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
-  TMessageRoom Room;
-  WriteWhole(AFirst, ASender, ALogLevel, ALogMessage.In(Room.Text), AValue, ALogIndent);
+ZQ_HOT [[gnu::noinline]] void TZqLogger::WriteConverted(
+    TZqLogger* AFirst, TZqLogLevel ALogLevel, const TText& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+  const TMessageRoom Room;
+  WriteWhole(AFirst, ALogLevel, ALogMessage.In(Room.Text()), AValue, ALogIndent);
 }
 
 // Each lock is left before the message goes on to the parent. Flat, because after a system call each return into one
 // more frame is mispredicted.
-[[gnu::flatten]] ZQ_HOT void TZqLogger::WriteWhole(TZqLogger* AFirst, const UnicodeString& ASender,
-    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
+[[gnu::flatten]] ZQ_HOT void TZqLogger::WriteWhole(TZqLogger* AFirst, TZqLogLevel ALogLevel,
+    const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   TZqLogWalk Walk(this);
   try {
     for (TZqLogger* Current = AFirst; Current != nullptr; Current = NextToWrite(Current->Upwards(), ALogLevel))
-      Current->WriteToAppenders(Walk, ASender, ALogLevel, ALogMessage, AValue, ALogIndent);
+      Current->WriteToAppenders(Walk, FFullName, ALogLevel, ALogMessage, AValue, ALogIndent);
   } catch (const Exception&) {  // logging never raises into its caller
   }
 }
@@ -543,7 +553,7 @@ void TZqLogger::Debug(const TText& ALogMessage, TVarArgs AArgs) { Log(llDebug, F
 void TZqLogger::Debug(const TText& AMessage, const Variant& AValue) { Log(llDebug, AMessage, AValue); }
 void TZqLogger::Debug(const TText& AMessage, const TObject* AValue) { Log(llDebug, AMessage, AValue); }
 void TZqLogger::Debug(const TText& AMessage, const Exception& AValue) { Log(llDebug, AMessage, AValue); }
-ZQ_HOT void TZqLogger::Info(const TText& ALogMessage) { DoLog(FFullName, llInfo, ALogMessage, nullptr, liIndentNone); }
+ZQ_HOT void TZqLogger::Info(const TText& ALogMessage) { DoLog(llInfo, ALogMessage, nullptr, liIndentNone); }
 void TZqLogger::Warn(const TText& ALogMessage) { Log(llWarn, ALogMessage); }
 void TZqLogger::Error(const TText& ALogMessage) { Log(llError, ALogMessage); }
 void IZqLogger::Error(const TText& ALogMessage, const std::exception& AException) {
@@ -580,19 +590,19 @@ void TZqLogger::ExitMethod(const TObject* AObject, const TText& AMethodName, TZq
 }
 
 ZQ_HOT void TZqLogger::Log(TZqLogLevel ALogLevel, const TText& ALogMessage, TZqLogIndent ALogIndent) {
-  DoLog(FFullName, ALogLevel, ALogMessage, nullptr, ALogIndent);
+  DoLog(ALogLevel, ALogMessage, nullptr, ALogIndent);
 }
 void TZqLogger::Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const Variant& AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = VariantRec(AValue);
-  DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
+  DoLog(ALogLevel, ALogMessage, &Value, ALogIndent);
 }
 void TZqLogger::Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const TObject* AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = ObjectRec(AValue);
-  DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
+  DoLog(ALogLevel, ALogMessage, &Value, ALogIndent);
 }
 void TZqLogger::Log(TZqLogLevel ALogLevel, const TText& ALogMessage, const Exception& AValue, TZqLogIndent ALogIndent) {
   const TZqDataRec Value = ExceptionRec(AValue);
-  DoLog(FFullName, ALogLevel, ALogMessage, &Value, ALogIndent);
+  DoLog(ALogLevel, ALogMessage, &Value, ALogIndent);
 }
 void TZqLogger::Log(const IntfRef<IZqLogData>& ALogData) {
   Assert(static_cast<bool>(ALogData));

@@ -597,17 +597,16 @@ class ZQ_API TZqLogger : public Implements<TObject, IZqLogger> {
   friend ZQ_API TZqLogger* Logger();
   friend void uZqLogger::EndProcess() noexcept;
 
-  void DoLog(const UnicodeString& ASender, TZqLogLevel ALogLevel, const TText& ALogMessage, PZqDataRec AValue,
-      TZqLogIndent ALogIndent);
+  void DoLog(TZqLogLevel ALogLevel, const TText& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent);
   static TZqLogger* NextToWrite(TZqLogger* ALogger, TZqLogLevel ALogLevel);
   // Where a message goes on to; null where it ends.
   [[nodiscard]] TZqLogger* Upwards() const noexcept {
     return FAdditive.load(std::memory_order_relaxed) ? FParent.load(std::memory_order_relaxed) : nullptr;
   }
-  void WriteConverted(TZqLogger* AFirst, const UnicodeString& ASender, TZqLogLevel ALogLevel, const TText& ALogMessage,
-      PZqDataRec AValue, TZqLogIndent ALogIndent);
-  void WriteWhole(TZqLogger* AFirst, const UnicodeString& ASender, TZqLogLevel ALogLevel,
-      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent);
+  void WriteConverted(
+      TZqLogger* AFirst, TZqLogLevel ALogLevel, const TText& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent);
+  void WriteWhole(TZqLogger* AFirst, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue,
+      TZqLogIndent ALogIndent);
   void WriteToAppenders(TZqLogWalk& AWalk, const UnicodeString& ASender, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent);
   IntfRef<TZqLogger> FindOrMakeChild(const UnicodeString& AName, bool& AMade);

@@ -100,16 +100,19 @@ bool StartsAscii(const char16_t* ASource) noexcept {
   return ((LoadBlock(ASource) | LoadBlock(ASource + 4)) & 0xFF80FF80FF80FF80U) == 0;
 }
 
-// Copies the ASCII run at the front and returns its length.
+// Copies the ASCII run at the front and returns its length. What is left behind the last whole block is done with a
+// block that overlaps the one before.
 std::size_t WidenAscii(const char* ASource, std::size_t ALength, char16_t* ADest) noexcept {
   std::size_t i = 0;
 #if defined(__SSE2__)
   const __m128i Zero = _mm_setzero_si128();
-  for (; i + 16 <= ALength; i += 16) {
-    const __m128i Block = _mm_loadu_si128(reinterpret_cast<const __m128i*>(ASource + i));
+  while (i < ALength && ALength >= 16) {
+    const std::size_t At = std::min(i, ALength - 16);
+    const __m128i Block = _mm_loadu_si128(reinterpret_cast<const __m128i*>(ASource + At));
     if (_mm_movemask_epi8(Block) != 0) break;
-    _mm_storeu_si128(reinterpret_cast<__m128i*>(ADest + i), _mm_unpacklo_epi8(Block, Zero));
-    _mm_storeu_si128(reinterpret_cast<__m128i*>(ADest + i + 8), _mm_unpackhi_epi8(Block, Zero));
+    _mm_storeu_si128(reinterpret_cast<__m128i*>(ADest + At), _mm_unpacklo_epi8(Block, Zero));
+    _mm_storeu_si128(reinterpret_cast<__m128i*>(ADest + At + 8), _mm_unpackhi_epi8(Block, Zero));
+    i = At + 16;
   }
 #endif
   for (; i < ALength && static_cast<unsigned char>(ASource[i]) < 0x80; ++i)
@@ -122,7 +125,7 @@ std::size_t WidenAscii(const char* ASource, std::size_t ALength, std::size_t) no
   return AsciiRun(ASource, ALength);
 }
 
-// At least eight units. What is left behind the last whole block is done with a block that overlaps the one before.
+// The same the other way, of at least eight units.
 std::size_t NarrowAscii(const char16_t* ASource, std::size_t ALength, char* ADest) noexcept {
   std::size_t i = 0;
 #if defined(__SSE2__)
