@@ -1,8 +1,5 @@
 #include "common/uZqLogLayouts.h"
 
-#include <chrono>
-#include <cstdio>
-
 #include "runtime/core/start_count.h"
 #include "runtime/text/datetime.h"
 #include "runtime/text/local_time.h"
@@ -14,25 +11,11 @@ namespace {
 constinit TStartCount Starts;
 constexpr std::u16string_view cIndentStep = u"  ";
 
-// "yyyy-mm-dd hh:mm:ss" of a moment in whole seconds. A log goes on where the calendar of the runtime ends: the years
-// behind 9999 have five digits.
-std::string LocalText(Int64 AUtcMilliseconds) {
-  const std::chrono::sys_seconds Moment(std::chrono::seconds(LocalMilliseconds(AUtcMilliseconds) / 1000));
-  const auto Day = std::chrono::floor<std::chrono::days>(Moment);
-  const std::chrono::year_month_day Date(Day);
-  const std::chrono::hh_mm_ss Time(Moment - Day);
-  char Text[40];
-  const int Length = std::snprintf(Text, sizeof Text, "%04d-%02u-%02u %02d:%02d:%02d", static_cast<int>(Date.year()),
-      static_cast<unsigned>(Date.month()), static_cast<unsigned>(Date.day()), static_cast<int>(Time.hours().count()),
-      static_cast<int>(Time.minutes().count()), static_cast<int>(Time.seconds().count()));
-  return {Text, static_cast<std::size_t>(Length)};
-}
-
 UnicodeString NowText() {
   try {
     return DateTimeToStr(Now());
   } catch (const EConvertError&) {
-    return FromUTF8(LocalText(UtcMilliseconds()));
+    return FromUTF8(ZqCalendarText(LocalMilliseconds(UtcMilliseconds())));
   }
 }
 
@@ -53,6 +36,8 @@ UnicodeString TZqSimpleLayout::GetHeader() { return u"Log started on : " + NowTe
 
 UnicodeString TZqSimpleLayout::GetFooter() { return u"Log stopped on : " + NowText(); }
 
+std::string TZqSimpleLayout::TimeText(Int64 ASecond) { return ZqCalendarText(LocalMilliseconds(ASecond)) + ":"; }
+
 void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
   if (ALogIndent == liIndentIncrease) FIndent += cIndentStep;
   if (ALogIndent == liIndentDecrease) FIndent.SetLength(FIndent.Length() - static_cast<Integer>(cIndentStep.size()));
@@ -62,11 +47,10 @@ void TZqSimpleLayout::ChangeIndent(TZqLogIndent ALogIndent) {
 // for the time zone.
 ZQ_HOT std::string_view TZqSimpleLayout::Front(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel) {
   const Int64 Milliseconds = UtcMilliseconds();
-  if (Milliseconds < FSecond || Milliseconds > FSecond + 999 || ALogLevel != FLevel || ALoggerName != FLoggerName)
-      [[unlikely]]
+  if (!ZqIsInSecond(Milliseconds, FSecond) || ALogLevel != FLevel || ALoggerName != FLoggerName) [[unlikely]]
     RenewFront(Milliseconds, ALoggerName, ALogLevel);
   const auto Rest = static_cast<Integer>(Milliseconds - FSecond);
-  char* const Digits = FFront.data() + FTime.size();
+  char* const Digits = FFront.data() + FTime.Text().size();
   Digits[0] = static_cast<char>('0' + Rest / 100);
   Digits[1] = static_cast<char>('0' + Rest / 10 % 10);
   Digits[2] = static_cast<char>('0' + Rest % 10);
@@ -74,12 +58,11 @@ ZQ_HOT std::string_view TZqSimpleLayout::Front(const UnicodeString& ALoggerName,
 }
 
 void TZqSimpleLayout::RenewFront(Int64 AMilliseconds, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel) {
-  const Int64 Second = AMilliseconds - (AMilliseconds % 1000 + 1000) % 1000;
-  if (Second != FSecond) FTime = LocalText(Second) + ":";
+  const std::string& Time = FTime.At(AMilliseconds);
   FLoggerName = ALoggerName;
   FLevel = ALogLevel;
-  FFront = FTime + "zzz - " + ToUTF8(ZqLogLevels[ALogLevel]) + " " + ToUTF8(ALoggerName) + " - ";
-  FSecond = Second;
+  FFront = Time + "zzz - " + ToUTF8(ZqLogLevels[ALogLevel]) + " " + ToUTF8(ALoggerName) + " - ";
+  FSecond = FTime.Second();
 }
 
 template <class TLine>
@@ -112,6 +95,7 @@ UnicodeString TZqSimpleLayout::FormatLine(const UnicodeString& ALoggerName, TZqL
 void uZqLogLayouts::Start() {
   if (!Starts.Begins()) return;
   RegisteredLayouts()->Add(TZqLogBaseClass::Of<TZqSimpleLayout>());
+  RegisteredLayouts()->Add(TZqLogBaseClass::Of<TZqXmlLayout>());
 }
 
 void uZqLogLayouts::Stop() { Starts.Ends(); }

@@ -4,6 +4,8 @@
 #include <string>
 #include <string_view>
 
+#include "common/uZqLogLayouts/time_text.h"
+#include "common/uZqLogLayouts/xml.h"
 #include "common/uZqLogger.h"
 #include "runtime/core/utf8.h"
 
@@ -42,6 +44,7 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
     TZqSimpleLayout& Layout;
   };
 
+  static std::string TimeText(Int64 ASecond);
   void ChangeIndent(TZqLogIndent ALogIndent);
   std::string_view Front(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel);
   void RenewFront(Int64 AMilliseconds, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel);
@@ -54,7 +57,7 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
   // How the last line began, in UTF-8: "yyyy-mm-dd hh:mm:ss:zzz - Level logger - ", and what that was made from.
   std::string FFront;
   Int64 FSecond = std::numeric_limits<Int64>::min();  // in milliseconds, UTC
-  std::string FTime;                                  // up to the milliseconds
+  TZqSecondText FTime{TimeText};                      // up to the milliseconds
   UnicodeString FLoggerName;
   TZqLogLevel FLevel = llAll;
 };

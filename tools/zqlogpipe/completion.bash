@@ -7,11 +7,14 @@ _zqlogpipe() {
     --level)
       mapfile -t COMPREPLY < <(compgen -W 'trace debug info warn warning error fatal' -- "$word")
       return ;;
+    --layout)
+      mapfile -t COMPREPLY < <(compgen -W 'simple xml' -- "$word")
+      return ;;
     --max-size | --backups | --pattern | --logger | --retry) return ;;
   esac
   if [[ $word == -* ]]; then
     mapfile -t COMPREPLY < <(compgen -W '--file --max-size --backups --daily --pattern --no-append --logger --level --detect-level
-      --no-time --tee --retry --quiet --version --help' -- "$word")
+      --no-time --layout --tee --retry --quiet --version --help' -- "$word")
   else
     compopt -o filenames
     while IFS= read -r name; do COMPREPLY+=("$name"); done < <(compgen -f -- "$word")

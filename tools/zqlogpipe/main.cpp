@@ -26,6 +26,8 @@
 #include "common/uZqLogger.h"
 #include "common/uZqLogger/failures.h"
 #include "runtime/core/utf8.h"
+#include "runtime/io/files.h"
+#include "runtime/io/paths.h"
 
 namespace {
 
@@ -51,6 +53,9 @@ constexpr char cHelp[] =
     "  --detect-level    the first such word in a line decides its level, whatever its case; --level where there is "
     "none\n"
     "  --no-time         lines without the time\n"
+    "  --layout LAYOUT   simple, a line of text for each line, or xml, an element; FILE gets .log.xml where it has no\n"
+    "                    extension then, a stylesheet that shows it as a table is written beside it, and a FILE that\n"
+    "                    exists becomes a backup, as with --no-append (simple)\n"
     "  --tee             lines go to standard output too, as they come\n"
     "  --retry SECONDS   a line that can't be written waits so long and is tried again, until it is written; without "
     "it\n"
@@ -87,6 +92,7 @@ struct TOptions {
   TZqLogLevel Level = llInfo;
   bool DetectLevel = false;
   bool Time = true;
+  bool Xml = false;
   bool Tee = false;
   bool Quiet = false;
   Cardinal Retry = 0;  // seconds; 0: a line that can't be written is lost
@@ -143,6 +149,11 @@ Cardinal Bytes(std::string_view AOption, std::string_view AText) {
   throw TUsageError(std::string(AOption) + " takes less than 4G, not '" + std::string(AText) + "'");
 }
 
+bool IsXml(const std::string& ALayout) {
+  if (ALayout == "simple" || ALayout == "xml") return ALayout == "xml";
+  throw TUsageError("--layout takes simple or xml, not '" + ALayout + "'");
+}
+
 TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
   TOptions Result;
   for (std::size_t i = 0; i < AWords.size(); ++i) {
@@ -168,6 +179,7 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
     else if (Word == "--retry") Result.Retry = Number<Cardinal>(Word, Value(), 1);
     else if (Word == "--version") Result.Version = true;
     else if (Word == "--help" || Word == "-h") Result.Help = true;
+    else if (Word == "--layout") Result.Xml = IsXml(Value());
     else if (Word == "--level") {
       const std::string Text = Value();
       const auto Level = LevelOf(Text);
@@ -182,6 +194,8 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
   }
   const auto IsBlank = [](const std::string& AName) { return Trim(FromUTF8(AName)).IsEmpty(); };
   if (std::any_of(Result.Files.begin(), Result.Files.end(), IsBlank)) throw TUsageError("--file needs a name");
+  if (Result.Xml && !Result.Time) throw TUsageError("--no-time goes with --layout simple only");
+  if (Result.Xml) Result.Append = false;  // two logs in one file are no XML
   if (Result.Files.empty() && !Result.Help && !Result.Version) throw TUsageError("--file is needed");
   return Result;
 }
@@ -343,14 +357,27 @@ class TPipe {
 
   void Add(const std::string& AFile, TZqRollingFileAppender* AAppender) {
     FAppenders.emplace_back(AAppender);
-    AAppender->SetFileName(utf8::Decode(AFile, utf8::TMalformed::Escape));
+    const TFileName Name = utf8::Decode(AFile, utf8::TMalformed::Escape);
+    AAppender->SetFileName(Name);
     if (FOptions.MaxSize) AAppender->SetMaxFileSize(*FOptions.MaxSize);
     AAppender->SetMaxBackupCount(FOptions.Backups);
     AAppender->SetAppendExisting(FOptions.Append);
     AAppender->SetRetryInterval(1);  // after a roll that couldn't open its new file
-    AAppender->SetLayout(FOptions.Time ? TZqLogBaseClass::Of<TZqSimpleLayout>() : TZqLogBaseClass::Of<TNoTimeLayout>());
+    if (FOptions.Xml) SetXmlLayout(AAppender, Name);
+    else
+      AAppender->SetLayout(
+          FOptions.Time ? TZqLogBaseClass::Of<TZqSimpleLayout>() : TZqLogBaseClass::Of<TNoTimeLayout>());
     AAppender->Initialize();  // a file that can't be opened shows here, before the first line
     FLogger->AddAppender(FAppenders.back());
+  }
+
+  // The layout writes its stylesheet at once, where the file is then, and gives the file its extension: where another
+  // one was named, the file keeps that. The stylesheet of app, app.log, app.xml and app.log.xml is app.log.xsl.
+  static void SetXmlLayout(TZqRollingFileAppender* AAppender, const TFileName& AName) {
+    if (SameText(ExtractFileExt(AName), u".xml")) AAppender->SetFileName(ChangeFileExt(AName, u""));
+    ForceDirectories(ExtractFileDir(AName));  // a folder that can't be made shows with the stylesheet
+    AAppender->SetLayout(TZqLogBaseClass::Of<TZqXmlLayout>());
+    AAppender->SetFileName(AName);
   }
 
   void Split(std::string& ARest, std::string_view ABlock) {
