@@ -23,6 +23,7 @@
 #include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
 #include "runtime/core/utf8.h"
+#include "runtime/text/local_time.h"
 
 namespace {
 
@@ -198,6 +199,35 @@ BENCHMARK_CAPTURE(OtherToSimple, text_of_a_host, cAppender(), TZqLogBaseClass::O
 BENCHMARK_CAPTURE(OtherToSimple, rolling_by_date, TZqLogBaseClass::Of<TZqDailyRollingFileAppender>(),
     TZqLogBaseClass::Of<TZqSimpleLayout>())
     ->Apply(Rounds);
+BENCHMARK_CAPTURE(OtherToSimple, xml, cAppender(), TZqLogBaseClass::Of<TZqXmlLayout>())->Apply(Rounds);
+
+// The text of the time in each of 1000 lines a second, against one strftime for each: time to time.
+void TimeTextToStrftime(benchmark::State& AState) {
+  constexpr Int64 cFirst = 1640256798000, cLines = 100000;
+  const auto OfSecond = [](Int64 ASecond) {
+    return FormatUtcStamp(UnixMillisecondsToDateTime(LocalMilliseconds(ASecond))).ToUTF8();
+  };
+  std::vector<double> Ratios;
+  for (auto _ : AState) {
+    TZqSecondText Text(OfSecond);
+    const double Own = Seconds([&] {
+      for (Int64 i = 0; i < cLines; ++i) benchmark::DoNotOptimize(Text.At(cFirst + i).data());
+    });
+    const double Plain = Seconds([&] {
+      char Buffer[32];
+      tm Time{};
+      const std::time_t First = cFirst / 1000;
+      ::gmtime_r(&First, &Time);
+      for (Int64 i = 0; i < cLines; ++i) {
+        Time.tm_sec = static_cast<int>(i / 1000 % 60);
+        benchmark::DoNotOptimize(std::strftime(Buffer, sizeof Buffer, "%Y-%m-%dT%H:%M:%SZ", &Time));
+      }
+    });
+    Ratios.push_back(Own / Plain);
+  }
+  AState.counters["ratio"] = Median(Ratios);
+}
+BENCHMARK(TimeTextToStrftime)->Apply(Rounds);
 
 // Threads on one appender, against the same bytes written under one std::mutex: lines per second to lines per second.
 void ThreadsOnOneAppenderToOneMutex(benchmark::State& AState) {

@@ -183,17 +183,16 @@ UnicodeString Attribute(std::u16string_view AName, const UnicodeString& AValue) 
   return Result + u"\"";
 }
 
-// A name of a file as a reference to it, whatever it is made of. Most names are as they are.
+// The name of a file as a URI reference. What isn't allowed in one as it is, letters beyond ASCII among it, is taken by
+// browsers alone.
 UnicodeString Reference(const UnicodeString& AFileName) {
-  constexpr char cDigits[] = "0123456789ABCDEF";
-  constexpr TChars cSpecial{cControls | Bits(u"\"#%&:<>?"), 0xFFFF};
-  const std::string Name = utf8::Encode(AFileName, utf8::TMalformed::Escape);
-  const bool IsText = utf8::Decode(Name).find_first_of(u"\uFFFD\uFFFE\uFFFF") == std::u16string::npos;
+  constexpr std::string_view cAllowed = "-._~!$'()*+,;=@", cDigits = "0123456789ABCDEF";
   std::string Result;
-  for (const char Byte : Name) {
+  for (const char Byte : utf8::Encode(AFileName, utf8::TMalformed::Escape)) {
     const auto c = static_cast<unsigned char>(Byte);
-    if (cSpecial.Has(c) || (!IsText && c >= 0x80)) Result.append({'%', cDigits[c >> 4U], cDigits[c & 15U]});
-    else Result += Byte;
+    const bool IsAlphanumeric = (c >= '0' && c <= '9') || ((c | 0x20U) >= 'a' && (c | 0x20U) <= 'z');
+    if (IsAlphanumeric || cAllowed.find(Byte) != cAllowed.npos) Result += Byte;
+    else Result.append({'%', cDigits[c >> 4U], cDigits[c & 15U]});
   }
   return FromUTF8(Result);
 }
