@@ -57,9 +57,9 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
   // How the last line began, in UTF-8: "yyyy-mm-dd hh:mm:ss:zzz - Level logger - ", and what that was made from.
   std::string FFront;
   Int64 FSecond = std::numeric_limits<Int64>::min();  // in milliseconds, UTC
-  TZqSecondText FTime{TimeText};                      // up to the milliseconds
-  UnicodeString FLoggerName;
   TZqLogLevel FLevel = llAll;
+  UnicodeString FLoggerName;
+  TZqSecondText FTime{TimeText};  // up to the milliseconds
 };
 
 namespace uZqLogLayouts {

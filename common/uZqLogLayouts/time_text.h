@@ -33,9 +33,9 @@ class ZQ_API TZqSecondText {
  private:
   void Renew(Int64 AMoment);
 
-  std::string (*FMake)(Int64 ASecond);
-  Int64 FSecond = std::numeric_limits<Int64>::min();
   std::string FText;
+  Int64 FSecond = std::numeric_limits<Int64>::min();
+  std::string (*FMake)(Int64 ASecond);
 };
 
 /// "yyyy-mm-dd hh:mm:ss" of AMilliseconds since 1970-01-01 00:00, without a change of time zone. A log goes on where
