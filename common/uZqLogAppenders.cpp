@@ -714,6 +714,7 @@ void uZqLogAppenders::Start() {
   RegisteredAppenders()->Add(TZqLogBaseClass::Of<TZqDailyRollingFileAppender>());
   RegisteredAppenders()->Add(TZqLogBaseClass::Of<TZqFileAppender>());
   RegisteredAppenders()->Add(TZqLogBaseClass::Of<TZqRollingFileAppender>());
+  RegisteredAppenders()->Add(TZqLogBaseClass::Of<TZqEventLogAppender>());
 }
 
 void uZqLogAppenders::Stop() { Starts.Ends(); }

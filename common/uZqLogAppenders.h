@@ -353,3 +353,6 @@ ZQ_API void Stop();
 }  // namespace uZqLogAppenders
 
 }  // namespace zq
+
+// Derives from what stands above.
+#include "common/uZqLogAppenders/event_log.h"

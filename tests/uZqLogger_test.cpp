@@ -534,7 +534,7 @@ TEST(LogPackage, AModuleStartedByItselfKeepsWhatItHas) {
       if (Unit.Start != nullptr) (Starting ? Unit.Start : Unit.Stop)();
     EXPECT_TRUE(ZqGetExceptionClass(u"package", 1));
     EXPECT_EQ(LiveAppenders().size(), 1U);
-    EXPECT_EQ(RegisteredAppenders()->Count(), 3);
+    EXPECT_EQ(RegisteredAppenders()->Count(), 4);
   }
 }
 
@@ -545,7 +545,7 @@ TEST(LogPackage, StopWritesTheFootersOfTheRootsAppenders) {
   Finalize();
   EXPECT_TRUE(SplitLines(Folder.Read("app.log")).back().starts_with("Log stopped on : "));
   Initialize();
-  EXPECT_EQ(RegisteredAppenders()->Count(), 3);
+  EXPECT_EQ(RegisteredAppenders()->Count(), 4);
 }
 
 }  // namespace
