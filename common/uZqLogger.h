@@ -192,8 +192,9 @@ struct ZQ_API _IZqLogLayout : Extends<IInterface> {
 /// A logger asks for "Level" (0 to 7; llDoNotLog where nothing is told), "Additive" and "Appenders", an array of names;
 /// of each name that no live appender bears for "class". An appender asks for "Layout", one with a file for
 /// "AppendExisting", "FileName" and "FileExt", one that rolls for "MaxFileSize" and "MaxBackupCount", one that rolls by
-/// date for "DatePattern". It is asked on any thread that asks for a new logger or makes an appender, under the
-/// logger's lock and the appender's: it must not wait for another thread that logs.
+/// date for "DatePattern", that of the system's log for "ServiceName". It is asked on any thread that asks for a new
+/// logger or makes an appender, under the logger's lock and the appender's: it must not wait for another thread that
+/// logs.
 struct ZQ_API IZqLogConfigurator : Extends<IInterface> {
   static constexpr TGUID IID = "{28A992A8-9491-4F32-B3BC-851901F67357}"_guid;
   /// The value stored for that name and key, ADefault if there is none. AKind tells what the caller expects.

@@ -55,18 +55,19 @@ TEST_F(EventLog, LevelsBecomeTypesAndIdsAndWhatIsNotTakenIsCounted) {
 TEST_F(EventLog, AdministratorsEnterSourcesOnce) {
   const UnicodeString Folder = u"HKLM\\SYSTEM\\CurrentControlSet\\Services\\Eventlog\\Application\\";
   Registry.Keys[Folder + u"Known"];
-  EXPECT_CALL(System, RegisterEventSourceW(_)).WillRepeatedly(Return(0));
-  for (const char16_t* const Name : {u"Known", u"Shop", u"Limited"}) {
+  EXPECT_CALL(System, RegisterEventSourceW(_)).Times(4).WillRepeatedly(Return(0));
+  for (const char16_t* const Name : {u"Known", u"Shop", u"Limited", u"Raising"}) {
     Elevation = *Name == u'L' ? 3 : 2;
+    Registry.IsReadOnly = *Name == u'R';
     New<TZqEventLogAppender>(Logger(), Name)->Free();
   }
-  EXPECT_EQ(Registry.Keys.size(), 2U);
+  EXPECT_EQ(Registry.Keys.size(), 3U);
   EXPECT_TRUE(Registry.Keys[Folder + u"Known"].empty());
   EXPECT_EQ(Registry.Keys[Folder + u"Shop"][u"TypesSupported"].second, (TBytes{7, 0, 0, 0}));
   EXPECT_EQ(Registry.Keys[Folder + u"Shop"][u"EventMessageFile"].second[0], '/');
 }
 
-// Where the system has a journal, tests/journal asks that; this one has its protocol everywhere.
+// Where the system has a journal, tests/system_log/journal asks that; this one has its protocol everywhere.
 TEST(EventLogFeeder, LineBreaksStandBehindALengthAndNoneIsInASource) {
   const TTempFolder Folder;
   sockaddr_un Address{AF_UNIX, {}};

@@ -9,6 +9,7 @@
 #include "runtime/text/format.h"
 #include "runtime/text/numbers.h"
 #include "runtime/values/typeinfo.h"
+#include "tests/fakes/event_log.h"
 #include "tests/fakes/version.h"
 #include "tests/support/logging.h"
 
@@ -373,6 +374,18 @@ struct LoggerConfig : testing::Test {
   IntfRef<IZqLogConfigurator> Config{New<TConfig>()};
   TConfig& Told = dynamic_cast<TConfig&>(*Config);
 };
+
+TEST_F(LoggerConfig, ServiceNameIsThatOfTheAppenderAndOfItsSource) {
+  testing::NiceMock<TEventLogCalls> System;
+  const TPlatformOverride<TEventLogService> Seat(System);
+  Told.Values["Shop.ServiceName"] = UnicodeString(u"Orders");
+  const IntfRef<TZqEventLogAppender> Appender(New<TZqEventLogAppender>(Logger(), u"Shop"));
+  EXPECT_CALL(System, RegisterEventSourceW(UnicodeString(u"Orders")));
+  for (const char16_t* const Name : {u"Orders", u""}) {  // nothing is told of "Orders"
+    Appender->SetConfig(Config);
+    EXPECT_EQ(Appender->GetName(), Name);
+  }
+}
 
 TEST_F(LoggerConfig, NewChildrenGetTheRootsAndNilGoesDown) {
   const auto Parent = Logger()->GetLogger(u"p");

@@ -50,6 +50,12 @@ TValue AsCount(const UnicodeString& AText) {
   return TryStrToInt(AText, Result) && Result >= 0 && Result <= 0xFFFF ? TValue(Result) : TValue();
 }
 
+TValue AsIdentifier(const UnicodeString& AText) {
+  const auto IsLetter = [](Char c) { return (c >= u'a' && c <= u'z') || (c >= u'A' && c <= u'Z') || c == u'_'; };
+  const auto IsPart = [&](Char c) { return IsLetter(c) || (c >= u'0' && c <= u'9'); };
+  return !AText.IsEmpty() && IsLetter(AText[1]) && std::ranges::all_of(AText.View(), IsPart) ? AsText(AText) : TValue();
+}
+
 TValue AsNames(const UnicodeString& AText) {
   TStringList Names;
   ZqTokenize(AText, &Names, u",", nullptr);
@@ -74,7 +80,7 @@ struct TKey {
 constexpr TKey cLoggerKeys[] = {{u"level", AsLevel}, {u"additive", AsBoolean}, {u"appenders", AsNames}};
 constexpr TKey cAppenderKeys[] = {{u"class", AsAppender}, {u"layout", AsLayout}, {u"appendexisting", AsBoolean},
     {u"filename", AsText}, {u"fileext", AsText}, {u"maxfilesize", AsBytes}, {u"maxbackupcount", AsCount},
-    {u"datepattern", AsText}};
+    {u"datepattern", AsText}, {u"servicename", AsIdentifier}};
 
 constexpr std::u16string_view cLogger = u"logger ", cAppender = u"appender ";
 

@@ -95,5 +95,11 @@ int main() {
   Log->Info(u"to the file and to the console");
   Appender.As<IZqLogAppenderEx>()->SetLayout(TZqLogBaseClass::Of<TJsonLayout>());
   Log->Info(u"in \"JSON\"");
+
+  const IntfRef<TZqEventLogAppender> System(New<TZqEventLogAppender>(Logger(), u"System"));
+  System->RegisterLogger(u"shop");
+  System->SetLayout(ZqSimpleLayout);
+  Log->AddAppender(System);
+
   return std::filesystem::exists("log/orders.log") ? 0 : 1;
 }

@@ -30,6 +30,7 @@ class TScriptedRegistry final : public TRegistryService {
     return ERROR_SUCCESS;
   }
   Integer RegSetValueEx(HKEY AKey, const UnicodeString& AName, Cardinal AType, const TBytes& AData) override {
+    if (IsReadOnly) return ERROR_ACCESS_DENIED;
     Keys[Open.at(AKey)][AName] = {AType, AData};
     return ERROR_SUCCESS;
   }
@@ -38,6 +39,7 @@ class TScriptedRegistry final : public TRegistryService {
   std::map<UnicodeString, std::map<UnicodeString, std::pair<Cardinal, TBytes>>> Keys;
   std::map<HKEY, UnicodeString> Open{
       {HKEY_CLASSES_ROOT, u"HKCR"}, {HKEY_CURRENT_USER, u"HKCU"}, {HKEY_LOCAL_MACHINE, u"HKLM"}};
+  bool IsReadOnly = false;  // no value can be written
 
  private:
   HKEY FLast = 100;

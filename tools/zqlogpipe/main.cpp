@@ -1,4 +1,4 @@
-// zqlogpipe: logs each line of its input through rZqCommon into a file that rolls by size.
+// zqlogpipe: logs each line of its input through rZqCommon into files that roll by size, and into the system's log.
 
 #include <fcntl.h>
 #include <poll.h>
@@ -34,12 +34,14 @@ namespace {
 using namespace zq;
 
 constexpr char cHelp[] =
-    "usage: zqlogpipe --file FILE [option...] [INPUT...]\n"
+    "usage: zqlogpipe --file FILE|--syslog [option...] [INPUT...]\n"
     "\n"
-    "Logs each line of the INPUT files, or of standard input, into FILE. INPUT may be - for standard input.\n"
+    "Logs each line of the INPUT files, or of standard input. INPUT may be - for standard input.\n"
     "\n"
     "  --file FILE       log file, .log is added to a name without extension; missing folders are made. May be given\n"
     "                    again for a further log file\n"
+    "  --syslog[=NAME]   the system's log, too, or alone without --file: the journal, or syslog where there is none,\n"
+    "                    from the source NAME (zqlogpipe); an entry is the text of a line, an empty line is none\n"
     "  --max-size BYTES  a file that has reached this size is rolled, 0 for never (10M); K, M and G behind the number\n"
     "                    stand for its powers of 1024\n"
     "  --backups COUNT   files of the series, FILE among them, 1 to 65535 (5)\n"
@@ -83,6 +85,7 @@ class TUsageError : public std::runtime_error {
 
 struct TOptions {
   std::vector<std::string> Files;
+  std::optional<std::string> Source;  // in the system's log
   std::vector<std::string> Inputs;
   std::optional<Cardinal> MaxSize;  // the appender's own
   std::string Pattern;              // of the date that names old files; empty where the size alone rolls
@@ -166,6 +169,7 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
       return std::string(AWords[i]);
     };
     if (Word == "--file") Result.Files.push_back(Value());
+    else if (Word == "--syslog") Result.Source = Taken ? "zqlogpipe" : Value();
     else if (Word == "--max-size") Result.MaxSize = Bytes(Word, Value());
     else if (Word == "--backups") Result.Backups = Number<zq::Word>(Word, Value(), 1);
     else if (Word == "--daily") Result.Pattern = "yyyy-mm-dd";
@@ -196,7 +200,9 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
   if (std::any_of(Result.Files.begin(), Result.Files.end(), IsBlank)) throw TUsageError("--file needs a name");
   if (Result.Xml && !Result.Time) throw TUsageError("--no-time goes with --layout simple only");
   if (Result.Xml) Result.Append = false;  // two logs in one file are no XML
-  if (Result.Files.empty() && !Result.Help && !Result.Version) throw TUsageError("--file is needed");
+  if (Result.Source && IsBlank(*Result.Source)) throw TUsageError("--syslog= needs a name");
+  if (Result.Files.empty() && !Result.Source && !Result.Help && !Result.Version)
+    throw TUsageError("--file or --syslog is needed");
   return Result;
 }
 
@@ -249,6 +255,19 @@ class TNoTimeLayout : public Implements<TZqSimpleLayout, IZqLogByteLayout> {
   ~TNoTimeLayout() override = default;
 };
 
+/// The text of a line alone: the system's log has its own time, level and source.
+class TTextLayout : public TZqSimpleLayout {
+ public:
+  using TZqSimpleLayout::TZqSimpleLayout;
+  UnicodeString FormatLine(
+      const UnicodeString&, TZqLogLevel, const UnicodeString& ALogMessage, PZqDataRec, TZqLogIndent) override {
+    return ALogMessage;
+  }
+
+ protected:
+  ~TTextLayout() override = default;
+};
+
 /// What became of an appender's lines.
 struct TCounts {
   std::size_t Rolls = 0;
@@ -257,13 +276,34 @@ struct TCounts {
   UnicodeString Failure;  // the first
 };
 
-/// Counts rolls, and keeps the failures that a logger never shows. A line that can't be written is tried again, where
-/// that is wanted, until a signal ends the tool.
+/// Has a line that can't be written tried again, where that is wanted, until a signal ends the tool.
+class TRetry {
+ public:
+  TRetry(TCounts& ACounts, Cardinal ASeconds) : FCounts(ACounts), FSeconds(std::min(ASeconds, cMostSeconds)) {}
+  /// Waits and is true, or counts the line as lost.
+  bool Again(const UnicodeString& AReason) {
+    if (FSeconds == 0 || StopSignal != 0) {
+      if (FCounts.Failed++ == 0) FCounts.Failure = AReason;
+      return false;
+    }
+    if (!std::exchange(FWaiting, true)) std::fprintf(stderr, "zqlogpipe: waiting: %s\n", AReason.ToUTF8().c_str());
+    Wait(-1, static_cast<int>(FSeconds * 1000));
+    return true;
+  }
+
+ private:
+  static constexpr Cardinal cMostSeconds = 86400;
+  TCounts& FCounts;
+  const Cardinal FSeconds;
+  bool FWaiting = false;
+};
+
+/// Counts rolls, and keeps the failures that a logger never shows.
 template <class TRolling>
 class TPipeAppender : public TRolling {
  public:
   TPipeAppender(TCounts& ACounts, Cardinal ARetry)
-      : TRolling(Logger(), u""), FCounts(ACounts), FRetry(std::min(ARetry, cMostSeconds)) {}
+      : TRolling(Logger(), u""), FCounts(ACounts), FRetry(ACounts, ARetry) {}
   void RollOver() override {
     const Cardinal Before = Size();
     TRolling::RollOver();
@@ -271,17 +311,13 @@ class TPipeAppender : public TRolling {
   }
   void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override {
-    for (;; Wait(-1, static_cast<int>(FRetry * 1000))) try {
+    for (;;) try {
         TRolling::Write(ASender, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
         if (!this->FFileStream) throw Exception(u"The file isn't open: " + this->GetFileName());  // since a roll
         ++FCounts.Written;
         return;
       } catch (const Exception& e) {
-        if (FRetry == 0 || StopSignal != 0) {
-          if (FCounts.Failed++ == 0) FCounts.Failure = e.Message();
-          throw;
-        }
-        if (!std::exchange(FWaiting, true)) std::fprintf(stderr, "zqlogpipe: waiting: %s\n", e.what());
+        if (!FRetry.Again(e.Message())) throw;
       }
   }
 
@@ -289,11 +325,35 @@ class TPipeAppender : public TRolling {
   ~TPipeAppender() override = default;
 
  private:
-  static constexpr Cardinal cMostSeconds = 86400;
   [[nodiscard]] Cardinal Size() const { return this->FFileStream ? this->FFileStream->Size() : 0; }
   TCounts& FCounts;
-  const Cardinal FRetry;  // seconds
-  bool FWaiting = false;
+  TRetry FRetry;
+};
+
+/// Gives a log that is full a second to make room, once until it has taken a line again.
+class TPipeEventLog : public TZqEventLogAppender {
+ public:
+  TPipeEventLog(TCounts& ACounts, Cardinal ARetry)
+      : TZqEventLogAppender(zq::Logger(), u""), FCounts(ACounts), FRetry(ACounts, ARetry) {}
+
+ protected:
+  ~TPipeEventLog() override = default;
+  bool Report(Word AType, Cardinal AEventId, const UnicodeString& AText) override {
+    while (!TZqEventLogAppender::Report(AType, AEventId, AText)) {
+      const Cardinal Error = GetLastError();
+      if (Error == EAGAIN && FPatience > 0) Wait(-1, cStep), FPatience -= cStep;
+      else if (!FRetry.Again(u"The system's log: " + SysErrorMessage(static_cast<Integer>(Error)))) return false;
+    }
+    FPatience = cPatience;
+    ++FCounts.Written;
+    return true;
+  }
+
+ private:
+  static constexpr int cPatience = 1000, cStep = 1;  // milliseconds
+  TCounts& FCounts;
+  TRetry FRetry;
+  int FPatience = cPatience;
 };
 
 /// The text of a line: UTF-8, with each byte that is none taken as the character of its code.
@@ -313,6 +373,7 @@ class TPipe {
     FLogger->SetLevel(llAll);
     FLogger->SetAdditive(false);
     for (const std::string& File : AOptions.Files) AddAppender(File);
+    if (AOptions.Source) AddSource(*AOptions.Source);
   }
 
   void Run(const std::string& AInput) {
@@ -378,6 +439,14 @@ class TPipe {
     ForceDirectories(ExtractFileDir(AName));  // a folder that can't be made shows with the stylesheet
     AAppender->SetLayout(TZqLogBaseClass::Of<TZqXmlLayout>());
     AAppender->SetFileName(AName);
+  }
+
+  void AddSource(const std::string& AName) {
+    auto* const Appender = New<TPipeEventLog>(FCounts, FOptions.Retry);
+    FAppenders.emplace_back(Appender);
+    Appender->RegisterLogger(TextOf(AName));
+    Appender->SetLayout(TZqLogBaseClass::Of<TTextLayout>());
+    FLogger->AddAppender(FAppenders.back());
   }
 
   void Split(std::string& ARest, std::string_view ABlock) {
