@@ -3,6 +3,10 @@ include(CMakePackageConfigHelpers)
 set(package_folder ${CMAKE_INSTALL_LIBDIR}/cmake/rZqCommon)
 
 install(TARGETS rZqCommon EXPORT rZqCommonTargets INCLUDES DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/rZqCommon)
+if(BUILD_SHARED_LIBS)
+  install(FILES ${messages} RENAME 1
+    DESTINATION ${CMAKE_INSTALL_LIBDIR}/$<TARGET_SONAME_FILE_NAME:rZqCommon>.resources/11)
+endif()
 install(DIRECTORY common runtime DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/rZqCommon
   FILES_MATCHING PATTERN *.h PATTERN runtime/linux EXCLUDE)
 install(EXPORT rZqCommonTargets NAMESPACE rZqCommon:: DESTINATION ${package_folder})

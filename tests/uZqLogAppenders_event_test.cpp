@@ -5,6 +5,7 @@
 #include <cerrno>
 
 #include "common/uZqLogger/failures.h"
+#include "runtime/platform/resource_service.h"
 #include "tests/fakes/event_log.h"
 #include "tests/fakes/processes.h"
 #include "tests/fakes/registry.h"
@@ -65,6 +66,14 @@ TEST_F(EventLog, AdministratorsEnterSourcesOnce) {
   EXPECT_TRUE(Registry.Keys[Folder + u"Known"].empty());
   EXPECT_EQ(Registry.Keys[Folder + u"Shop"][u"TypesSupported"].second, (TBytes{7, 0, 0, 0}));
   EXPECT_EQ(Registry.Keys[Folder + u"Shop"][u"EventMessageFile"].second[0], '/');
+}
+
+TEST(EventLogMessages, AreAResourceOfTheLibrary) {
+  const auto Table = Service<TResourceService>().LoadResource(HInstance(), u"#1", RT_MESSAGETABLE);
+  ASSERT_EQ(Table.has_value(), ZQ_TEST_STATIC == 0);
+  const std::u16string_view Texts(
+      Table ? reinterpret_cast<const Char*>(Table->data()) : u"", Table ? Table->size() / 2 : 0);
+  EXPECT_TRUE(!Table || Texts.find(u"Here is id6 information message\r\n") != Texts.npos);
 }
 
 // Where the system has a journal, tests/system_log/journal asks that; this one has its protocol everywhere.

@@ -13,6 +13,7 @@ using HINST = const void*;
 
 // Types of resources. "#n" names a type or a resource by number.
 inline constexpr const WideChar* RT_RCDATA = u"#10";
+inline constexpr const WideChar* RT_MESSAGETABLE = u"#11";
 inline constexpr const WideChar* RT_HTML = u"#23";
 inline constexpr const WideChar* RT_MANIFEST = u"#24";
 
