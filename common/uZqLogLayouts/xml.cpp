@@ -116,7 +116,7 @@ constexpr TChars cEscapedInAttribute{cEscaped.Low | cControls, cUnreadable.Last}
 
 // AText, with AReplace called in place of each character of ASet. Most texts have none.
 template <class TLine, class TReplace>
-ZQ_HOT void AppendRuns(TLine& ALine, std::u16string_view AText, TChars ASet, TReplace AReplace) {
+void AppendRuns(TLine& ALine, std::u16string_view AText, TChars ASet, TReplace AReplace) {
   for (;;) {
     const auto Found = std::find_if(AText.begin(), AText.end(), [&](Char c) { return ASet.Has(c); });
     const auto Run = static_cast<std::size_t>(Found - AText.begin());
@@ -151,7 +151,7 @@ void AppendShown(TLine& ALine, Char AChar) {
 void AppendEscaped(UnicodeString& ALine, std::u16string_view AText) {
   AppendRuns(ALine, AText, cEscaped, [&](Char c) { AppendEntity(ALine, c); });
 }
-ZQ_HOT void AppendEscaped(utf8::TBuffer& ALine, std::u16string_view AText) {
+void AppendEscaped(utf8::TBuffer& ALine, std::u16string_view AText) {
   AppendRuns(ALine, AText, cEscapedInFile,
       [&](Char c) { return cEscaped.Has(c) ? AppendEntity(ALine, c) : AppendShown(ALine, c); });
 }
@@ -229,7 +229,7 @@ void AppendValue(TLine& ALine, const UnicodeString& AValue, const UnicodeString&
 }
 
 template <class TLine>
-ZQ_HOT void AppendRest(TLine& ALine, const UnicodeString& ALogMessage, PZqDataRec AValue) {
+void AppendRest(TLine& ALine, const UnicodeString& ALogMessage, PZqDataRec AValue) {
   UnicodeString Value, Class;
   if (AValue != nullptr && AValue->DataType == rtkException) {
     Value = AValue->VException->Message();
@@ -309,8 +309,7 @@ std::string TZqXmlLayout::TimeText(Int64 ASecond) {
   return UtcText(UnixMillisecondsToDateTime(LocalMilliseconds(ASecond)));
 }
 
-ZQ_HOT std::string_view TZqXmlLayout::Front(
-    const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, TZqLogIndent ALogIndent) {
+std::string_view TZqXmlLayout::Front(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, TZqLogIndent ALogIndent) {
   const Int64 Moment = UtcMilliseconds();
   const Cardinal Thread = GetCurrentThreadId();
   if (!ZqIsInSecond(Moment, FSecond) || Thread != FThread || ALogLevel != FLevel || ALogIndent != FIndent ||
@@ -339,13 +338,13 @@ UnicodeString TZqXmlLayout::FormatLine(const UnicodeString& ALoggerName, TZqLogL
   return Result;
 }
 
-ZQ_HOT void TZqXmlLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
+void TZqXmlLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   ALine.AppendBytes(Front(ALoggerName, ALogLevel, ALogIndent));
   AppendRest(ALine, ALogMessage, AValue);
 }
 
-ZQ_HOT void TZqXmlLayout::TByteLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName,
+void TZqXmlLayout::TByteLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName,
     TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   Layout.AppendLine(ALine, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
 }
