@@ -10,7 +10,6 @@ using namespace zq;
 namespace {
 
 constexpr std::size_t cNowhere = std::string_view::npos;
-constexpr std::size_t cBlock = std::size_t{1} << 18;
 constexpr std::size_t cLongestPart = std::size_t{1} << 26;    // what is longer is no item
 constexpr std::size_t cLongestDamage = std::size_t{1} << 16;  // and comes in several parts
 
@@ -136,7 +135,7 @@ bool TLogReader::More() {
   FSearchedFrom -= std::min(FSearchedFrom, FFrom);
   FSearchedTo -= std::min(FSearchedTo, FFrom);
   FFrom = 0;
-  const std::size_t Before = FBuffer.size(), Wanted = Before + std::max(cBlock, Before);
+  const std::size_t Before = FBuffer.size(), Wanted = Before + std::max(FBlock, Before);
   FBuffer.resize(Wanted);
   std::size_t Size = Before;
   while (Size < Wanted && !FAtEnd) {
@@ -247,7 +246,7 @@ bool TLogReader::ReadElement(TScan& AScan) {
   if (IsMark(AScan.Text.substr(AScan.At)) || !AScan.Take("<")) return false;
   std::string_view Name;
   FText.clear();
-  if (!AScan.TakeName(Name)) return false;
+  if (!AScan.TakeName(Name)) return AScan.At -= Name.size() + 1, false;  // it may yet be a mark
   if (!AScan.Take("/>") && (!AScan.Take(">") || !ReadText(AScan, Name))) return false;
   Keep(Name);
   return true;

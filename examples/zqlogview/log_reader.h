@@ -32,8 +32,8 @@ enum class TLogPart { Run, RunEnd, Item, Damage, End };
 /// with U+FFFD for what isn't. Raises what ASource raises. One thread at a time.
 class TLogReader {
  public:
-  /// ASource must outlive the reader.
-  explicit TLogReader(zq::TStream& ASource) : FSource(ASource) {}
+  /// ASource must outlive the reader. ABlock: how many bytes are read at once, at least.
+  explicit TLogReader(zq::TStream& ASource, std::size_t ABlock = 1 << 18) : FSource(ASource), FBlock(ABlock) {}
 
   /// Reads the next part, which the queries below tell until the next call.
   TLogPart Next();
@@ -64,6 +64,7 @@ class TLogReader {
   void Keep(std::string_view AName);
 
   zq::TStream& FSource;
+  const std::size_t FBlock;
   bool FAtEnd = false;
   std::string FBuffer;
   std::size_t FFrom = 0;          // what lies before is consumed
