@@ -148,14 +148,18 @@ void View(const TOptions& AOptions) {
   }
   TOutput Output(AOptions.Output);
   const std::size_t Further = Inputs.size() - 1;
-  TLogPage Page(Output.Stream(),
-      UnicodeString::FromUTF8(Inputs[0]->Name() + (Further == 0 ? "" : " and " + std::to_string(Further) + " more"))
-          .ToUTF8());
-  for (const auto& Input : Inputs) {
-    TLogReader Log(*Input);
-    Page.Add(UnicodeString::FromUTF8(Input->Name()).ToUTF8(), Log);
+  try {
+    TLogPage Page(Output.Stream(),
+        UnicodeString::FromUTF8(Inputs[0]->Name() + (Further == 0 ? "" : " and " + std::to_string(Further) + " more"))
+            .ToUTF8());
+    for (const auto& Input : Inputs) {
+      TLogReader Log(*Input);
+      Page.Add(UnicodeString::FromUTF8(Input->Name()).ToUTF8(), Log);
+    }
+    Page.Finish();
+  } catch (const EWriteError& e) {
+    throw std::runtime_error(Output.Name() + ": " + e.what());
   }
-  Page.Finish();
   Output.Finish();
 }
 
