@@ -361,20 +361,21 @@ bool TZqRollingFileAppender::IsOfSeries(const UnicodeString& AFileName) const {
   return Suffix ? IsNumber(Suffix->View()) : AFileName == ExtractFileName(FFileName);
 }
 
-// In order of their numbers, the log file first. False, with errno, where the folder couldn't be read to its end: what
+// In order of their numbers, the log file first; of one number, which entries without one share, too, the newest first.
+// False, with errno, where the folder couldn't be read to its end: what
 // was found then must not be taken for the series.
 bool TZqRollingFileAppender::ScanSeries(TSeries& ASeries) {
   TSearchRec Found;
   int Code = FindFirst(Folder() + Base() + u"*.*", faAnyFile, Found);
   for (; Code == 0; Code = FindNext(Found))
     if ((Found.Attr & faDirectory) == 0 && IsOfSeries(Found.Name))
-      ASeries.push_back({Found.Name, CreateFileInfo(Found.Name)});
+      ASeries.push_back({Found.Name, CreateFileInfo(Found.Name), Found.ModifiedTime});
   FindClose(Found);
   const UnicodeString LogFile = ExtractFileName(FFileName);
   std::sort(ASeries.begin(), ASeries.end(), [&](const TEntry& A, const TEntry& B) {
     if (A.Info->Index != B.Info->Index) return A.Info->Index < B.Info->Index;
     if ((A.Name == LogFile) != (B.Name == LogFile)) return A.Name == LogFile;
-    return A.Name < B.Name;
+    return A.Changed != B.Changed ? A.Changed > B.Changed : A.Name > B.Name;
   });
   errno = Code;
   return Code == cNoMoreFiles || Code == ENOENT;
@@ -472,14 +473,15 @@ ZQ_HOT bool TZqRollingFileAppender::PrepareWrite() {
   return true;
 }
 
-// What a roll couldn't put away is continued.
+// What a roll couldn't put away is continued, and the roll waits for its next try.
 void TZqRollingFileAppender::Initialize() {
   const TZqLogWalk Walk;
   const TScope Scope(FLock);
+  if (FInitializing == 0) FFailedRoll.reset();
   const TInitializing Initializing(*this);
-  FFailedRoll.reset();
-  if (!FFileStream && !FAppendExisting && FileExists(FFileName)) RollOver();
+  if (!FFileStream && !FAppendExisting && !FFailedRoll && FileExists(FFileName)) RollOver();
   OpenFile(true);
+  if (FFailedRoll && FFileStream) FFailedRoll->Size = FFileStream->Size();
 }
 
 void TZqRollingFileAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
@@ -615,20 +617,25 @@ std::optional<TDateTime> TZqDailyRollingFileAppender::DateInFile() const {
   return {};
 }
 
+// The clock of a file system lags some milliseconds behind: a file made at the stroke of midnight is of the day before
+// by it, and its header knows better.
 std::optional<TDateTime> TZqDailyRollingFileAppender::TimeBegun() const {
+  constexpr double cSecond = 1.0 / 86400;
   TDiskFacts Facts;
   if (Service<TDiskService>().Stat(ToSystemPath(FFileName).c_str(), true, Facts) != 0) return {};
-  if (Facts.CreatedTime != 0) return LocalTime(Facts.CreatedTime / 1000);
-  if (const auto Date = DateInFile()) return Date;
-  return LocalTime(Facts.ModifiedTime / 1000);
+  const TDateTime Known = LocalTime((Facts.CreatedTime != 0 ? Facts.CreatedTime : Facts.ModifiedTime) / 1000);
+  const auto Date = DateInFile();
+  return Date && (Facts.CreatedTime == 0 || (*Date > Known && *Date < Known + cSecond)) ? Date : Known;
 }
 
 // Onto no file that is there. A text that no file name can hold is the pattern's fault, and another roll wouldn't help.
 TZqDailyRollingFileAppender::TMoved TZqDailyRollingFileAppender::MoveToDate() {
-  if (!FileExists(FFileName)) return TMoved::Moved;
+  errno = ENOENT;  // also of a folder
+  if (!FileExists(FFileName)) return errno == ENOENT ? TMoved::Moved : TMoved::Refused;
   const auto Begun = TimeBegun();
   if (!Begun) return TMoved::Refused;
   const UnicodeString Text = TextOf(*Begun);
+  if (FCurrent.IsEmpty()) FCurrent = Text;
   const UnicodeString Name = Folder() + Base() + u"." + Text + ExtractFileExt(FFileName);
   if (Text.IsEmpty() || FileExists(Name)) return TMoved::Refused;
   return RenameFile(FFileName, Name) ? TMoved::Moved : TMoved::Kept;
@@ -653,17 +660,20 @@ ZQ_HOT void TZqDailyRollingFileAppender::CheckRollover() {
   if (FFileStream && TextOfNow() != FCurrent && IsRollDue()) RollOver();
 }
 
+// The text is set before the file is opened: where a header can't be written, the next line must not roll again.
 void TZqDailyRollingFileAppender::Initialize() {
   const TZqLogWalk Walk;
   const TScope Scope(FLock);
+  if (FInitializing == 0) FFailedRoll.reset();
   const TInitializing Initializing(*this);
-  const auto Begun = IsBlank(FFileName) || FFileStream ? std::nullopt : TimeBegun();
-  if (Begun && TextOf(*Begun) != TextOfNow()) {
-    FCurrent = TextOf(*Begun);
-    RollOver();
+  if (!FFileStream) {
+    const UnicodeString Now = TextOfNow();
+    const auto Begun = IsBlank(FFileName) ? std::nullopt : TimeBegun();
+    FCurrent = Begun ? TextOf(*Begun) : Now;
+    if (FCurrent != Now) RollOver();
+    if (!FFailedRoll) FCurrent = Now;
   }
   TZqRollingFileAppender::Initialize();
-  FCurrent = TextOfNow();
 }
 
 void TZqDailyRollingFileAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
@@ -677,8 +687,15 @@ void TZqDailyRollingFileAppender::SetConfig(const IntfRef<IZqLogConfigurator>& A
 std::unique_ptr<TZqFileInfo> TZqDailyRollingFileAppender::CreateFileInfo(const UnicodeString& AFileName) {
   const TScope Scope(FLock);
   auto Result = TZqRollingFileAppender::CreateFileInfo(AFileName);
+  if (const auto Suffix = SuffixOf(AFileName); Suffix && IsDate(Suffix->View())) Result->Index = 0;
   if (Result->Index == 0) Result->FileNameRight = u"." + ZqCleanupFileName(FCurrent);
   return Result;
+}
+
+bool TZqDailyRollingFileAppender::IsDate(std::u16string_view AText) const {
+  const UnicodeString Short = ZqCleanupFileName(TextOf(EncodeDate(2001, 2, 3) + EncodeTime(4, 5, 6, 7)));
+  const UnicodeString Long = ZqCleanupFileName(TextOf(EncodeDate(2012, 12, 23) + EncodeTime(14, 15, 16, 178)));
+  return !AText.empty() && IsOfPattern(AText, Short.View(), Long.View());
 }
 
 // Beside what the numeric roll makes: a date, or a number and a date.
@@ -686,11 +703,6 @@ bool TZqDailyRollingFileAppender::IsOfSeries(const UnicodeString& AFileName) con
   if (TZqRollingFileAppender::IsOfSeries(AFileName)) return true;
   const auto Suffix = SuffixOf(AFileName);
   if (!Suffix) return false;
-  const UnicodeString Short = ZqCleanupFileName(TextOf(EncodeDate(2001, 2, 3) + EncodeTime(4, 5, 6, 7)));
-  const UnicodeString Long = ZqCleanupFileName(TextOf(EncodeDate(2012, 12, 23) + EncodeTime(14, 15, 16, 178)));
-  const auto IsDate = [&](std::u16string_view AText) {
-    return !AText.empty() && IsOfPattern(AText, Short.View(), Long.View());
-  };
   const std::size_t Dot = Suffix->View().find(u'.');
   return IsDate(Suffix->View()) || (Dot != std::u16string_view::npos && IsNumber(Suffix->View().substr(0, Dot)) &&
                                        IsDate(Suffix->View().substr(Dot + 1)));

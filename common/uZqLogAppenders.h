@@ -274,6 +274,11 @@ class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRoll
   void RollFailed();
   void EndRolled();
 
+  struct TFailedRoll {
+    Int64 Size;  // of the file
+    Int64 Time;  // UtcMilliseconds
+  };
+  std::optional<TFailedRoll> FFailedRoll;  // of the file that is open, or being opened
   Cardinal FMaxFileSize = 10485760;
   Word FMaxBackupCount = 5;
 
@@ -281,18 +286,14 @@ class ZQ_API TZqRollingFileAppender : public Implements<TZqFileAppender, IZqRoll
   struct TEntry {
     UnicodeString Name;
     std::unique_ptr<TZqFileInfo> Info;
+    Int64 Changed;  // microseconds since 1970, UTC
   };
   using TSeries = std::vector<TEntry>;
-  struct TFailedRoll {
-    Int64 Size;  // of the file
-    Int64 Time;  // UtcMilliseconds
-  };
   bool ScanSeries(TSeries& ASeries);
   bool MoveTo(const TEntry& AEntry, std::size_t ANumber);
   bool MoveUp();
   void Prune(std::size_t AKept);
   void Complain(const UnicodeString& AWhat);
-  std::optional<TFailedRoll> FFailedRoll;  // of the file that is open
 };
 
 struct ZQ_API IZqDailyRollingFileAppender : Extends<IZqRollingFileAppender> {
@@ -309,9 +310,10 @@ struct ZQ_API IZqDailyRollingFileAppender : Extends<IZqRollingFileAppender> {
 /// time at which it was begun: "app.2021-12-22.log". Where that name is taken, and at the limit of size for the second
 /// time in one period, the roll is the numeric one, and the old file becomes "app.1.2021-12-22.log".
 ///
-/// Files named by their date are of the series, but only a numeric roll and SetMaxBackupCount count them. The time when
-/// a file was begun comes from the file system; where that keeps none, from the first date that stands in the file,
-/// which a copy keeps, too, and else from its last change.
+/// Files named by their date are of the series, but only a numeric roll and SetMaxBackupCount count them: behind the
+/// log file, those changed last first. The time when a file was begun comes from the file system; where that keeps
+/// none, from the first date that stands in the file, which a copy keeps, too, and else from its last change. A roll
+/// that fails when the file is opened is tried again as any other.
 class ZQ_API TZqDailyRollingFileAppender : public Implements<TZqRollingFileAppender, IZqDailyRollingFileAppender> {
  public:
   /// MaxFileSize is 2147483647 at first.
@@ -331,7 +333,7 @@ class ZQ_API TZqDailyRollingFileAppender : public Implements<TZqRollingFileAppen
   [[nodiscard]] bool IsOfSeries(const UnicodeString& AFileName) const override;
 
   UnicodeString FDatePattern = u"yyyy-mm-dd";
-  UnicodeString FCurrent;  // the text of the pattern when the file was opened
+  UnicodeString FCurrent;  // the text of the pattern when the file was begun
 
  private:
   enum class TMoved : Byte { Moved, Kept, Refused };  // Kept: it stays where it is, and the log goes on in it
@@ -340,6 +342,7 @@ class ZQ_API TZqDailyRollingFileAppender : public Implements<TZqRollingFileAppen
   const UnicodeString& TextOfNow();
   [[nodiscard]] std::optional<TDateTime> TimeBegun() const;
   [[nodiscard]] std::optional<TDateTime> DateInFile() const;
+  [[nodiscard]] bool IsDate(std::u16string_view AText) const;  // the text of a date by the pattern
 
   // The text of a moment, which serves for the moments around it that can't have another one.
   UnicodeString FNowText;
