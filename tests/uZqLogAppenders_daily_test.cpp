@@ -3,6 +3,8 @@
 #include <gmock/gmock.h>
 
 #include "common/uZqLogAppenders.h"
+#include "runtime/text/datetime.h"
+#include "runtime/text/local_time.h"
 #include "tests/fakes/clock.h"
 #include "tests/fakes/disk.h"
 #include "tests/support/logging.h"
@@ -60,6 +62,97 @@ TEST_F(LogDaily, TheFileSystemsTimeOfCreationLeads) {
   const auto File = Add();
   LogAt(cMidnight, "a");
   EXPECT_EQ(Folder.Names(), (std::vector<std::string>{"app.2021-12-20.log", "app.log"}));
+}
+
+// It lags some milliseconds behind, and at midnight a day.
+TEST_F(LogDaily, TheHeaderKnowsBetterThanTheClockOfTheFileSystem) {
+  const std::pair<Int64, const char*> cCases[] = {{2000, "app.2021-12-23.log"}, {cSecond, "app.2021-12-22.log"}};
+  for (const auto& [Lag, Name] : cCases) {
+    Disk.CreatedTime = cMidnight - Lag;
+    Folder.Write("app.log", "Log started on : 2021-12-23 00:00:00\r\n");
+    const auto File = Add();
+    LogAt(cMidnight + cDay, "a");
+    EXPECT_TRUE(std::filesystem::remove(Folder.Path() / Name)) << Lag;
+    Log->ClearAppenders();
+  }
+}
+
+struct TDay {
+  const char* Zone;
+  Int64 From, To;     // its midnights, in seconds since 1970
+  const char* Names;  // of the file of the day before, and of its own
+};
+
+// When the zone changes, by an hour, by half an hour or at midnight itself, and the day is longer or shorter for it; on
+// a leap day. In one run, with a start in between, and with a copy made before that start.
+TEST_F(LogDaily, EachLineIsInTheFileOfItsDay) {
+  const TDay cDays[] = {{"Europe/Berlin", 1616886000, 1616968800, "app.2021-03-27.log app.2021-03-28.log"},
+      {"Europe/Berlin", 1635631200, 1635721200, "app.2021-10-30.log app.2021-10-31.log"},
+      {"Australia/Lord_Howe", 1617454800, 1617543000, "app.2021-04-03.log app.2021-04-04.log"},
+      {"Australia/Lord_Howe", 1633181400, 1633266000, "app.2021-10-02.log app.2021-10-03.log"},
+      {"America/Havana", 1615698000, 1615780800, "app.2021-03-13.log app.2021-03-14.log"},
+      {"UTC", 1709164800, 1709251200, "app.2024-02-28.log app.2024-02-29.log"}};
+  Clock.OfZone = true;
+  for (const TDay& Day : cDays)
+    for (const bool Starts : {false, true}) {
+      SCOPED_TRACE(testing::Message() << Day.Zone << ' ' << Day.Names << ' ' << Starts);
+      const TZoneScope Zone(Day.Zone);
+      Add();
+      LogAt(Day.From * cSecond - 1, "a");
+      LogAt(Day.From * cSecond, "b");
+      if (Starts) {
+        Log->ClearAppenders();
+        std::filesystem::copy_file(Folder.Path() / "app.log", Folder.Path() / "copy");
+        std::filesystem::rename(Folder.Path() / "copy", Folder.Path() / "app.log");
+        Add();
+      }
+      LogAt(Day.To * cSecond - 1, "c");
+      LogAt(Day.To * cSecond, "d");
+      const std::string Names = Day.Names;
+      EXPECT_EQ(Files(), (TFiles{{Names.substr(0, 18), "a"}, {Names.substr(19), "bc"}, {"app.log", "d"}}));
+      Log->ClearAppenders();
+      for (const std::string& Name : Folder.Names()) std::filesystem::remove(Folder.Path() / Name);
+    }
+}
+
+// By whatever pattern, also one whose text is, or begins with, a number.
+TEST_F(LogDaily, TheNewestAreKeptAndCountedFirst) {
+  const std::tuple<const char*, std::vector<std::string>> cCases[] = {
+      {"yyyy-mm-dd", {"app.2021-12-19.log", "app.2021-12-20.log", "app.2021-12-21.log"}},
+      {"yyyymmdd", {"app.20211219.log", "app.20211220.log", "app.20211221.log"}},
+      {"d.m.yyyy", {"app.29.11.2021.log", "app.9.12.2021.log", "app.10.12.2021.log"}}};
+  for (const auto& [Pattern, Names] : cCases) {
+    const auto File = Add();
+    File->SetDatePattern(Pattern);
+    for (int Age = 3; const std::string& Name : Names) {
+      Folder.Write(Name, "root.test - " + std::to_string(Age) + "\r\n");
+      const auto Now = std::filesystem::file_time_type::clock::now();
+      std::filesystem::last_write_time(Folder.Path() / Name, Now - std::chrono::hours(Age--));
+    }
+    LogAt(cMidnight - 1, "a");
+    File->SetMaxBackupCount(3);
+    for (int i = 1; i < 3; ++i) EXPECT_TRUE(Folder.Names().size() == 3U && Texts(Names[i]) == std::to_string(3 - i));
+    Folder.Write("app." + FormatDateTime(FromUTF8(Pattern), zq::Now()).ToUTF8() + ".log", "");
+    File->SetMaxBackupCount(5);
+    File->RollOver();
+    std::map<std::string, std::string> Numbers;
+    for (const auto& [Name, Text] : Files()) Numbers[Name.substr(4, 2)] = Text;
+    EXPECT_EQ(Numbers["1."] + Numbers["2."] + Numbers["3."] + Numbers["4."], "a12");
+    Log->ClearAppenders();
+    for (const std::string& Name : Folder.Names()) std::filesystem::remove(Folder.Path() / Name);
+  }
+}
+
+TEST_F(LogDaily, ARollThatFailedAtTheStartIsTriedAgainAfterAMinute) {
+  const auto File = Add();
+  File->SetAppendExisting(false);
+  Folder.Write("app.log", "Log started on : 2021-12-21 10:00:00\r\n");
+  std::filesystem::create_directory(Folder.Path() / "app.2021-12-21.log");
+  LogAt(cMidnight, "a");
+  LogAt(cMidnight + 60 * cSecond - 1000, "b");
+  std::filesystem::remove(Folder.Path() / "app.2021-12-21.log");
+  LogAt(cMidnight + 60 * cSecond, "c");
+  EXPECT_EQ(Files(), (TFiles{{"app.2021-12-21.log", "ab"}, {"app.log", "c"}}));
 }
 
 TEST_F(LogDaily, AFileOfAnEarlierDayIsRolledAtTheStart) {

@@ -33,6 +33,18 @@ std::map<std::string, std::string> Contents(const TTempFolder& AFolder) {
   return Result;
 }
 
+// Of a killed one -1.
+int ExitOf(const std::function<void()>& AChild) {
+  const pid_t Child = ::fork();
+  if (Child == 0) {
+    AChild();
+    std::exit(0);
+  }
+  int Status = 0;
+  ::waitpid(Child, &Status, 0);
+  return WIFEXITED(Status) ? WEXITSTATUS(Status) : -1;
+}
+
 template <class TAppender = TZqRollingFileAppender>
 IntfRef<IZqRollingFileAppender> AddRolling(const IntfRef<IZqLogger>& ALog, const TTempFolder& AFolder, Word ABackups) {
   const auto Result = AddFile<TAppender>(ALog, AFolder.File("app.log")).template As<IZqRollingFileAppender>();
@@ -98,6 +110,42 @@ TEST_P(LogFaults, OfEachCallCostNothingThatIsKept) {
       EXPECT_NE(After.find("- afterwards\r\n"), After.npos);
       ASSERT_LT(Call, 200);
     }
+}
+
+// Killed before each call, and started again: every line and every older file is there once.
+TEST_P(LogFaults, AKilledProcessCostsNothingEither) {
+  TScriptedClock Time;
+  FaultClock = &Time;
+  TFaultyDisk Young;
+  Young.CreatedTime = 0;
+  for (int Call = 1, Exit = -1; Exit != 0; ++Call) {
+    SCOPED_TRACE(testing::Message() << "killed before call " << Call);
+    const TTempFolder Folder(GetParam().Before);
+    const auto Start = [&](const char* AText) {
+      const TLoggerFixture Fixture;
+      const auto File = GetParam().Add(Fixture.Log, Folder, 20);
+      Fixture.Log->Info(AText);
+      TFaultyDisk Disk(Exit == -1 ? Call : 0, TFaultyDisk::cKill);
+      Disk.CreatedTime = 0;
+      GetParam().Action(Fixture.Log, File);
+    };
+    Exit = ExitOf([&] { Start("acknowledged"); });
+    ASSERT_TRUE(Exit == 0 || Exit == -1);
+    FaultClock->Microseconds += cDay;
+    const int Killed = std::exchange(Exit, 0);
+    Start("afterwards");
+    Exit = Killed;
+    FaultClock->Microseconds -= 2 * cDay;
+    std::string After;
+    for (const auto& [Name, Content] : Contents(Folder)) After += Content + '\n';
+    std::vector<std::string> Kept(GetParam().Before.begin(), GetParam().Before.end());
+    Kept.insert(Kept.end(), {"- acknowledged\r\n", "- afterwards\r\n"});
+    for (const std::string& Text : Kept) {
+      const auto At = After.find(Text);
+      EXPECT_TRUE(At != After.npos && After.find(Text, At + 1) == After.npos) << Text;
+    }
+    ASSERT_LT(Call, 200);
+  }
 }
 INSTANTIATE_TEST_SUITE_P(Calls, LogFaults,
     testing::Values(TFaultCase{"RollByALine", {"app.1.log", "app.2.log"}, cLine},
@@ -277,17 +325,6 @@ TEST(LogKeeps, MessagesOutOfStandardErrorsDescriptor) {
   };
   const TTempFolder Folder;
   EXPECT_EXIT(Act(Folder), testing::ExitedWithCode(0), "");
-}
-
-int ExitOf(const std::function<void()>& AChild) {
-  const pid_t Child = ::fork();
-  if (Child == 0) {
-    AChild();
-    std::exit(0);
-  }
-  int Status = 0;
-  ::waitpid(Child, &Status, 0);
-  return WIFEXITED(Status) ? WEXITSTATUS(Status) : -1;
 }
 
 TEST(LogKeeps, AForkedChildNeitherEndsNorRollsItsParentsFile) {

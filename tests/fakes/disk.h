@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cerrno>
+#include <csignal>
 #include <functional>
 #include <optional>
 
@@ -9,9 +10,10 @@
 namespace zq {
 
 /// The real disk, in its seam as long as it lives, of which one call fails: the one that FailAt counts, from 1; 0 for
-/// none.
+/// none. With cKill as its error the process is killed there, before the call.
 class TFaultyDisk final : public TDiskService {
  public:
+  static constexpr int cKill = -1;
   explicit TFaultyDisk(int AFailAt = 0, int AError = 0) : FailAt(AFailAt), Error(AError) {}
 
   int Open(const char* APath, int AFlags, Cardinal AMode) override {
@@ -51,6 +53,7 @@ class TFaultyDisk final : public TDiskService {
  private:
   bool Fails() noexcept {
     if (++FCalls != FailAt) return false;
+    if (Error == cKill) std::raise(SIGKILL);
     errno = Error;
     return true;
   }
