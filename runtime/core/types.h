@@ -32,6 +32,7 @@ using Char = char16_t;
 using WideChar = char16_t;
 using AnsiChar = char;
 using Pointer = void*;
+using HWND = NativeUInt;  ///< a window of the message layer; 0 is none
 
 /// Dynamic array: a value; copies are copies.
 template <class T>

@@ -25,7 +25,9 @@
 #include "runtime/io/paths.h"
 #include "runtime/linux/system_files.h"
 #include "runtime/platform/process_service.h"
+#include "runtime/sync/critical_section.h"
 #include "runtime/sync/event.h"
+#include "runtime/sync/message_window.h"
 
 namespace zq {
 
@@ -462,11 +464,20 @@ class TLinuxProcesses final : public TProcessService {
   bool TerminateProcess(const tagPROCESSENTRY32W& AEntry) override { return Signal(AEntry, SIGKILL); }
   bool RequestEnd(const tagPROCESSENTRY32W& AEntry) override { return Signal(AEntry, SIGTERM); }
 
-  TArray<HWND> EnumWindows() override { return {}; }
-  Cardinal GetWindowThreadProcessId(HWND) override { return 0; }
-  NativeInt SendMessage(HWND, Cardinal, NativeUInt, NativeInt) override { return 0; }
-  bool SendMessageTimeout(HWND, Cardinal, NativeUInt, NativeInt, Cardinal, Cardinal) override { return false; }
-  bool IsWindow(HWND) override { return false; }
+  TArray<HWND> EnumWindows() override { return AllWindows(); }
+  Cardinal GetWindowThreadProcessId(HWND AWindow) override { return zq::IsWindow(AWindow) ? GetCurrentProcessId() : 0; }
+  NativeInt SendMessage(HWND AWindow, Cardinal AMessage, NativeUInt AWParam, NativeInt ALParam) override try {
+    return zq::SendMessage(AWindow, AMessage, AWParam, ALParam);
+  } catch (const ECallRefused&) {
+    return 0;
+  }
+  bool SendMessageTimeout(HWND AWindow, Cardinal AMessage, NativeUInt AWParam, NativeInt ALParam, Cardinal,
+      Cardinal AMilliseconds) override try {
+    return zq::SendMessageTimeout(AWindow, AMessage, AWParam, ALParam, AMilliseconds).has_value();
+  } catch (const ECallRefused&) {
+    return false;
+  }
+  bool IsWindow(HWND AWindow) override { return zq::IsWindow(AWindow); }
   bool SetWindowPos(HWND, HWND, Integer, Integer, Integer, Integer, Cardinal) override { return false; }
 };
 

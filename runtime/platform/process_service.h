@@ -9,9 +9,6 @@
 
 namespace zq {
 
-/// A window of the message layer; 0 is none.
-using HWND = NativeUInt;
-
 inline constexpr HWND HWND_TOPMOST = static_cast<HWND>(-1);
 inline constexpr HWND HWND_NOTOPMOST = static_cast<HWND>(-2);
 inline constexpr Cardinal WM_CLOSE = 16;
@@ -95,7 +92,7 @@ class ZQ_API TProcessService {
   /// Asks a process to end that has no window which could be asked to close. On Linux by SIGTERM.
   virtual bool RequestEnd(const tagPROCESSENTRY32W& AEntry) = 0;
 
-  /// Top-level windows. Linux has none, and the calls below refuse there.
+  /// Top-level windows. On Linux the hidden ones of this process; none of them can be moved.
   [[nodiscard]] virtual TArray<HWND> EnumWindows() = 0;
   /// Id of the window's process; 0 where there is no such window.
   [[nodiscard]] virtual Cardinal GetWindowThreadProcessId(HWND AWindow) = 0;

@@ -1,6 +1,5 @@
 #include "runtime/sync/critical_section.h"
 
-#include <linux/futex.h>
 #include <linux/membarrier.h>
 #include <pthread.h>
 #include <sys/single_threaded.h>
@@ -8,11 +7,9 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
-#include <ctime>
 #include <mutex>
-#include <utility>
 
+#include "runtime/sync/futex.h"
 #include "runtime/sync/pause.h"
 
 namespace zq {
@@ -26,31 +23,11 @@ constexpr Cardinal cSlice = 10;  // milliseconds between two looks where a wake-
 // Initial-exec: one load relative to the thread pointer, where a shared library would otherwise make a call.
 __attribute__((tls_model("initial-exec"))) constinit thread_local std::uint32_t ThreadId = 0;
 
-timespec After(Cardinal AMilliseconds) noexcept {
-  timespec Result{};
-  ::clock_gettime(CLOCK_MONOTONIC, &Result);
-  const std::int64_t Nanoseconds = Result.tv_nsec + std::int64_t{AMilliseconds % 1000} * 1'000'000;
-  Result.tv_sec += static_cast<time_t>(AMilliseconds / 1000 + Nanoseconds / 1'000'000'000);
-  Result.tv_nsec = static_cast<long>(Nanoseconds % 1'000'000'000);
-  return Result;
+// For a while at most: a sandbox that was put up since has taken the barrier away.
+bool WaitASlice(void* AWord, std::uint32_t AValue, const TDeadline& ADeadline) noexcept {
+  const TDeadline Soon = TDeadline::In(cSlice);
+  return futex::Wait(AWord, AValue, Soon < ADeadline ? Soon : ADeadline) || Soon < ADeadline;
 }
-
-// Sleeps unless AWord isn't AValue any more. False when the time was over.
-bool WaitOn(void* AWord, std::uint32_t AValue, const timespec* ADeadline) noexcept {
-  return ::syscall(SYS_futex, AWord, FUTEX_WAIT_BITSET_PRIVATE, AValue, ADeadline, nullptr, FUTEX_BITSET_MATCH_ANY) ==
-             0 ||
-         errno != ETIMEDOUT;
-}
-
-// The same for a while at most: a sandbox that was put up since has taken the barrier away.
-bool WaitASlice(void* AWord, std::uint32_t AValue, const timespec* ADeadline) noexcept {
-  const timespec Soon = After(cSlice);
-  const auto Key = [](const timespec& ATime) { return std::pair(ATime.tv_sec, ATime.tv_nsec); };
-  return WaitOn(AWord, AValue, &Soon) || ADeadline == nullptr || Key(Soon) < Key(*ADeadline);
-}
-
-// AWord is an address only: a lock that lies there by now takes the wake-up for a reason to look again.
-void WakeOneOn(void* AWord) noexcept { ::syscall(SYS_futex, AWord, FUTEX_WAKE_PRIVATE, 1, nullptr, nullptr, 0); }
 
 }  // namespace
 
@@ -121,13 +98,13 @@ bool TCriticalSection::Spin() noexcept {
 // sleeper puts into every thread between its counting and its look at FOwner stands in for that: whoever misses the
 // count has freed the lock in the sleeper's sight.
 [[gnu::noinline]] bool TCriticalSection::Wait(Cardinal AMilliseconds) noexcept {
-  const timespec Deadline = AMilliseconds == cForEver ? timespec{} : After(AMilliseconds);
+  const TDeadline Deadline = TDeadline::In(AMilliseconds);
   if (Spin()) return true;
   FSleepers.fetch_add(1);
   ParkedAt(this).fetch_add(1);
   const bool Ordered = ::syscall(SYS_membarrier, MEMBARRIER_CMD_PRIVATE_EXPEDITED, 0, 0) == 0 ||
                        (ParkedAt(this).load(std::memory_order_relaxed) & cFenced) != 0;
-  const bool Taken = Sleep(AMilliseconds == cForEver ? nullptr : &Deadline, Ordered);
+  const bool Taken = Sleep(Deadline, Ordered);
   if (Taken) FOwner.fetch_and(~cWaking, std::memory_order_relaxed);  // who leaves wakes the next one
   ParkedAt(this).fetch_sub(1);
   FSleepers.fetch_sub(1);
@@ -136,7 +113,7 @@ bool TCriticalSection::Spin() noexcept {
 
 // While cWaking is set nobody wakes a second thread. So who isn't to come back takes it away, and who goes to sleep
 // takes it away before its last look; only more wake-ups than needed can come of that.
-bool TCriticalSection::Sleep(const timespec* ADeadline, bool AOrdered) noexcept {
+bool TCriticalSection::Sleep(const TDeadline& ADeadline, bool AOrdered) noexcept {
   for (bool InTime = true;;) {
     const std::uint32_t Owner = OwnerIn(FOwner.fetch_and(~cWaking));
     if (Owner == 0) {
@@ -144,7 +121,7 @@ bool TCriticalSection::Sleep(const timespec* ADeadline, bool AOrdered) noexcept 
     } else if (!InTime) {
       return false;
     } else {
-      InTime = AOrdered ? WaitOn(&FOwner, Owner, ADeadline) : WaitASlice(&FOwner, Owner, ADeadline);
+      InTime = AOrdered ? futex::Wait(&FOwner, Owner, ADeadline) : WaitASlice(&FOwner, Owner, ADeadline);
       if (InTime && Spin()) return true;
     }
   }
@@ -152,14 +129,14 @@ bool TCriticalSection::Sleep(const timespec* ADeadline, bool AOrdered) noexcept 
 
 // By exchange: a thread that has taken cWaking away and lies down again must not be taken for one that still looks.
 void TCriticalSection::LeaveAndWake() noexcept {
-  if ((FOwner.exchange(cWaking, std::memory_order_release) & cWaking) == 0) WakeOneOn(&FOwner);
+  if ((FOwner.exchange(cWaking, std::memory_order_release) & cWaking) == 0) futex::WakeOne(&FOwner);
 }
 
 // For who found nobody asleep, or nobody in time.
 void TCriticalSection::WakeParked(void* ALock) noexcept {
   TCount& Parked = ParkedAt(ALock);
   if ((Parked.load(std::memory_order_relaxed) & cFenced) != 0 && Parked.fetch_add(0) == cFenced) return;
-  WakeOneOn(ALock);
+  futex::WakeOne(ALock);
 }
 
 }  // namespace zq

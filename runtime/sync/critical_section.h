@@ -7,9 +7,9 @@
 #include "runtime/core/api.h"
 #include "runtime/core/types.h"
 
-struct timespec;
-
 namespace zq {
+
+class TDeadline;
 
 /// The system's number of the calling thread; never 0.
 [[nodiscard]] ZQ_API Cardinal GetCurrentThreadId() noexcept;
@@ -76,7 +76,7 @@ class ZQ_API TCriticalSection {
   bool Take(std::uint32_t AThread) noexcept;
   bool Spin() noexcept;
   bool Wait(Cardinal AMilliseconds) noexcept;
-  bool Sleep(const timespec* ADeadline, bool AOrdered) noexcept;
+  bool Sleep(const TDeadline& ADeadline, bool AOrdered) noexcept;
   void LeaveAndWake() noexcept;
 
   static TCount ParkedCounts[cParkedCounts];  // sleepers on all locks of one hash; outlives every lock

@@ -1,55 +1,40 @@
 #include "runtime/sync/event.h"
 
 #include <algorithm>
-#include <chrono>
-#include <optional>
 
+#include "runtime/sync/event_watch.h"
 #include "runtime/sync/pause.h"
+#include "runtime/sync/thread_queue.h"
 
 namespace zq {
 
 namespace {
 
-using TClock = std::chrono::steady_clock;
-
 // A wake-up costs tens of microseconds: a signal that comes within the first few is met awake.
 constexpr int cSpins = 200;
 
-// When a wait is over; never for INFINITE.
-std::optional<TClock::time_point> Deadline(Cardinal ATimeout) {
-  if (ATimeout == INFINITE) return std::nullopt;
-  return TClock::now() + std::chrono::milliseconds(ATimeout);
-}
-
-// False when the time was over before AReady.
-template <class TReady>
-bool WaitUntil(std::condition_variable& AChanged, std::unique_lock<std::mutex>& ALock,
-    const std::optional<TClock::time_point>& ADeadline, TReady AReady) {
-  if (ADeadline) return AChanged.wait_until(ALock, *ADeadline, AReady);
-  AChanged.wait(ALock, AReady);
-  return true;
-}
-
 }  // namespace
 
-// What WaitForAny sleeps on.
-struct TEvent::TWaiter {
-  void Wake() {
-    const std::lock_guard Guard(Lock);
-    Woken = true;
-    Changed.notify_one();
-  }
-  std::mutex Lock;
-  std::condition_variable Changed;
-  bool Woken = false;
-};
+TEvent::TWatch::TWatch(TEvent& AEvent, TParker& AParker) : FEvent(AEvent), FParker(AParker) {
+  const std::lock_guard Guard(FEvent.FLock);
+  FNext = FEvent.FWatches;
+  if (FNext != nullptr) FNext->FLink = &FNext;
+  FEvent.FWatches = this;
+  FLink = &FEvent.FWatches;
+}
 
+TEvent::TWatch::~TWatch() {
+  const std::lock_guard Guard(FEvent.FLock);
+  *FLink = FNext;
+  if (FNext != nullptr) FNext->FLink = FLink;
+}
+
+// Each waiter is woken, also for an automatic event: one that just leaves its wait would else keep the signal from
+// the next.
 void TEvent::SetEvent() {
   const std::lock_guard Guard(FLock);  // held to the end: who passes then may destroy the event
   FSignaled.store(true, std::memory_order_relaxed);
-  if (FManualReset) FChanged.notify_all();
-  else FChanged.notify_one();
-  for (TWaiter* const Waiter : FWaiters) Waiter->Wake();
+  for (TWatch* Watch = FWatches; Watch != nullptr; Watch = Watch->FNext) Watch->FParker.Wake();
 }
 
 void TEvent::ResetEvent() {
@@ -57,50 +42,23 @@ void TEvent::ResetEvent() {
   FSignaled.store(false, std::memory_order_relaxed);
 }
 
-TWaitResult TEvent::WaitFor(Cardinal ATimeout) {
-  const auto IsSet = [this] { return FSignaled.load(std::memory_order_relaxed); };
-  for (int i = 0; ATimeout != 0 && i < cSpins && !IsSet(); ++i) SpinPause();
-  std::unique_lock Guard(FLock);
-  if (!IsSet() && (ATimeout == 0 || !WaitUntil(FChanged, Guard, Deadline(ATimeout), IsSet))) return wrTimeout;
+bool TEvent::TryPass() noexcept {
+  const std::lock_guard Guard(FLock);
+  const bool Result = FSignaled.load(std::memory_order_relaxed);
   if (!FManualReset) FSignaled.store(false, std::memory_order_relaxed);
-  return wrSignaled;
+  return Result;
 }
 
-void TEvent::Enlist(TWaiter* AWaiter) {
-  const std::lock_guard Guard(FLock);
-  FWaiters.push_back(AWaiter);
-}
-
-void TEvent::Delist(TWaiter* AWaiter) {
-  const std::lock_guard Guard(FLock);
-  std::erase(FWaiters, AWaiter);
+TWaitResult TEvent::WaitFor(Cardinal ATimeout) {
+  for (int i = 0; ATimeout != 0 && i < cSpins && !FSignaled.load(std::memory_order_relaxed); ++i) SpinPause();
+  if (TryPass()) return wrSignaled;
+  if (ATimeout == 0) return wrTimeout;
+  TEvent* const This = this;
+  return WaitForAny({&This, 1}, ATimeout) == 0 ? wrSignaled : wrTimeout;
 }
 
 Integer TEvent::WaitForAny(std::span<TEvent* const> AEvents, Cardinal ATimeout) {
-  TWaiter Waiter;
-  const auto FirstSet = [&] {
-    const auto Found =
-        std::find_if(AEvents.begin(), AEvents.end(), [](auto* Event) { return Event->WaitFor(0) == wrSignaled; });
-    return Found == AEvents.end() ? -1 : static_cast<Integer>(Found - AEvents.begin());
-  };
-  const auto Until = Deadline(ATimeout);
-  struct TListed {
-    ~TListed() {
-      for (TEvent* const Event : Events) Event->Delist(&Listed);
-    }
-    std::span<TEvent* const> Events;
-    TWaiter& Listed;
-  } const Listed{AEvents, Waiter};  // a thread that is cancelled in its wait leaves nothing behind
-  for (TEvent* const Event : AEvents) Event->Enlist(&Waiter);
-  Integer Result = FirstSet();
-  while (Result < 0) {
-    std::unique_lock Guard(Waiter.Lock);
-    if (!WaitUntil(Waiter.Changed, Guard, Until, [&] { return Waiter.Woken; })) break;
-    Waiter.Woken = false;
-    Guard.unlock();
-    Result = FirstSet();
-  }
-  return Result;
+  return TThreadQueue::Current()->WaitForAny(AEvents, ATimeout, TThreadQueue::TServe::Nothing);
 }
 
 }  // namespace zq

@@ -1,16 +1,15 @@
 #pragma once
 
 #include <atomic>
-#include <condition_variable>
 #include <mutex>
 #include <span>
-#include <vector>
 
 #include "runtime/core/objects.h"
+#include "runtime/sync/deadline.h"
 
 namespace zq {
 
-inline constexpr Cardinal INFINITE = 0xFFFFFFFF;
+class TParker;
 
 enum class TWaitResult : std::uint8_t { wrSignaled, wrTimeout, wrAbandoned, wrError };
 using enum TWaitResult;
@@ -42,13 +41,13 @@ class ZQ_API TEvent : public TSynchroObject {
   static Integer WaitForAny(std::span<TEvent* const> AEvents, Cardinal ATimeout = INFINITE);
 
  private:
-  struct TWaiter;
-  void Enlist(TWaiter* AWaiter);
-  void Delist(TWaiter* AWaiter);
+  friend class TThreadQueue;
+  class TWatch;
+  // Passes if the event is set.
+  bool TryPass() noexcept;
 
   std::mutex FLock;
-  std::condition_variable FChanged;
-  std::vector<TWaiter*> FWaiters;  // of WaitForAny
+  TWatch* FWatches = nullptr;  // of the threads that wait
   const bool FManualReset;
   std::atomic<bool> FSignaled;  // written under FLock
 };

@@ -6,9 +6,7 @@
 
 #include <array>
 #include <chrono>
-#include <deque>
 #include <mutex>
-#include <optional>
 #include <system_error>
 #include <thread>
 #include <unordered_map>
@@ -39,9 +37,11 @@ TNativeThread::TNativeThread(std::function<Integer()> AFunc, bool ASuspended)
     : FFunc(std::move(AFunc)), FResumed(true, !ASuspended) {}
 
 void TNativeThread::Run() {
+  FQueue = TThreadQueue::Current();
   struct TEnd {  // runs too where the thread is cancelled
     ~TEnd() {
       Thread.FFunc = nullptr;
+      Thread.FQueue->End();
       Thread.FExitCode.store(Code, std::memory_order_release);
       Thread.FEnded.SetEvent();
     }
@@ -81,92 +81,27 @@ void EndThread(Integer AExitCode) {
   throw TThreadExit{AExitCode};
 }
 
-// ---- The main thread's queue ---------------------------------------------------------------------------------------
-
-namespace {
-
-// The caller's side of a Synchronize.
-struct TSyncWait {
-  TSimpleEvent Done;
-  ExceptionRef Error;
-};
-
-struct TMainCall {
-  const TThread* Thread = nullptr;
-  TThreadProcedure Procedure;
-  TSyncWait* Waiter = nullptr;  // none for a queued call
-  UInt64 Number = 0;
-};
-
-class TMainQueue {
- public:
-  static TMainQueue& Get() {
-    static TMainQueue& Result = *new TMainQueue;
-    return Result;
-  }
-
-  [[nodiscard]] TEvent& Filled() noexcept { return FFilled; }
-  void Add(const TThread* AThread, TThreadProcedure AProcedure, TSyncWait* AWaiter) {
-    const std::lock_guard Guard(FLock);
-    FCalls.push_back({AThread, std::move(AProcedure), AWaiter, ++FLastNumber});
-    FFilled.SetEvent();
-  }
-  void Remove(const TThread* AThread) {
-    const std::lock_guard Guard(FLock);
-    std::erase_if(FCalls, [&](const TMainCall& Call) { return Call.Thread == AThread && Call.Waiter == nullptr; });
-    if (FCalls.empty()) FFilled.ResetEvent();
-  }
-  UInt64 LastNumber() {
-    const std::lock_guard Guard(FLock);
-    return FLastNumber;
-  }
-  // The first call, unless it came after ALast.
-  std::optional<TMainCall> Take(UInt64 ALast) {
-    const std::lock_guard Guard(FLock);
-    if (FCalls.empty() || FCalls.front().Number > ALast) return std::nullopt;
-    std::optional Result = std::move(FCalls.front());
-    FCalls.pop_front();
-    if (FCalls.empty()) FFilled.ResetEvent();
-    return Result;
-  }
-
- private:
-  std::mutex FLock;
-  std::deque<TMainCall> FCalls;
-  TSimpleEvent FFilled;  // set exactly while there are calls
-  UInt64 FLastNumber = 0;
-};
-
-void Run(const TMainCall& ACall) {
-  if (ACall.Waiter == nullptr) return ACall.Procedure();
-  try {
-    ACall.Procedure();
-  } catch (...) {
-    ACall.Waiter->Error = ExceptionRef::Current();
-  }
-  ACall.Waiter->Done.SetEvent();  // the last touch: the waiter's frame goes with it
+Integer TNativeThread::WaitFor() {
+  const TThreadQueueRef Own = TThreadQueue::Current();
+  if (Own == FQueue) throw EThread(u"A thread can't wait for itself");
+  const TThreadQueue::TEndWait Wait(*Own, FQueue);
+  const std::array<TEvent*, 2> Events{&FEnded, &Own->SyncEvent()};
+  while (Own->WaitForAny(Events, INFINITE) != 0) CheckSynchronize();
+  return ExitCode();
 }
 
-}  // namespace
+// ---- The main thread's queue ---------------------------------------------------------------------------------------
 
-TEvent& SyncEvent() { return TMainQueue::Get().Filled(); }
+TEvent& SyncEvent() { return TThreadQueue::Main()->SyncEvent(); }
 
 bool CheckSynchronize(Cardinal ATimeout) {
   if (!IsMainThread()) throw EThread(u"CheckSynchronize was called on another thread than the main thread");
-  TMainQueue& Queue = TMainQueue::Get();
-  if (Queue.Filled().WaitFor(ATimeout) != wrSignaled) return false;
-  const UInt64 Last = Queue.LastNumber();  // calls that these calls queue wait for the next time
-  while (const auto Call = Queue.Take(Last)) Run(*Call);
-  return true;
+  return SyncEvent().WaitFor(ATimeout) == wrSignaled &&
+         TThreadQueue::Current()->RunCalls(TThreadQueue::TKind::Synchronized);
 }
 
 void TThread::Synchronize(const TThread* AThread, const TThreadProcedure& AProcedure) {
-  if (IsMainThread()) return AProcedure();
-  TSyncWait Wait;
-  TMainQueue::Get().Add(
-      AThread, [&] { AProcedure(); }, &Wait);
-  Wait.Done.WaitFor();
-  if (Wait.Error) Wait.Error.Raise();
+  TThreadQueue::Main()->Send(AProcedure, AThread, TThreadQueue::TKind::Synchronized);
 }
 
 void TThread::Queue(const TThread* AThread, TThreadProcedure AProcedure) {
@@ -175,10 +110,10 @@ void TThread::Queue(const TThread* AThread, TThreadProcedure AProcedure) {
 }
 
 void TThread::ForceQueue(const TThread* AThread, TThreadProcedure AProcedure) {
-  TMainQueue::Get().Add(AThread, std::move(AProcedure), nullptr);
+  TThreadQueue::Main()->Post(std::move(AProcedure), AThread, TThreadQueue::TKind::Synchronized);
 }
 
-void TThread::RemoveQueuedEvents(const TThread* AThread) { TMainQueue::Get().Remove(AThread); }
+void TThread::RemoveQueuedEvents(const TThread* AThread) { TThreadQueue::Main()->DropPosted(AThread); }
 
 // ---- TThread -------------------------------------------------------------------------------------------------------
 
@@ -213,13 +148,7 @@ void TThread::Terminate() {
 Integer TThread::WaitFor() {
   const TThreadHandle Handle = FHandle;
   if (Handle == nullptr) throw EThread(u"A thread that was not started can't be waited for");
-  if (Handle->ThreadID() == GetCurrentThreadId()) throw EThread(u"A thread can't wait for itself");
-  if (!IsMainThread()) Handle->Ended().WaitFor();
-  else {
-    const std::array Events{&Handle->Ended(), &SyncEvent()};
-    while (TEvent::WaitForAny(Events) != 0) CheckSynchronize();
-  }
-  return Handle->ExitCode();
+  return Handle->WaitFor();
 }
 
 Cardinal TThread::ThreadID() const noexcept { return FHandle == nullptr ? 0 : FHandle->ThreadID(); }

@@ -7,12 +7,9 @@
 #include "runtime/core/exceptions.h"
 #include "runtime/sync/critical_section.h"
 #include "runtime/sync/event.h"
+#include "runtime/sync/thread_queue.h"
 
 namespace zq {
-
-struct ZQ_API EThread : Exception {
-  using Exception::Exception;
-};
 
 /// Milliseconds; 0 gives way to other threads.
 ZQ_API void Sleep(Cardinal AMilliseconds);
@@ -35,6 +32,12 @@ class ZQ_API TNativeThread {
   void Resume() { FResumed.SetEvent(); }
   /// Set when the thread's function has returned or was left, and its captures are gone.
   [[nodiscard]] TEvent& Ended() noexcept { return FEnded; }
+  /// What waits for the thread.
+  [[nodiscard]] const TThreadQueueRef& Queue() const noexcept { return FQueue; }
+  /// Waits for the end and returns the exit code. Serves meanwhile what is sent to the caller and, on the main thread,
+  /// what CheckSynchronize serves, and lets out what that raises. Raises EThread on the thread itself, and where the
+  /// threads would wait for each other.
+  Integer WaitFor();
   /// 0 until the thread has ended.
   [[nodiscard]] Integer ExitCode() const noexcept { return FExitCode.load(std::memory_order_acquire); }
 
@@ -49,6 +52,7 @@ class ZQ_API TNativeThread {
   std::atomic<Cardinal> FThreadID = 0;
   std::atomic<Integer> FExitCode = 0;
   unsigned long FNative = 0;
+  TThreadQueueRef FQueue;  // set before FStarted
 };
 using TThreadHandle = std::shared_ptr<TNativeThread>;
 
