@@ -107,10 +107,13 @@ TEST(ThreadQueue, AnAnswerMayComeTooLate) {
   EXPECT_EQ(SendMessageTimeout(Own, 1, 0, 0, 0), 6);
   DestroyWindow(Own);
   EXPECT_THROW(SendMessageTimeout(Own, 1, 0, 0, 0).value_or(0), ECallRefused);
+  TSimpleEvent Busy;
   Loop.Thread().Queue()->Post([&] {
+    Busy.SetEvent();
     Sleep(20);
     DestroyWindow(Loop.Window());
   });
+  Busy.WaitFor();
   EXPECT_THROW(Send(3, cLong).value_or(0), ECallRefused) << "it goes before it has taken the message";
 }
 

@@ -20,6 +20,7 @@
 #include "runtime/sync/critical_section.h"
 #include "runtime/sync/event_watch.h"
 #include "runtime/sync/message_window.h"
+#include "runtime/text/format.h"
 #include "runtime/text/numbers.h"
 
 namespace zq {
@@ -31,9 +32,7 @@ namespace {
 constexpr int cSpins = 200, cReplySpins = 2000;
 constexpr Integer cMostServing = 200;  // sent calls one within the other: more of them end no more
 
-ExceptionRef HasEndedError(Cardinal AThreadID) {
-  return ExceptionRef::Of<ECallRefused>(u"The thread %d has ended", TVarArgs{AThreadID});
-}
+UnicodeString EndedText(Cardinal AThreadID) { return Format(u"The thread %d has ended", {AThreadID}); }
 
 }  // namespace
 
@@ -235,7 +234,7 @@ void TThreadQueue::RunEntry(TEntry& AEntry) {
     const TServing Serving(FServing);
     AEntry.Call();
   } catch (const abi::__forced_unwind&) {
-    AEntry.Sent->Error = HasEndedError(FThreadID);
+    AEntry.Sent->Error = ExceptionRef::Of<ECallRefused>(EndedText(FThreadID));
     AEntry.Sent->Finish();
     throw;
   } catch (...) {
@@ -300,7 +299,7 @@ void TThreadQueue::Post(TCall ACall, const void* AOwner, TKind AKind) { Add({std
 void TThreadQueue::Add(TEntry AEntry, TKind AKind) {
   {
     const std::lock_guard Guard(FLock);
-    if (FEnded) HasEndedError(FThreadID).Raise();
+    if (FEnded) throw ECallRefused(EndedText(FThreadID));
     AEntry.Number = FLastNumber.fetch_add(1, std::memory_order_relaxed) + 1;
     Entries(AKind).push_back(std::move(AEntry));
     FWaiting[static_cast<std::size_t>(AKind)].fetch_add(1, std::memory_order_relaxed);
@@ -338,17 +337,16 @@ std::deque<TThreadQueue::TEntry> TThreadQueue::TakeOut(TLeaves ALeaves) {
   return Result;
 }
 
-void TThreadQueue::Refuse(std::deque<TEntry> AEntries, const ExceptionRef& AReason) {
+void TThreadQueue::Refuse(std::deque<TEntry> AEntries, const UnicodeString& AReason) {
   for (const TEntry& Entry : AEntries)
     if (Entry.Sent != nullptr) {
-      Entry.Sent->Error = AReason;
+      Entry.Sent->Error = ExceptionRef::Of<ECallRefused>(AReason);
       Entry.Sent->Finish();
     }
 }
 
 void TThreadQueue::Drop(const void* AOwner, const UnicodeString& AReason) {
-  Refuse(
-      TakeOut([&](const TEntry& AEntry) { return AEntry.Owner == AOwner; }), ExceptionRef::Of<ECallRefused>(AReason));
+  Refuse(TakeOut([&](const TEntry& AEntry) { return AEntry.Owner == AOwner; }), AReason);
 }
 
 void TThreadQueue::DropPosted(const void* AOwner) {
@@ -361,7 +359,7 @@ void TThreadQueue::End() noexcept {
     FEnded = true;
     FHostEvent = -1;
   }
-  Refuse(TakeOut([](const TEntry&) { return true; }), HasEndedError(FThreadID));
+  Refuse(TakeOut([](const TEntry&) { return true; }), EndedText(FThreadID));
   DestroyWindowsOf(*this);
   FDescriptors.reset();
 }

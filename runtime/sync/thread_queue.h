@@ -117,7 +117,7 @@ class ZQ_API TThreadQueue : public std::enable_shared_from_this<TThreadQueue> {
   bool WaitUntil(TReadyCall AReady, const TDeadline& ADeadline, TServe AServe, int ASpins);
   void WaitForReply(TSent& ASent, TThreadQueue& ATarget);
   void Withdraw(TSent& ASent);
-  static void Refuse(std::deque<TEntry> AEntries, const ExceptionRef& AReason);
+  static void Refuse(std::deque<TEntry> AEntries, const UnicodeString& AReason);
   template <class TLeaves>
   std::deque<TEntry> TakeOut(TLeaves ALeaves);
   TDescriptors& Descriptors();
