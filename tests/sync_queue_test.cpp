@@ -292,8 +292,10 @@ TEST(ThreadQueue, TheDescriptorIsReadableWhileThereIsSomethingToDo) {
   const std::jthread Sender([&] { EXPECT_EQ(SendMessage(Window, 1, 0, 0), 8); });
   EXPECT_TRUE(Readable(cLong));
   while (!ProcessMessages(cLong)) continue;
-  Queue->SetTimer(5, [] {});
+  const auto Timer = Queue->SetTimer(5, [] {});
   EXPECT_TRUE(Readable(cLong));
+  Queue->KillTimer(Timer);
+  Queue->Unwatch(Pipe.Ends[0]);
   DestroyWindow(Window);
 }
 

@@ -1,7 +1,9 @@
+#include <pthread.h>
 #include <sys/resource.h>
 
 #include <array>
 #include <atomic>
+#include <csignal>
 #include <iostream>
 #include <thread>
 
@@ -74,6 +76,66 @@ TEST(ThreadNative, ExitCodeComesFromTheResultFromEndThreadOrFromARaise) {
     EXPECT_EQ(Thread->ExitCode(), Code);
   }
   EXPECT_THROW(EndThread(1), EAssertionFailed) << "the main thread is nobody's to end";
+}
+
+// Wherever a thread stands: what it waits for may be used and freed then, and who waits for it is let go.
+TEST(ThreadNative, OneThatNeverReturnsIsStopped) {
+  for (const int Case : {0, 1, 2, 3}) {
+    TSimpleEvent Event, Running;
+    std::atomic<bool> Go = true;
+    const auto Queue = TThreadQueue::Current();
+    const auto Thread = BeginThread([&, Case] {
+      Running.SetEvent();
+      if (Case == 1) Event.WaitFor();
+      if (Case == 2) Queue->Send([] {});
+      if (Case == 3) return TThreadQueue::Current()->Run();
+      while (Go) continue;
+      return 5;
+    });
+    EXPECT_FALSE(TThreadHandle(Thread)->Ended().WaitFor(1) == wrSignaled);
+    Running.WaitFor();
+    Sleep(20);
+    std::jthread Sender;
+    if (Case == 1) Sender = std::jthread([&] { EXPECT_THROW(Thread->Queue()->Send([] {}), ECallRefused); });
+    if (Case == 1) Sleep(20);
+    EXPECT_TRUE(Thread->Kill());
+    Event.SetEvent();
+    EXPECT_FALSE(Queue->RunOnce()) << "its call is taken back";
+    EXPECT_EQ(Thread->WaitFor(), 0);
+    EXPECT_TRUE(Thread->Kill()) << "once more";
+  }
+  const auto Deaf = BeginThread([] {
+    sigset_t All;
+    ::sigfillset(&All);
+    ::pthread_sigmask(SIG_SETMASK, &All, nullptr);
+    Sleep(4000);
+    return 6;
+  });
+  Sleep(20);
+  EXPECT_FALSE(Deaf->Kill()) << "it hears no signal";
+  EXPECT_EQ(Deaf->WaitFor(), 6);
+}
+
+TEST(ThreadNative, PrioritiesReadBackAsTheyWereSetAndNamesAreCut) {
+  TSimpleEvent Go;
+  const auto Thread = BeginThread([&] {
+    Go.WaitFor();
+    SetThreadName(u"a name of \u00e4\u00e4\u00e4\u00e4");
+    char Name[16] = {};
+    ::pthread_getname_np(::pthread_self(), Name, sizeof Name);
+    EXPECT_STREQ(Name, "a name of \u00e4\u00e4") << "no half character";
+    return 0;
+  });
+  const int Own = ::getpriority(PRIO_PROCESS, 0);
+  for (int Priority = 6; Priority >= 0; --Priority) {
+    EXPECT_EQ(Thread->SetPriority(static_cast<TThreadPriority>(Priority)), 0);
+    EXPECT_EQ(Thread->Priority(), static_cast<TThreadPriority>(Priority));
+  }
+  EXPECT_EQ(::getpriority(PRIO_PROCESS, Thread->ThreadID()), std::min(Own + 19, 19)) << "idle";
+  EXPECT_EQ(::getpriority(PRIO_PROCESS, 0), Own);
+  Go.SetEvent();
+  Thread->WaitFor();
+  EXPECT_NE(Thread->SetPriority(tpNormal), 0);
 }
 
 // ---- Threads and the main thread's queue ---------------------------------------------------------------------------

@@ -1,15 +1,23 @@
 #include "runtime/sync/thread.h"
 
 #include <cxxabi.h>
+#include <pthread.h>
 #include <sched.h>
+#include <sys/resource.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <array>
+#include <cerrno>
 #include <chrono>
+#include <csignal>
 #include <mutex>
-#include <system_error>
 #include <thread>
 #include <unordered_map>
+#include <utility>
+
+#include "runtime/io/files.h"
 
 namespace zq {
 
@@ -24,11 +32,6 @@ bool IsMainThread() noexcept { return GetCurrentThreadId() == GetCurrentProcessI
 
 namespace {
 
-// Unwinds a thread that calls EndThread; none of the Exception family, so that no handler of that takes it.
-struct TThreadExit {
-  Integer Code;
-};
-
 constinit thread_local bool Begun = false;  // the calling thread is BeginThread's
 
 }  // namespace
@@ -36,21 +39,25 @@ constinit thread_local bool Begun = false;  // the calling thread is BeginThread
 TNativeThread::TNativeThread(std::function<Integer()> AFunc, bool ASuspended)
     : FFunc(std::move(AFunc)), FResumed(true, !ASuspended) {}
 
+void* TNativeThread::Main(void* AThread) {
+  const TThreadHandle Self = static_cast<TNativeThread*>(AThread)->FSelf;
+  Self->Run();
+  ::pthread_detach(::pthread_self());
+  return nullptr;
+}
+
 void TNativeThread::Run() {
+  FThreadID = GetCurrentThreadId();
   FQueue = TThreadQueue::Current();
-  struct TEnd {  // runs too where the thread is cancelled
+  FStarted.SetEvent();
+  struct TEnd {  // also where the thread is cancelled
     ~TEnd() {
-      Thread.FFunc = nullptr;
-      Thread.FQueue->End();
-      Thread.FExitCode.store(Code, std::memory_order_release);
-      Thread.FEnded.SetEvent();
+      if (Thread.BeginEnd()) Thread.End(Code);
     }
     TNativeThread& Thread;
     Integer Code = 0;
   } End{*this};
   Begun = true;
-  FThreadID.store(GetCurrentThreadId(), std::memory_order_release);
-  FStarted.SetEvent();
   FResumed.WaitFor();
   try {
     End.Code = FFunc();
@@ -63,16 +70,47 @@ void TNativeThread::Run() {
   }
 }
 
+// True for the first who ends it.
+bool TNativeThread::BeginEnd() {
+  const std::lock_guard Guard(FEndLock);
+  return !std::exchange(FEnds, true);
+}
+
+void TNativeThread::End(Integer ACode) {
+  FFunc = nullptr;
+  FQueue->End();
+  FExitCode.store(ACode, std::memory_order_release);
+  const TThreadHandle Self = std::move(FSelf);
+  FEnded.SetEvent();
+}
+
+Cardinal TNativeThread::ThreadID() {
+  FStarted.WaitFor();
+  return FThreadID;
+}
+
+const TThreadQueueRef& TNativeThread::Queue() {
+  FStarted.WaitFor();
+  return FQueue;
+}
+
+// The thread's number isn't waited for: who begins many threads needn't meet each of them.
+void TNativeThread::Begin() {
+  ::pthread_t Native{};
+  const int Error = ::pthread_create(&Native, nullptr, Main, this);
+  if (Error != 0) throw EThread(u"Thread creation error: " + SysErrorMessage(Error));
+  FNative = Native;
+}
+
 TThreadHandle BeginThread(std::function<Integer()> AFunc, bool ASuspended) {
   auto Result = std::make_shared<TNativeThread>(std::move(AFunc), ASuspended);
+  Result->FSelf = Result;
   try {
-    std::thread Native([Result] { Result->Run(); });
-    Result->FNative = Native.native_handle();
-    Native.detach();
-  } catch (const std::system_error& e) {
-    throw EThread(u"Thread creation error: " + FromUTF8(e.what()));
+    Result->Begin();
+  } catch (...) {
+    Result->FSelf = nullptr;
+    throw;
   }
-  Result->FStarted.WaitFor();
   return Result;
 }
 
@@ -83,11 +121,97 @@ void EndThread(Integer AExitCode) {
 
 Integer TNativeThread::WaitFor() {
   const TThreadQueueRef Own = TThreadQueue::Current();
-  if (Own == FQueue) throw EThread(u"A thread can't wait for itself");
+  if (Own == Queue()) throw EThread(u"A thread can't wait for itself");
   const TThreadQueue::TEndWait Wait(*Own, FQueue);
   const std::array<TEvent*, 2> Events{&FEnded, &Own->SyncEvent()};
   while (Own->WaitForAny(Events, INFINITE) != 0) CheckSynchronize();
   return ExitCode();
+}
+
+void SetThreadName(const UnicodeString& AName) noexcept {
+  constexpr std::size_t cMost = 15;
+  try {
+    std::string Name = AName.ToUTF8();
+    std::size_t Length = std::min(Name.size(), cMost);
+    while (Length < Name.size() && (static_cast<Byte>(Name[Length]) & 0xC0) == 0x80) --Length;
+    Name.resize(Length);
+    ::pthread_setname_np(::pthread_self(), Name.c_str());
+  } catch (...) {  // no memory: it keeps its name
+  }
+}
+
+Integer TNativeThread::SetPriority(TThreadPriority APriority) {
+  constexpr int cNice[] = {19, 10, 5, 0, -5, -10, -20};
+  if (FEnded.WaitFor(0) == wrSignaled) return ESRCH;  // its number may be another's by now
+  FPriority.store(APriority, std::memory_order_relaxed);
+  const int Normal = ::getpriority(PRIO_PROCESS, GetCurrentProcessId());
+  const int Nice = std::clamp(Normal + cNice[static_cast<std::size_t>(APriority)], -20, 19);
+  if (::setpriority(PRIO_PROCESS, ThreadID(), Nice) == 0 || errno == EACCES || errno == EPERM) return 0;
+  return errno;
+}
+
+// ---- Stopping by force
+
+namespace {
+
+constexpr Cardinal cStopTime = 2000;  // milliseconds
+
+// A signal that the host has left alone, for a scope in which it stops the thread that it reaches.
+class TStopSignal {
+ public:
+  TStopSignal() {
+    struct sigaction Stop {};
+    Stop.sa_handler = [](int) { ::syscall(SYS_exit, 0); };
+    for (FNumber = SIGRTMAX; FNumber >= SIGRTMIN; --FNumber)
+      if (::sigaction(FNumber, nullptr, &FFormer) == 0 && FFormer.sa_handler == SIG_DFL &&
+          ::sigaction(FNumber, &Stop, nullptr) == 0)
+        return;
+  }
+  TStopSignal(const TStopSignal&) = delete;
+  TStopSignal& operator=(const TStopSignal&) = delete;
+  ~TStopSignal() {
+    if (IsThere()) ::sigaction(FNumber, &FFormer, nullptr);
+  }
+  [[nodiscard]] bool IsThere() const noexcept { return FNumber >= SIGRTMIN; }
+  [[nodiscard]] int Number() const noexcept { return FNumber; }
+
+ private:
+  int FNumber = 0;
+  struct sigaction FFormer {};
+};
+
+bool Signals(Cardinal AThread, int ASignal) {
+  return ::syscall(SYS_tgkill, GetCurrentProcessId(), AThread, ASignal) == 0;
+}
+
+constinit std::mutex StopLock;  // one signal at a time
+
+}  // namespace
+
+// With both locks held the thread neither ends by itself nor dies with its queue locked.
+bool TNativeThread::Stop() {
+  const std::lock_guard QueueGuard(FQueue->FLock);
+  const TStopSignal Signal;
+  if (!Signal.IsThere() || !Signals(FThreadID, Signal.Number())) return false;
+  for (const TDeadline Deadline = TDeadline::In(cStopTime); Signals(FThreadID, 0); Sleep(1))
+    if (Deadline.IsOver()) return false;
+  return true;
+}
+
+bool TNativeThread::Kill() {
+  if (ThreadID() == GetCurrentThreadId()) return false;
+  bool Stopped = false;
+  {
+    const std::lock_guard OneAtATime(StopLock);
+    const std::lock_guard EndGuard(FEndLock);
+    if (!FEnds && !Stop()) return false;
+    Stopped = !std::exchange(FEnds, true);
+  }
+  if (!Stopped) return FEnded.WaitFor(cStopTime) == wrSignaled;  // it was about to end
+  const bool StackIsFree = FQueue->Abandon();
+  End(0);
+  if (StackIsFree) ::pthread_join(FNative, nullptr);
+  return true;
 }
 
 // ---- The main thread's queue ---------------------------------------------------------------------------------------

@@ -3,6 +3,7 @@
 #include <atomic>
 #include <functional>
 #include <memory>
+#include <mutex>
 
 #include "runtime/core/exceptions.h"
 #include "runtime/sync/critical_section.h"
@@ -17,6 +18,19 @@ ZQ_API void Sleep(Cardinal AMilliseconds);
 /// True on the thread that the process began with.
 [[nodiscard]] ZQ_API bool IsMainThread() noexcept;
 
+/// What EndThread raises to leave the thread's function; a handler for everything lets it pass on. None of the
+/// Exception family.
+struct TThreadExit {
+  Integer Code;
+};
+
+/// How willingly the system gives a thread its time.
+enum class TThreadPriority : Byte { tpIdle, tpLowest, tpLower, tpNormal, tpHigher, tpHighest, tpTimeCritical };
+using enum TThreadPriority;
+
+class TNativeThread;
+using TThreadHandle = std::shared_ptr<TNativeThread>;
+
 /// A thread of the system, shared by the thread itself and by whoever holds its handle. Any thread may call.
 class ZQ_API TNativeThread {
  public:
@@ -24,16 +38,16 @@ class ZQ_API TNativeThread {
   TNativeThread(const TNativeThread&) = delete;
   TNativeThread& operator=(const TNativeThread&) = delete;
 
-  /// The system's number, known from the start on.
-  [[nodiscard]] Cardinal ThreadID() const noexcept { return FThreadID.load(std::memory_order_acquire); }
+  /// The system's number. Waits for a thread that is just beginning.
+  [[nodiscard]] Cardinal ThreadID();
+  /// What waits for the thread. Waits for a thread that is just beginning.
+  [[nodiscard]] const TThreadQueueRef& Queue();
   /// The thread library's handle (pthread_t).
   [[nodiscard]] unsigned long NativeHandle() const noexcept { return FNative; }
   /// Lets a thread go that was begun suspended.
   void Resume() { FResumed.SetEvent(); }
   /// Set when the thread's function has returned or was left, and its captures are gone.
   [[nodiscard]] TEvent& Ended() noexcept { return FEnded; }
-  /// What waits for the thread.
-  [[nodiscard]] const TThreadQueueRef& Queue() const noexcept { return FQueue; }
   /// Waits for the end and returns the exit code. Serves meanwhile what is sent to the caller and, on the main thread,
   /// what CheckSynchronize serves, and lets out what that raises. Raises EThread on the thread itself, and where the
   /// threads would wait for each other.
@@ -41,27 +55,52 @@ class ZQ_API TNativeThread {
   /// 0 until the thread has ended.
   [[nodiscard]] Integer ExitCode() const noexcept { return FExitCode.load(std::memory_order_acquire); }
 
+  /// The priority as a nice value relative to the main thread's: 19, 10, 5, 0, -5, -10, -20. Where the process may not
+  /// set that one, which needs a right for all above the present one, the thread keeps what it has. Returns 0, or the
+  /// system's error for a thread that has ended.
+  Integer SetPriority(TThreadPriority APriority);
+  /// What was set last; tpNormal at first.
+  [[nodiscard]] TThreadPriority Priority() const noexcept { return FPriority.load(std::memory_order_relaxed); }
+
+  /// Stops the thread wherever it is, with exit code 0: the last resort. Nothing of it is cleaned up: its scopes are
+  /// not left, what it had locked stays locked (a lock of the allocator or of a stream among them), what it owned is
+  /// lost. Calls that wait for it are refused. False where it could not be stopped within two seconds: it has blocked
+  /// all signals, or is in a system call that can't be left.
+  [[nodiscard]] bool Kill();
+
  private:
-  friend ZQ_API std::shared_ptr<TNativeThread> BeginThread(std::function<Integer()> AFunc, bool ASuspended);
+  friend ZQ_API TThreadHandle BeginThread(std::function<Integer()> AFunc, bool ASuspended);
+  static void* Main(void* AThread);
+  void Begin();
   void Run();
+  bool BeginEnd();
+  void End(Integer ACode);
+  bool Stop();
 
   std::function<Integer()> FFunc;
+  TThreadHandle FSelf;  // until the end
   TEvent FResumed;
   TSimpleEvent FStarted;
   TSimpleEvent FEnded;
-  std::atomic<Cardinal> FThreadID = 0;
   std::atomic<Integer> FExitCode = 0;
+  std::atomic<TThreadPriority> FPriority = tpNormal;
   unsigned long FNative = 0;
-  TThreadQueueRef FQueue;  // set before FStarted
+  std::mutex FEndLock;  // held while the thread is stopped by force: it can't end by itself then
+  bool FEnds = false;   // guarded by it
+  // Set before FStarted:
+  Cardinal FThreadID = 0;
+  TThreadQueueRef FQueue;
 };
-using TThreadHandle = std::shared_ptr<TNativeThread>;
 
 /// Begins a thread that runs AFunc; its result is the exit code. An exception that leaves AFunc ends the thread, and
 /// nothing else, with the code -1. Raises EThread where the system has no thread to give. ASuspended holds AFunc back
-/// until Resume; the thread's number is known all the same.
+/// until Resume.
 [[nodiscard]] ZQ_API TThreadHandle BeginThread(std::function<Integer()> AFunc, bool ASuspended = false);
 /// Ends the calling thread, one that BeginThread began, with that exit code; scopes are left on the way.
 [[noreturn]] ZQ_API void EndThread(Integer AExitCode);
+/// Names the calling thread for debuggers and lists of threads: the first 15 bytes, whole characters of UTF-8. Never
+/// fails.
+ZQ_API void SetThreadName(const UnicodeString& AName) noexcept;
 
 /// Runs what waits for the main thread and returns whether there was anything; with an empty queue waits for at most
 /// ATimeout milliseconds. On the main thread only: raises EThread elsewhere. A queued call that raises lets its

@@ -190,6 +190,8 @@ struct TThreadQueue::TSent {
     Kept->FParker.Wake();
   }
   TThreadQueueRef Sender;
+  TThreadQueue* Target;
+  TSent* Outer;  // of the same thread
   ExceptionRef Error = {};
   std::atomic<bool> Over = false;
 };
@@ -199,28 +201,30 @@ void TThreadQueue::Send(const TCall& ACall, const void* AOwner, TKind AKind) {
   if (Own.get() == this) return ACall();
   if (Own->FServing >= cMostServing)
     throw ECallRefused(u"The threads %d and %d call each other without end", {Own->FThreadID, FThreadID});
-  TSent Sent{Own};
+  TSent Sent{Own, this, Own->FSending};
   Add({[&] { ACall(); }, AOwner, &Sent}, AKind);
-  Own->WaitForReply(Sent, *this);
+  Own->WaitForReply(Sent);
   if (Sent.Error) Sent.Error.Raise();
 }
 
 // A thread that is cancelled in its wait leaves nothing behind.
-void TThreadQueue::WaitForReply(TSent& ASent, TThreadQueue& ATarget) {
+void TThreadQueue::WaitForReply(TSent& ASent) {
   struct TGuard {
+    explicit TGuard(TSent& ASent) : Sent(ASent) { Sent.Sender->FSending = &Sent; }
     ~TGuard() {
-      if (!Sent.Over.load(std::memory_order_acquire)) Target.Withdraw(Sent);
+      while (!Sent.Over.load(std::memory_order_acquire) && !Sent.Target->Withdraw(Sent))
+        Sent.Sender->FParker.Sleep(TDeadline::In(INFINITE));
+      Sent.Sender->FSending = Sent.Outer;
     }
     TSent& Sent;
-    TThreadQueue& Target;
-  } const Guard{ASent, ATarget};
+  } const Guard(ASent);
   WaitUntil([&] { return ASent.Over.load(std::memory_order_acquire); }, TDeadline::In(INFINITE), TServe::SentCalls,
       cReplySpins);
 }
 
-void TThreadQueue::Withdraw(TSent& ASent) {
-  if (!TakeOut([&](const TEntry& AEntry) { return AEntry.Sent == &ASent; }).empty()) return;
-  while (!ASent.Over.load(std::memory_order_acquire)) ASent.Sender->FParker.Sleep(TDeadline::In(INFINITE));
+// False where it isn't waiting any more.
+bool TThreadQueue::Withdraw(const TSent& ASent) {
+  return !TakeOut([&](const TEntry& AEntry) { return AEntry.Sent == &ASent; }).empty();
 }
 
 void TThreadQueue::RunEntry(TEntry& AEntry) {
@@ -433,18 +437,31 @@ bool TThreadQueue::WaitUntil(TReadyCall AReady, const TDeadline& ADeadline, TSer
   }
 }
 
+// A wait of the thread for events, in its frame.
+struct TThreadQueue::TWait {
+  TWait(TThreadQueue& AQueue, std::span<TEvent* const> AEvents)
+      : Queue(AQueue), Outer(AQueue.FWait), Watches(AEvents.size()) {
+    Queue.FWait = this;
+    for (std::size_t i = 0; i < AEvents.size(); ++i) Watches[i].emplace(*AEvents[i], Queue.FParker);
+  }
+  TWait(const TWait&) = delete;
+  TWait& operator=(const TWait&) = delete;
+  ~TWait() { Queue.FWait = Outer; }
+  TThreadQueue& Queue;
+  TWait* Outer;
+  std::vector<std::optional<TEvent::TWatch>> Watches;
+};
+
 Integer TThreadQueue::WaitForAny(std::span<TEvent* const> AEvents, Cardinal ATimeout, TServe AServe) {
   const TDeadline Deadline = TDeadline::In(ATimeout);
-  std::vector<std::optional<TEvent::TWatch>> Watches(AEvents.size());
-  for (std::size_t i = 0; i < AEvents.size(); ++i) Watches[i].emplace(*AEvents[i], FParker);
+  const TWait Wait(*this, AEvents);
   Integer Result = -1;
-  WaitUntil(
-      [&] {
-        const auto Passed = std::ranges::find_if(AEvents, [](TEvent* AEvent) { return AEvent->TryPass(); });
-        if (Passed != AEvents.end()) Result = static_cast<Integer>(Passed - AEvents.begin());
-        return Result >= 0;
-      },
-      Deadline, AServe, cSpins);
+  const auto Passes = [&] {
+    const auto Passed = std::ranges::find_if(AEvents, [](TEvent* AEvent) { return AEvent->TryPass(); });
+    if (Passed != AEvents.end()) Result = static_cast<Integer>(Passed - AEvents.begin());
+    return Result >= 0;
+  };
+  WaitUntil(Passes, Deadline, AServe, cSpins);
   return Result;
 }
 
@@ -512,6 +529,18 @@ TThreadQueue::TEndWait::TEndWait(TThreadQueue& AWaiting, TThreadQueueRef AEnding
 TThreadQueue::TEndWait::~TEndWait() {
   const std::lock_guard Guard(EndWaitsLock);
   FWaiting.FWaitsFor.pop_back();
+}
+
+bool TThreadQueue::Abandon() {
+  {
+    const std::lock_guard Guard(EndWaitsLock);
+    FWaitsFor.clear();
+  }
+  for (TWait* Wait = FWait; Wait != nullptr; Wait = Wait->Outer) Wait->Watches.clear();
+  bool Result = true;
+  for (const TSent* Sent = FSending; Sent != nullptr; Sent = Sent->Outer)
+    Result = (Sent->Over.load(std::memory_order_acquire) || Sent->Target->Withdraw(*Sent)) && Result;
+  return Result;
 }
 
 }  // namespace zq

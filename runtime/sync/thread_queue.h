@@ -115,14 +115,17 @@ class ZQ_API TThreadQueue : public std::enable_shared_from_this<TThreadQueue> {
   void Tell();
   template <class TReadyCall>
   bool WaitUntil(TReadyCall AReady, const TDeadline& ADeadline, TServe AServe, int ASpins);
-  void WaitForReply(TSent& ASent, TThreadQueue& ATarget);
-  void Withdraw(TSent& ASent);
+  void WaitForReply(TSent& ASent);
+  bool Withdraw(const TSent& ASent);
   static void Refuse(std::deque<TEntry> AEntries, const UnicodeString& AReason);
   template <class TLeaves>
   std::deque<TEntry> TakeOut(TLeaves ALeaves);
   TDescriptors& Descriptors();
   void RequireOwn() const;
   void End() noexcept;
+  // Takes back what a thread that was stopped by force has begun to wait for; before End. False where a call that it
+  // has sent still runs, which uses its stack.
+  bool Abandon();
   [[nodiscard]] std::vector<Cardinal> WayFrom(const TThreadQueue& AFrom) const;
   // AWaiting's wait for the end of AEnding's thread, for a scope. Raises EThread where that closes a circle.
   class TEndWait {
@@ -150,6 +153,9 @@ class ZQ_API TThreadQueue : public std::enable_shared_from_this<TThreadQueue> {
   // The thread's own:
   std::unique_ptr<TDescriptors> FDescriptors;
   std::optional<Integer> FQuit;
+  struct TWait;
+  TWait* FWait = nullptr;                  // the innermost
+  TSent* FSending = nullptr;               // the innermost
   Integer FServing = 0;                    // sent calls under way, one within the other
   std::vector<TThreadQueueRef> FWaitsFor;  // threads whose ends are waited for; guarded by a lock of all
 };
