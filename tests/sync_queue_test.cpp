@@ -146,6 +146,30 @@ TEST(ThreadQueue, ThreadsThatWaitForEachOthersEndAreToldSo) {
   EXPECT_EQ(First->WaitFor() + Second->WaitFor(), 1) << "exactly one finds the circle, which ends it for the other";
 }
 
+TEST(ThreadQueue, WhoServesACallCantWaitForTheEndOfItsSender) {
+  TThreadHandle Sender, Between;
+  UnicodeString Told;
+  const HWND Here = AllocateHWnd([&](HWND, Cardinal, NativeUInt ADirect, NativeInt) -> NativeInt {
+    Told = RaisedBy([&] { (ADirect != 0 ? Sender : Between)->WaitFor(); });
+    return 0;
+  });
+  for (const bool Direct : {true, false}) {
+    TSimpleEvent Waits;
+    Sender = BeginThread([&] {
+      if (!Direct) Waits.WaitFor();
+      SendMessage(Here, cMessage, Direct ? 1 : 0, 0);
+      return 0;
+    });
+    if (!Direct) Between = BeginThread([&] { return Waits.SetEvent(), Sender->WaitFor(); });
+    if (!Direct) Sleep(20);
+    EXPECT_EQ(Sender->WaitFor(), 0);
+    for (const Cardinal ID : {GetCurrentThreadId(), Sender->ThreadID()})
+      EXPECT_NE(Told.Pos(IntToStr(ID)), 0) << Told.ToUTF8();
+    if (!Direct) Between->WaitFor();
+  }
+  DestroyWindow(Here);
+}
+
 TEST(ThreadQueue, NoSenderHangsWhereTheThreadOrTheWindowGoes) {
   for (const bool ByThread : {false, true}) {
     TSimpleEvent Busy, Go;

@@ -161,7 +161,11 @@ class TStopSignal {
  public:
   TStopSignal() {
     struct sigaction Stop {};
-    Stop.sa_handler = [](int) { ::syscall(SYS_exit, 0); };
+    Stop.sa_handler = [](int) {
+      Arrived.store(true, std::memory_order_release);
+      ::syscall(SYS_exit, 0);
+    };
+    Arrived.store(false, std::memory_order_relaxed);
     for (FNumber = SIGRTMAX; FNumber >= SIGRTMIN; --FNumber)
       if (::sigaction(FNumber, nullptr, &FFormer) == 0 && FFormer.sa_handler == SIG_DFL &&
           ::sigaction(FNumber, &Stop, nullptr) == 0)
@@ -174,8 +178,11 @@ class TStopSignal {
   }
   [[nodiscard]] bool IsThere() const noexcept { return FNumber >= SIGRTMIN; }
   [[nodiscard]] int Number() const noexcept { return FNumber; }
+  // What the thread did before is seen by who saw this.
+  [[nodiscard]] static bool HasArrived() noexcept { return Arrived.load(std::memory_order_acquire); }
 
  private:
+  static inline constinit std::atomic<bool> Arrived = false;
   int FNumber = 0;
   struct sigaction FFormer {};
 };
@@ -193,7 +200,7 @@ bool TNativeThread::Stop() {
   const std::lock_guard QueueGuard(FQueue->FLock);
   const TStopSignal Signal;
   if (!Signal.IsThere() || !Signals(FThreadID, Signal.Number())) return false;
-  for (const TDeadline Deadline = TDeadline::In(cStopTime); Signals(FThreadID, 0); Sleep(1))
+  for (const auto Deadline = TDeadline::In(cStopTime); !TStopSignal::HasArrived() || Signals(FThreadID, 0); Sleep(1))
     if (Deadline.IsOver()) return false;
   return true;
 }

@@ -191,7 +191,9 @@ struct TThreadQueue::TSent {
   }
   TThreadQueueRef Sender;
   TThreadQueue* Target;
-  TSent* Outer;  // of the same thread
+  TSent* Outer;                   // what its thread has sent and waits for, too
+  const TSent* Within;            // the call that its thread was serving when it sent this one
+  const TSent* Former = nullptr;  // what Target was serving when it began with this one
   ExceptionRef Error = {};
   std::atomic<bool> Over = false;
 };
@@ -201,7 +203,7 @@ void TThreadQueue::Send(const TCall& ACall, const void* AOwner, TKind AKind) {
   if (Own.get() == this) return ACall();
   if (Own->FServing >= cMostServing)
     throw ECallRefused(u"The threads %d and %d call each other without end", {Own->FThreadID, FThreadID});
-  TSent Sent{Own, this, Own->FSending};
+  TSent Sent{Own, this, Own->FSending, Own->FServed};
   Add({[&] { ACall(); }, AOwner, &Sent}, AKind);
   Own->WaitForReply(Sent);
   if (Sent.Error) Sent.Error.Raise();
@@ -230,12 +232,18 @@ bool TThreadQueue::Withdraw(const TSent& ASent) {
 void TThreadQueue::RunEntry(TEntry& AEntry) {
   if (AEntry.Sent == nullptr) return AEntry.Call();
   struct TServing {
-    explicit TServing(Integer& ACount) : Count(ACount) { ++Count; }
-    ~TServing() { --Count; }
-    Integer& Count;
+    TServing(TThreadQueue& AQueue, TSent& ASent) : Queue(AQueue) {
+      ASent.Former = std::exchange(Queue.FServed, &ASent);
+      ++Queue.FServing;
+    }
+    ~TServing() {
+      Queue.FServed = Queue.FServed->Former;
+      --Queue.FServing;
+    }
+    TThreadQueue& Queue;
   };
   try {
-    const TServing Serving(FServing);
+    const TServing Serving(*this, *AEntry.Sent);
     AEntry.Call();
   } catch (const abi::__forced_unwind&) {
     AEntry.Sent->Error = ExceptionRef::Of<ECallRefused>(EndedText(FThreadID));
@@ -505,11 +513,20 @@ constinit std::mutex EndWaitsLock;
 
 }  // namespace
 
-// The way from AFrom along the threads whose ends are waited for, to this one: empty where there is none.
-std::vector<Cardinal> TThreadQueue::WayFrom(const TThreadQueue& AFrom) const {
-  if (&AFrom == this) return {FThreadID};
+// Threads that go on only when this one does: its own, and those whose calls it is serving, with whose calls they
+// serve. What they refer to stays as it is meanwhile.
+void TThreadQueue::AddHeld(const TSent* AServed, std::vector<const TThreadQueue*>& AHeld) {
+  for (const TSent* Served = AServed; Served != nullptr; Served = Served->Former) {
+    AHeld.push_back(Served->Sender.get());
+    AddHeld(Served->Within, AHeld);
+  }
+}
+
+// The way from AFrom along the threads whose ends are waited for, to one of AGoals: empty where there is none.
+std::vector<Cardinal> TThreadQueue::WayFrom(const TThreadQueue& AFrom, std::span<const TThreadQueue* const> AGoals) {
+  if (std::ranges::find(AGoals, &AFrom) != AGoals.end()) return {AFrom.FThreadID};
   for (const TThreadQueueRef& Next : AFrom.FWaitsFor)
-    if (auto Way = WayFrom(*Next); !Way.empty()) {
+    if (auto Way = WayFrom(*Next, AGoals); !Way.empty()) {
       Way.push_back(AFrom.FThreadID);
       return Way;
     }
@@ -517,11 +534,14 @@ std::vector<Cardinal> TThreadQueue::WayFrom(const TThreadQueue& AFrom) const {
 }
 
 TThreadQueue::TEndWait::TEndWait(TThreadQueue& AWaiting, TThreadQueueRef AEnding) : FWaiting(AWaiting) {
+  std::vector<const TThreadQueue*> Held{&AWaiting};
+  AddHeld(AWaiting.FServed, Held);
   const std::lock_guard Guard(EndWaitsLock);
-  if (const auto Way = AWaiting.WayFrom(*AEnding); !Way.empty()) {
-    UnicodeString Names;
-    for (const Cardinal ID : Way) Names += (Names.IsEmpty() ? u"" : u", ") + IntToStr(ID);
-    throw EThread(u"Each of these threads would wait for the end of another: %s", {Names});
+  if (const auto Way = WayFrom(*AEnding, Held); !Way.empty()) {
+    UnicodeString Names = IntToStr(AWaiting.FThreadID);
+    for (const Cardinal ID : Way)
+      if (ID != AWaiting.FThreadID) Names += u", " + IntToStr(ID);
+    throw EThread(u"These threads would wait for each other without end: %s", {Names});
   }
   AWaiting.FWaitsFor.push_back(std::move(AEnding));
 }

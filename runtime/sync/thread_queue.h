@@ -126,7 +126,9 @@ class ZQ_API TThreadQueue : public std::enable_shared_from_this<TThreadQueue> {
   // Takes back what a thread that was stopped by force has begun to wait for; before End. False where a call that it
   // has sent still runs, which uses its stack.
   bool Abandon();
-  [[nodiscard]] std::vector<Cardinal> WayFrom(const TThreadQueue& AFrom) const;
+  static void AddHeld(const TSent* AServed, std::vector<const TThreadQueue*>& AHeld);
+  [[nodiscard]] static std::vector<Cardinal> WayFrom(
+      const TThreadQueue& AFrom, std::span<const TThreadQueue* const> AGoals);
   // AWaiting's wait for the end of AEnding's thread, for a scope. Raises EThread where that closes a circle.
   class TEndWait {
    public:
@@ -156,6 +158,7 @@ class ZQ_API TThreadQueue : public std::enable_shared_from_this<TThreadQueue> {
   struct TWait;
   TWait* FWait = nullptr;                  // the innermost
   TSent* FSending = nullptr;               // the innermost
+  const TSent* FServed = nullptr;          // the innermost call under way
   Integer FServing = 0;                    // sent calls under way, one within the other
   std::vector<TThreadQueueRef> FWaitsFor;  // threads whose ends are waited for; guarded by a lock of all
 };
