@@ -32,7 +32,10 @@ class TLoopThread {
   }
   ~TLoopThread() { End(); }
   Integer End() {
-    if (FThread->Ended().WaitFor(0) == wrTimeout) FThread->Queue()->Quit(5);
+    try {
+      FThread->Queue()->Quit(5);
+    } catch (const ECallRefused&) {  // it has ended
+    }
     return FThread->WaitFor();
   }
   NativeInt Send(NativeUInt AValue) const { return SendMessage(FWindow, cMessage, AValue, 0); }
