@@ -9,6 +9,7 @@
 #include <thread>
 #include <vector>
 
+#include "common/uZqThreads.h"
 #include "runtime/sync/critical_section.h"
 
 namespace {
@@ -18,7 +19,7 @@ using namespace zq;
 struct TOwnLock {
   void lock() { Lock.Enter(); }
   void unlock() { Lock.Leave(); }
-  TCriticalSection Lock;
+  TZqCriticalSection Lock;
 };
 
 // Pairs of one thread, ADepth deep. The other thread, which sleeps, makes the process one that needs atomic operations.
@@ -42,6 +43,24 @@ BENCHMARK_TEMPLATE(Pairs, std::recursive_mutex, false)->Arg(1)->Arg(3)->Repetiti
 BENCHMARK_TEMPLATE(Pairs, TOwnLock, false)->Arg(1)->Arg(3)->Repetitions(5)->ReportAggregatesOnly();
 BENCHMARK_TEMPLATE(Pairs, std::recursive_mutex, true)->Arg(1)->Arg(3)->Repetitions(5)->ReportAggregatesOnly();
 BENCHMARK_TEMPLATE(Pairs, TOwnLock, true)->Arg(1)->Arg(3)->Repetitions(5)->ReportAggregatesOnly();
+
+// Pairs of one pointer after the other, of which so many are locked all the time; the figure to quote is the ratio of
+// many to one. The pair of a pointer whose lock it makes and ends stands beside it.
+template <bool AMakes>
+void PointerPairs(benchmark::State& AState) {
+  std::vector<int> Keys(static_cast<std::size_t>(AState.range(0)));
+  for (int& Key : Keys) ZqThreadLock(&Key);
+  std::size_t i = 0;
+  for (auto _ : AState) {
+    const void* const Key = AMakes ? nullptr : &Keys[i];
+    ZqThreadLock(Key);
+    ZqThreadUnlock(Key);
+    if (++i == Keys.size()) i = 0;
+  }
+  for (int& Key : Keys) ZqThreadUnlock(&Key);
+}
+BENCHMARK_TEMPLATE(PointerPairs, false)->Arg(1)->Arg(1000);
+BENCHMARK_TEMPLATE(PointerPairs, true)->Arg(1)->Arg(1000);
 
 // Seconds that AThreads threads need for their pairs of one lock, each with some work in it.
 template <class TLock>

@@ -8,6 +8,7 @@
 #include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
 #include "common/uZqSysUtils.h"
+#include "common/uZqThreads.h"
 #include "common/uZqTypes.h"
 
 namespace zq {
@@ -21,6 +22,7 @@ constexpr TPackageUnit cUnits[] = {
     {u"uZqClasses", uZqClasses::Start, uZqClasses::Stop},
     {u"uZqBase64", nullptr, nullptr},
     {u"uZqWindows", nullptr, nullptr},
+    {u"uZqThreads", uZqThreads::Start, uZqThreads::Stop},
     {u"uZqLogLayouts", uZqLogLayouts::Start, uZqLogLayouts::Stop},
     {u"uZqLogger", uZqLogger::Start, uZqLogger::Stop},
     {u"uZqLogAppenders", uZqLogAppenders::Start, uZqLogAppenders::Stop},

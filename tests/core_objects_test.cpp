@@ -178,6 +178,7 @@ TEST(Assertion, NamesTheUnitByItsPlaceInTheLibrary) {
   const std::pair<const char*, UnicodeString> cCases[] = {{"/src/common/uZqLogger.cpp", u"common/uZqLogger"},
       {"common/uZqLogger.h", u"common/uZqLogger"}, {"/home/common/lib/runtime/io/files.cpp", u"runtime/io/files"},
       {"/runtime/lib/common/uZqTypes.cpp", u"common/uZqTypes"}, {"/uncommon/host.cpp", u"/uncommon/host"},
+      {"/src/common/uZqThreads/locks.cpp", u"common/uZqThreads"}, {"common/lib/host.cpp", u"common/lib/host"},
       {"/v1.2/host", u"/v1.2/host"}};
   for (const auto& [File, Unit] : cCases)
     EXPECT_EQ(RaisedBy([&, &Place = File] { Assert(false, u"t", Place, 7); }),

@@ -228,8 +228,10 @@ TEST(LockMonitor, KeepsThreadsApartAndNests) {
   OnThreads(4, [&](int) {
     EXPECT_FALSE(TMonitor::Enter(&Object, 5));
     EXPECT_THROW(TMonitor::Exit(&Object), EThread);
-    for (int i = 0; i < 500; ++i) {
-      TMonitor::Enter(&Other);
+    for (Cardinal i = 0; i < 5000; ++i) {
+      if (i % 2 == 0) TMonitor::Enter(&Other);
+      while (i % 2 != 0 && !TMonitor::Enter(&Other, i % 3)) {
+      }
       EXPECT_TRUE(TMonitor::TryEnter(&Other));
       ++Guarded;
       TMonitor::Exit(&Other);
@@ -238,7 +240,7 @@ TEST(LockMonitor, KeepsThreadsApartAndNests) {
     }
   });
   TMonitor::Exit(&Object);
-  EXPECT_EQ(std::pair(Guarded, Interlocked), std::pair(2000, 2000));
+  EXPECT_EQ(std::pair(Guarded, Interlocked), std::pair(20000, 20000));
 }
 
 // ---- Waits for a lock ----------------------------------------------------------------------------------------------

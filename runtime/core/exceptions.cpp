@@ -8,7 +8,8 @@ namespace {
 
 thread_local Cardinal LastError = 0;
 
-// "/any/where/common/uZqLogger.cpp" becomes "common/uZqLogger", whatever folders it lies in.
+// "/any/where/common/uZqLogger.cpp" becomes "common/uZqLogger", whatever folders it lies in, and so does a topic of
+// that module, "common/uZqLogger/failures.cpp".
 UnicodeString UnitOf(std::string_view AFile) {
   std::size_t From = 0;
   for (const std::string_view Folder : {"common/", "runtime/"})
@@ -16,6 +17,8 @@ UnicodeString UnitOf(std::string_view AFile) {
         Found != std::string_view::npos && Found > From && AFile[Found - 1] == '/')
       From = Found;
   AFile.remove_prefix(From);
+  constexpr std::string_view cModule = "common/uZq";
+  if (AFile.starts_with(cModule)) AFile = AFile.substr(0, AFile.find('/', cModule.size()));
   if (const auto Dot = AFile.rfind('.');
       Dot != std::string_view::npos && AFile.find('/', Dot) == std::string_view::npos)
     AFile = AFile.substr(0, Dot);

@@ -14,10 +14,10 @@
 #include <csignal>
 #include <mutex>
 #include <thread>
-#include <unordered_map>
 #include <utility>
 
 #include "runtime/io/files.h"
+#include "runtime/sync/keyed_locks.h"
 
 namespace zq {
 
@@ -304,51 +304,19 @@ Integer TThread::Run() {
 
 namespace {
 
-struct TMonitorEntry {
-  TCriticalSection Section;
-  Integer Users = 0;  // calls of Enter that no Exit has matched, waiting ones included
-};
-
-struct TMonitorTable {
-  static TMonitorTable& Get() {
-    static TMonitorTable& Result = *new TMonitorTable;
-    return Result;
-  }
-  std::mutex Lock;  // never held while an entry is waited for
-  std::unordered_map<const TObject*, TMonitorEntry> Entries;
-};
-
-void DropUser(TMonitorTable& ATable, const TObject* AObject) {
-  const auto Found = ATable.Entries.find(AObject);
-  if (--Found->second.Users == 0) ATable.Entries.erase(Found);
+TKeyedLocks& ObjectLocks() {
+  static TKeyedLocks& Result = *new TKeyedLocks;
+  return Result;
 }
 
 }  // namespace
 
-void TMonitor::Enter(const TObject* AObject) { static_cast<void>(Enter(AObject, INFINITE)); }
+void TMonitor::Enter(const TObject* AObject) { ObjectLocks().Enter(AObject); }
 
-bool TMonitor::Enter(const TObject* AObject, Cardinal ATimeout) {
-  TMonitorTable& Table = TMonitorTable::Get();
-  std::unique_lock Guard(Table.Lock);
-  TMonitorEntry& Entry = Table.Entries[AObject];
-  ++Entry.Users;
-  Guard.unlock();
-  if (ATimeout == INFINITE) Entry.Section.Enter();
-  else if (!Entry.Section.TryEnterFor(ATimeout)) {
-    Guard.lock();
-    DropUser(Table, AObject);
-    return false;
-  }
-  return true;
-}
+bool TMonitor::Enter(const TObject* AObject, Cardinal ATimeout) { return ObjectLocks().Enter(AObject, ATimeout); }
 
 void TMonitor::Exit(const TObject* AObject) {
-  TMonitorTable& Table = TMonitorTable::Get();
-  const std::lock_guard Guard(Table.Lock);
-  const auto Found = Table.Entries.find(AObject);
-  if (Found == Table.Entries.end() || !Found->second.Section.IsOwned()) throw EThread(u"The object's lock is not held");
-  Found->second.Section.Leave();
-  DropUser(Table, AObject);
+  if (ObjectLocks().Leave(AObject) != TKeyedLocks::TLeft::Done) throw EThread(u"The object's lock is not held");
 }
 
 }  // namespace zq
