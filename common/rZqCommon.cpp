@@ -7,6 +7,7 @@
 #include "common/uZqLogAppenders.h"
 #include "common/uZqLogLayouts.h"
 #include "common/uZqLogger.h"
+#include "common/uZqSessionEvents.h"
 #include "common/uZqSysUtils.h"
 #include "common/uZqThreads.h"
 #include "common/uZqTypes.h"
@@ -22,6 +23,7 @@ constexpr TPackageUnit cUnits[] = {
     {u"uZqClasses", uZqClasses::Start, uZqClasses::Stop},
     {u"uZqBase64", nullptr, nullptr},
     {u"uZqWindows", nullptr, nullptr},
+    {u"uZqSessionEvents", uZqSessionEvents::Start, uZqSessionEvents::Stop},
     {u"uZqThreads", uZqThreads::Start, uZqThreads::Stop},
     {u"uZqLogLayouts", uZqLogLayouts::Start, uZqLogLayouts::Stop},
     {u"uZqLogger", uZqLogger::Start, uZqLogger::Stop},
@@ -50,7 +52,9 @@ const TPackageInfo& GetPackageInfoTable() {
                   TypeInfo<TZqNullableBool>(), TypeInfo<TZqCharCase>(), TypeInfo<TZqBitness>(),
                   TypeInfo<TZqWeekFormat>(), TypeInfo<TZqDatePeriod>(), TypeInfo<TZqWorkDayAdjustment>(),
                   TypeInfo<TZqDecodeType>(), TypeInfo<TZqTimeRange>(), TypeInfo<TZqTimeFormat>(),
-                  TypeInfo<TZqAutoDestroy>(), TypeInfo<TZqObjectOwnership>(), TypeInfo<TZqBinEncoding>()}};
+                  TypeInfo<TZqAutoDestroy>(), TypeInfo<TZqObjectOwnership>(), TypeInfo<TZqBinEncoding>(),
+                  TypeInfo<TZqNotificationScope>(), TypeInfo<TZqSessionEventType>(), TypeInfo<TZqPowerEventType>(),
+                  TypeInfo<TZqEndSessionType>(), TypeInfo<TZqEndSessionTypes>()}};
   return Table;
 }
 

@@ -39,26 +39,7 @@ using TWords = std::vector<std::string>;
 
 // ----------------------------------------------------------------------------------------------- Reasons of refusals
 
-constexpr Cardinal cFileNotFound = 2, cTooManyOpenFiles = 4, cAccessDenied = 5, cNotEnoughMemory = 8,
-                   cGeneralFailure = 31, cInvalidParameter = 87, cBadExecutable = 193, cTooLong = 206,
-                   cNoSuchDirectory = 267, cElevationRequired = 740, cNoAssociation = 1155;
-
-Cardinal ReasonOf(int AErrno) noexcept {
-  switch (AErrno) {
-    case ENOENT:
-    case ENOTDIR: return cFileNotFound;
-    case EACCES:
-    case EPERM: return cAccessDenied;
-    case EMFILE:
-    case ENFILE: return cTooManyOpenFiles;
-    case ENOMEM:
-    case EAGAIN: return cNotEnoughMemory;
-    case ENOEXEC: return cBadExecutable;
-    case E2BIG:
-    case ENAMETOOLONG: return cTooLong;
-    default: return cGeneralFailure;
-  }
-}
+constexpr Cardinal cInvalidParameter = 87, cNoSuchDirectory = 267, cElevationRequired = 740, cNoAssociation = 1155;
 
 std::nullptr_t Refuse(Cardinal AReason) noexcept {
   SetLastError(AReason);
@@ -321,7 +302,7 @@ Cardinal DocumentWords(const UnicodeString& AFile, TWords& AWords) {
   const std::string Address = ArgumentBytes(std::u16string(CString(AFile)));
   std::error_code Ignored;
   const bool IsFile = fs::exists(Path, Ignored);
-  if (!IsFile && !IsAddress(Address)) return cFileNotFound;
+  if (!IsFile && !IsAddress(Address)) return ReasonOf(ENOENT);
   const std::string Opener = FindProgram("xdg-open");
   if (Opener.empty()) return cNoAssociation;
   AWords.push_back(Opener);
@@ -333,7 +314,7 @@ Cardinal ProgramWords(const TShellExecuteInfo& AInfo, TWords& AWords) {
   const std::u16string_view Parameters = CString(AInfo.Parameters);
   if (SameText(CString(AInfo.File), cInterpreter)) return InterpreterWords(Parameters, AWords) ? 0 : cInvalidParameter;
   const std::string Program = FindProgram(ToSystemPath(AInfo.File));
-  if (Program.empty()) return cFileNotFound;
+  if (Program.empty()) return ReasonOf(ENOENT);
   AWords.push_back(Program);
   return SplitWords(Parameters, AWords) ? 0 : cInvalidParameter;
 }
@@ -342,7 +323,7 @@ Cardinal ShellWords(const TShellExecuteInfo& AInfo, TWords& AWords) {
   const bool Elevates = SameText(CString(AInfo.Verb), u"runas");
   if (!Elevates && AInfo.Verb.c_str()[0] != 0 && !SameText(CString(AInfo.Verb), u"open")) return cNoAssociation;
   const Cardinal Refusal = ProgramWords(AInfo, AWords);
-  if (!Elevates) return Refusal == cFileNotFound ? DocumentWords(AInfo.File, AWords) : Refusal;
+  if (!Elevates) return Refusal == ReasonOf(ENOENT) ? DocumentWords(AInfo.File, AWords) : Refusal;
   if (Refusal != 0) return Refusal;
   const std::string Elevator = FindProgram("pkexec");
   if (Elevator.empty()) return cElevationRequired;

@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdlib>
 #include <fstream>
 #include <sstream>
@@ -32,6 +33,27 @@ std::string Unquoted(std::string_view AText) {
 }
 
 }  // namespace
+
+Cardinal ReasonOf(int AErrno) noexcept {
+  constexpr Cardinal FileNotFound = 2, TooManyOpenFiles = 4, AccessDenied = 5, NotEnoughMemory = 8, GeneralFailure = 31,
+                     BadExecutable = 193, TooLong = 206, ConnectionRefused = 1225, TimedOut = 1460;
+  switch (AErrno) {
+    case ENOENT:
+    case ENOTDIR: return FileNotFound;
+    case EACCES:
+    case EPERM: return AccessDenied;
+    case EMFILE:
+    case ENFILE: return TooManyOpenFiles;
+    case ENOMEM:
+    case EAGAIN: return NotEnoughMemory;
+    case ENOEXEC: return BadExecutable;
+    case E2BIG:
+    case ENAMETOOLONG: return TooLong;
+    case ECONNREFUSED: return ConnectionRefused;
+    case ETIMEDOUT: return TimedOut;
+    default: return GeneralFailure;
+  }
+}
 
 std::string ReadSystemFile(const std::string& APath) {
   const std::ifstream File(APath, std::ios::binary);

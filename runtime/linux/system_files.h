@@ -4,9 +4,13 @@
 #include <string>
 #include <string_view>
 
-/// Small texts that the system keeps; for the Linux feeders.
+#include "runtime/core/types.h"
+
+/// Reasons of refusals, and small texts that the system keeps; for the Linux feeders.
 namespace zq {
 
+/// Of an errno, in the numbers of GetLastError.
+[[nodiscard]] Cardinal ReasonOf(int AErrno) noexcept;
 /// Whole content; empty where it can't be read.
 [[nodiscard]] std::string ReadSystemFile(const std::string& APath);
 /// Takes the first line off AText, without its end.

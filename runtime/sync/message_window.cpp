@@ -79,8 +79,13 @@ std::vector<HWND> AllWindows() {
 }
 
 Cardinal GetWindowThread(HWND AWindow) {
+  const TThreadQueueRef Queue = GetWindowQueue(AWindow);
+  return Queue == nullptr ? 0 : Queue->ThreadID();
+}
+
+TThreadQueueRef GetWindowQueue(HWND AWindow) {
   const TWindowRef Window = TWindows::Get().Find(AWindow);
-  return Window == nullptr ? 0 : Window->Queue->ThreadID();
+  return Window == nullptr ? nullptr : Window->Queue;
 }
 
 NativeInt SendMessage(HWND AWindow, Cardinal AMessage, NativeUInt AWParam, NativeInt ALParam) {

@@ -23,6 +23,8 @@ ZQ_API bool DestroyWindow(HWND AWindow);
 [[nodiscard]] ZQ_API std::vector<HWND> AllWindows();
 /// Of its thread; 0 where there is no such window.
 [[nodiscard]] ZQ_API Cardinal GetWindowThread(HWND AWindow);
+/// Of its thread; null where there is no such window.
+[[nodiscard]] ZQ_API TThreadQueueRef GetWindowQueue(HWND AWindow);
 
 /// Has the window's thread take the message and returns the answer, at once where that is the caller; what the window
 /// raises is raised here. The caller serves calls that are sent to it meanwhile. Raises ECallRefused where the window
