@@ -10,11 +10,13 @@ constinit TStartCount Starts;
 
 void uZqThreads::Start() {
   if (!Starts.Begins()) return;
+  StartManagers();
   StartLocks();
 }
 
 void uZqThreads::Stop() {
   if (!Starts.Ends()) return;
+  StopManagers();
   StopLocks();  // last: whoever ends before may hold a key
 }
 

@@ -1,6 +1,9 @@
 #pragma once
 
+#include "common/uZqThreads/execution.h"
 #include "common/uZqThreads/locks.h"
+#include "common/uZqThreads/managed.h"
+#include "common/uZqThreads/manager.h"
 
 namespace zq::uZqThreads {
 

@@ -205,6 +205,8 @@ class TLinuxChild final : public TChildProcess {
     return Got;
   }
 
+  Cardinal GetProcessId() const noexcept override { return static_cast<Cardinal>(FPid); }
+
   bool WaitForSingleObject(Cardinal AMilliseconds) override {
     using TClock = std::chrono::steady_clock;
     const auto Until = TClock::now() + std::chrono::milliseconds(AMilliseconds);
@@ -401,6 +403,13 @@ class TLinuxProcesses final : public TProcessService {
     std::error_code Ignored;
     if (Result == nullptr && !Folder.empty() && !fs::is_directory(Folder, Ignored)) SetLastError(cNoSuchDirectory);
     return Result;
+  }
+
+  std::unique_ptr<TChildProcess> CreateFreeProcess(const UnicodeString& ACommand) override {
+    TWords Words;
+    TSpawnPlan Plan;
+    if (!CommandWords(CString(ACommand), Words) || Words.empty()) return Refuse(cInvalidParameter);
+    return Spawn(Plan, Words, TDescriptor(-1));
   }
 
   bool ShellExecuteEx(const TShellExecuteInfo& AInfo, std::unique_ptr<TChildProcess>& AProcess) override {

@@ -55,6 +55,7 @@ class ZQ_API TChildProcess {
   /// STILL_ACTIVE until it has ended. On Linux 128 and the signal's number for one that a signal ended, and 0 where the
   /// host takes the ends of all children away (SIGCHLD ignored).
   [[nodiscard]] virtual Integer GetExitCodeProcess() = 0;
+  [[nodiscard]] virtual Cardinal GetProcessId() const noexcept = 0;
 };
 
 /// Processes, the shell's way to open something, the rights of this process, windows. What fails leaves its reason in
@@ -72,6 +73,8 @@ class ZQ_API TProcessService {
   /// SIGPIPE; a program given by a relative path is looked for from ADirectory.
   [[nodiscard]] virtual std::unique_ptr<TChildProcess> CreateProcess(
       const UnicodeString& ACommand, const UnicodeString& ADirectory) = 0;
+  /// The same in the current folder and with this process's outputs: there is nothing to read from it.
+  [[nodiscard]] virtual std::unique_ptr<TChildProcess> CreateFreeProcess(const UnicodeString& ACommand) = 0;
 
   /// Opens AInfo.File by AInfo.Verb; with SEE_MASK_NOCLOSEPROCESS AProcess is what was started, if there is something
   /// to wait for. On Linux a program runs with the parameters, anything else goes to xdg-open, without them; the verb

@@ -7,6 +7,7 @@ namespace zq {
 
 struct TProcessesCalls : TProcessService {
   MOCK_METHOD(std::unique_ptr<TChildProcess>, CreateProcess, (const UnicodeString&, const UnicodeString&), (override));
+  MOCK_METHOD(std::unique_ptr<TChildProcess>, CreateFreeProcess, (const UnicodeString&), (override));
   MOCK_METHOD(bool, ShellExecuteEx, (const TShellExecuteInfo&, std::unique_ptr<TChildProcess>&), (override));
   MOCK_METHOD(
       Integer, ShellExecute, (const UnicodeString&, const UnicodeString&, const UnicodeString&, Integer), (override));
