@@ -54,17 +54,12 @@ TEST(LockByPointer, LivesAsLongAsSomebodyHoldsOrWantsIt) {
     for (int i = 0; i < 2; ++i) ZqThreadLock(Key);
     const auto Waiter = BeginThread([&] {
       EXPECT_EQ(Raised(Key).Pos(u"EAssertionFailed: The lock is another thread's (common/uZqThreads, line "), 1);
-      ZqThreadLock(&Raised);  // another key, which waits for nobody
-      ZqThreadLock(Key);
-      EXPECT_TRUE(Locks.Count(Key) == 1 && Locks.Keys() == 2);
-      ZqThreadUnlock(&Raised);
-      ZqThreadUnlock(Key);
-      return 0;
+      const TZqThreadLockScope Other(&Raised), Wanted(Key);  // the first one waits for nobody
+      return Locks.Count(Key) == 1 && Locks.Keys() == 2;
     });
     while (Locks.Count(Key) < 3) Sleep(1);
     for (int i = 0; i < 2; ++i) ZqThreadUnlock(Key);
-    Waiter->WaitFor();
-    EXPECT_EQ(Locks.Keys(), 0U);
+    EXPECT_TRUE(Waiter->WaitFor() == 1 && Locks.Keys() == 0);
     EXPECT_EQ(Raised(Key).Pos(u"EAssertionFailed: Assertion failure (common/uZqThreads, line "), 1);
   }
 }
@@ -74,9 +69,8 @@ TEST(LockByPointer, KeepsThreadsApartWhileLocksComeAndGo) {
   OnThreads(4, [&](int AThread) {
     for (std::size_t i = 0; i < 35'000; ++i) {
       std::size_t& Mine = Guarded[i * (static_cast<std::size_t>(AThread) + 1) % 7];
-      ZqThreadLock(&Mine);
+      const TZqThreadLockScope Scope(&Mine);
       ++Mine;
-      ZqThreadUnlock(&Mine);
     }
   });
   for (const std::size_t Count : Guarded) EXPECT_EQ(Count, 20'000U);

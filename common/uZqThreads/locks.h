@@ -57,7 +57,19 @@ ZQ_API void ZqThreadLock(const void* AData);
 /// Gives back one ZqThreadLock of this thread. Raises EAssertionFailed where it holds none; nothing changes then.
 ZQ_API void ZqThreadUnlock(const void* AData);
 
-/// The lock of one pointer.
+/// Holds the lock of a pointer for a scope.
+class [[nodiscard]] TZqThreadLockScope {
+ public:
+  explicit TZqThreadLockScope(const void* AData) : FData(AData) { ZqThreadLock(FData); }
+  TZqThreadLockScope(const TZqThreadLockScope&) = delete;
+  TZqThreadLockScope& operator=(const TZqThreadLockScope&) = delete;
+  ~TZqThreadLockScope() { ZqThreadUnlock(FData); }
+
+ private:
+  const void* FData;
+};
+
+/// The lock of one pointer, as the table has it.
 using TZqDataCriticalSection = TKeyedLock;
 
 namespace uZqThreads {

@@ -14,9 +14,10 @@ int main() {
   if (Section.Lock(Taken, 50)) ++Stock;
   Section.Unlock(Taken);
 
-  ZqThreadLock(&Stock);
-  ++Stock;
-  ZqThreadUnlock(&Stock);
+  {
+    const TZqThreadLockScope Scope(&Stock);
+    ++Stock;
+  }
 
   const IntfRef<IZqSimpleEvent> Done = New<TZqSimpleEvent>();
   const TThreadHandle Worker = BeginThread([Done] {
