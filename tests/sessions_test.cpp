@@ -1,11 +1,9 @@
 #include <dlfcn.h>
 #include <poll.h>
-#include <spawn.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <atomic>
-#include <csignal>
+#include <cstdlib>
 #include <mutex>
 #include <thread>
 
@@ -21,7 +19,7 @@ namespace {
 constexpr const char* cManager = "org.freedesktop.login1.Manager";
 constexpr const char* cManagerPath = "/org/freedesktop/login1";
 constexpr const char* cSession = "org.freedesktop.login1.Session";
-const std::string cSessions = "/org/freedesktop/login1/session/";
+constexpr const char* cProperties = "org.freedesktop.DBus.Properties";
 
 /// Until it holds or ten seconds are over; the thread's loop runs meanwhile.
 bool Soon(const std::function<bool()>& ACondition) {
@@ -33,62 +31,57 @@ bool Soon(const std::function<bool()>& ACondition) {
 class TBusDaemon {
  public:
   TBusDaemon() {
-    FFolder.Write("bus.conf", "<busconfig><type>system</type><listen>" + FAddress +
-                                  "</listen><auth>EXTERNAL</auth><policy context=\"default\"><allow own=\"*\"/>"
-                                  "<allow send_type=\"*\"/><allow receive_type=\"*\"/></policy></busconfig>");
+    const std::string Folder = FFolder.Path().string();
+    FFolder.Write("bus.conf", "<busconfig><listen>" + Address + "</listen><pidfile>" + Folder +
+                                  "/pid</pidfile><fork/><auth>EXTERNAL</auth><policy context=\"default\">"
+                                  "<allow own=\"*\"/><allow send_type=\"*\"/><allow receive_type=\"*\"/></policy>"
+                                  "</busconfig>");
     Begin();
   }
   ~TBusDaemon() { End(); }
-  void Begin() {
-    const std::string Config = "--config-file=" + (FFolder.Path() / "bus.conf").string();
-    const char* const Arguments[] = {"dbus-daemon", Config.c_str(), "--nofork", "--nopidfile", nullptr};
-    EXPECT_EQ(::posix_spawnp(&FProcess, "dbus-daemon", nullptr, nullptr, const_cast<char**>(Arguments), ::environ), 0);
-    EXPECT_TRUE(Soon([&] { return std::filesystem::exists(FFolder.Path() / "socket"); }));
+  void Begin() const { Run("dbus-daemon --config-file=bus.conf"); }
+  void End() const { Run("kill -9 $(cat pid) && rm -f pid socket"); }
+  void Run(const std::string& ACommand) const {
+    EXPECT_EQ(std::system(("cd " + FFolder.Path().string() + " && " + ACommand).c_str()), 0);
   }
-  void End() {
-    ::kill(FProcess, SIGKILL);
-    ::waitpid(FProcess, nullptr, 0);
-    std::filesystem::remove(FFolder.Path() / "socket");
-  }
-  [[nodiscard]] const std::string& Address() const { return FAddress; }
 
  private:
   const TTempFolder FFolder;
-  const std::string FAddress = "unix:path=" + (FFolder.Path() / "socket").string();
-  pid_t FProcess = 0;
-  const TEnvironmentScope FVariable{"DBUS_SYSTEM_BUS_ADDRESS", FAddress};
+
+ public:
+  const std::string Address = "unix:path=" + (FFolder.Path() / "socket").string();
+
+ private:
+  const TEnvironmentScope FVariable{"DBUS_SYSTEM_BUS_ADDRESS", Address};
 };
 
-/// The login manager of that bus, on a thread of its own. Session "5" is somebody's at a distance, "6" and those with a
-/// "c" are greeters, all others are somebody's here.
+/// The login manager of that bus, on a thread of its own. It lists one session at first. Session "5" is somebody's at a
+/// distance, "6" and those with a "c" are greeters, all others are somebody's here.
 class TLoginManagerMock {
  public:
-  explicit TLoginManagerMock(std::vector<std::string> ASessions = {"1"}) : FSessions(std::move(ASessions)) {
-    FThread = std::thread([this] { Run(); });
-    EXPECT_TRUE(Soon([&] { return FOwnsName.load(); }));
+  explicit TLoginManagerMock(std::string ASession) : FSession(std::move(ASession)) {
+    EXPECT_GE(FLibrary.sd_bus_open_system(&FBus), 0);
+    Function<int(sd_bus*, const char*, std::uint64_t)>("sd_bus_request_name")(FBus, "org.freedesktop.login1", 0);
+    FThread = std::thread([this] {
+      while (!FStops) Serve();
+    });
   }
   ~TLoginManagerMock() {
     FStops = true;
     FThread.join();
+    FLibrary.sd_bus_flush_close_unref(FBus);
     ::close(FDelay);
   }
-  template <class... TArgs>
-  void Emit(const std::string& APath, const char* AInterface, const char* AMember, const char* ATypes, TArgs... AArgs) {
-    const std::lock_guard Guard(FLock);
-    FToDo.push_back([=, this] { FEmit(FBus, APath.c_str(), AInterface, AMember, ATypes, Plain(AArgs)...); });
-  }
-  void Session(const std::string& AName, const char* ASignal) {
-    Emit(cSessions + Escaped(AName), cSession, ASignal, "");
-  }
+  void Session(const std::string& AName, const char* ASignal) { Emit(PathOf(AName), cSession, ASignal, ""); }
   void Property(const std::string& AName, const char* AProperty, bool AValue) {
-    Emit(cSessions + Escaped(AName), "org.freedesktop.DBus.Properties", "PropertiesChanged", "sa{sv}as", cSession, 2,
-        "Idle", "s", "?", AProperty, "b", int{AValue}, 0);
+    Emit(PathOf(AName), cProperties, "PropertiesChanged", "sa{sv}as", cSession, 2, "Idle", "s", "?", AProperty, "b",
+        int{AValue}, 0);
   }
   void List(const std::string& AName, const char* ASignal) {
-    Emit(cManagerPath, cManager, ASignal, "so", AName, cSessions + Escaped(AName));
+    Emit(cManagerPath, cManager, ASignal, "so", AName.c_str(), PathOf(AName).c_str());
   }
   void Comes(const char* AWhat, bool AComes) { Emit(cManagerPath, cManager, AWhat, "b", int{AComes}); }
-  /// Who has asked for a delay, how often, and whether the last one is held.
+  /// How often a delay was asked for, whether the last one is held, and by whom.
   [[nodiscard]] int Delays() const { return FDelays; }
   [[nodiscard]] bool IsHeld() const {
     pollfd Pipe{FDelay, 0, 0};
@@ -97,44 +90,33 @@ class TLoginManagerMock {
   [[nodiscard]] const std::string& Client() const { return FClient; }
 
  private:
+  static std::string PathOf(const std::string& AName) {
+    return "/org/freedesktop/login1/session/" + (AName[0] > '9' ? AName : "_3" + AName);
+  }
   template <class TFunction>
-  static TFunction* Find(const char* AName) {
+  static TFunction* Function(const char* AName) {
     return reinterpret_cast<TFunction*>(::dlsym(::dlopen("libsystemd.so.0", RTLD_NOW), AName));
   }
-
-  static const char* Plain(const std::string& AText) { return AText.c_str(); }
-  template <class T>
-  static T Plain(T AValue) {
-    return AValue;
-  }
-
-  void Run() {
-    EXPECT_GE(FLibrary.sd_bus_open_system(&FBus), 0);
-    FOwnsName =
-        Find<int(sd_bus*, const char*, std::uint64_t)>("sd_bus_request_name")(FBus, "org.freedesktop.login1", 0) >= 0;
-    while (!FStops) {
-      sd_bus_message* Message = nullptr;
-      const int Result = FLibrary.sd_bus_process(FBus, &Message);
-      if (Message != nullptr) Answer(Message);
-      FLibrary.sd_bus_message_unref(Message);
-      for (const auto& Each : TakeToDo()) Each();
-      if (Result == 0) FWait(FBus, 1000);
-      if (Result < 0) std::this_thread::sleep_for(std::chrono::milliseconds(1));
-    }
-    FLibrary.sd_bus_flush_close_unref(FBus);
-  }
-  std::vector<std::function<void()>> TakeToDo() {
+  template <class... TArgs>
+  void Emit(const std::string& APath, TArgs... AArgs) {
     const std::lock_guard Guard(FLock);
-    return std::exchange(FToDo, {});
+    FEmit(FBus, APath.c_str(), AArgs...);
+  }
+  void Serve() {
+    pollfd Bus{FLibrary.sd_bus_get_fd(FBus), POLLIN, 0};
+    ::poll(&Bus, 1, 1);
+    const std::lock_guard Guard(FLock);
+    for (sd_bus_message* Message = nullptr; FLibrary.sd_bus_process(FBus, &Message) > 0;) {
+      if (Message != nullptr) Answer(Message);
+      FLibrary.sd_bus_message_unref(std::exchange(Message, nullptr));
+    }
   }
   void Answer(sd_bus_message* AMessage) {
     const std::string Path = FLibrary.sd_bus_message_get_path(AMessage);
     const char *Interface = nullptr, *Property = nullptr;
-    if (FIsCall(AMessage, cManager, "ListSessions") > 0) {
-      const std::string First = cSessions + Escaped(FSessions.front()), Last = cSessions + Escaped(FSessions.back());
-      FReply(AMessage, "a(susso)", 2, FSessions.front().c_str(), 1000, "joe", "seat0", First.c_str(),
-          FSessions.back().c_str(), 1000, "joe", "seat0", Last.c_str());
-    } else if (FIsCall(AMessage, cManager, "Inhibit") > 0) {
+    if (FIsCall(AMessage, cManager, "ListSessions") > 0)
+      FReply(AMessage, "a(susso)", 1, FSession.c_str(), 1000, "joe", "seat0", PathOf(FSession).c_str());
+    if (FIsCall(AMessage, cManager, "Inhibit") > 0) {
       int Pipe[2];
       ::close(FDelay);
       EXPECT_EQ(::pipe(Pipe), 0);
@@ -143,35 +125,34 @@ class TLoginManagerMock {
       FReply(AMessage, "h", Pipe[1]);
       ::close(Pipe[1]);
       ++FDelays;
-    } else if (FIsCall(AMessage, "org.freedesktop.DBus.Properties", "Get") > 0) {
+    }
+    if (FIsCall(AMessage, cProperties, "Get") > 0) {
       FLibrary.sd_bus_message_read(AMessage, "ss", &Interface, &Property);
+      const bool Greets = Path.ends_with("/_36") || Path.find("/c") != Path.npos;
       if (std::string_view(Property) == "Remote") FReply(AMessage, "v", "b", Path.ends_with("/_35"));
-      else FReply(AMessage, "v", "s", Path.ends_with("/_36") || Path.find("/c") != Path.npos ? "greeter" : "user");
+      else FReply(AMessage, "v", "s", Greets ? "greeter" : "user");
     }
   }
-  static std::string Escaped(const std::string& AName) { return AName[0] > '9' ? AName : "_3" + AName; }
 
+  using TEmit = int(sd_bus*, const char*, const char*, const char*, const char*, ...);
+  using TReply = int(sd_bus_message*, const char*, ...);
+  using TIsCall = int(sd_bus_message*, const char*, const char*);
+  TEmit* const FEmit = Function<TEmit>("sd_bus_emit_signal");
+  TReply* const FReply = Function<TReply>("sd_bus_reply_method_return");
+  TIsCall* const FIsCall = Function<TIsCall>("sd_bus_message_is_method_call");
   const TBusLibrary& FLibrary = *TBusLibrary::Get();
-  int (*const FEmit)(sd_bus*, const char*, const char*, const char*, const char*,
-      ...) = Find<int(sd_bus*, const char*, const char*, const char*, const char*, ...)>("sd_bus_emit_signal");
-  int (*const FReply)(sd_bus_message*, const char*, ...) = Find<int(sd_bus_message*, const char*, ...)>(
-      "sd_bus_reply_method_return");
-  int (*const FIsCall)(sd_bus_message*, const char*,
-      const char*) = Find<int(sd_bus_message*, const char*, const char*)>("sd_bus_message_is_method_call");
-  int (*const FWait)(sd_bus*, std::uint64_t) = Find<int(sd_bus*, std::uint64_t)>("sd_bus_wait");
-  sd_bus* FBus = nullptr;
-  const std::vector<std::string> FSessions;
-  std::atomic<bool> FStops = false, FOwnsName = false;
-  std::atomic<int> FDelays = 0, FDelay = -1;  // the pipe's end that hears when the other is closed
-  std::string FClient;
+  const std::string FSession;
   std::mutex FLock;
-  std::vector<std::function<void()>> FToDo;  // guarded by FLock
+  sd_bus* FBus = nullptr;  // guarded by FLock
+  std::atomic<bool> FStops = false;
+  std::atomic<int> FDelays = 0, FDelay = -1;  // the end of a pipe that hears when the other one is closed
+  std::string FClient;
   std::thread FThread;
 };
 
 struct SystemBus : testing::Test {
   TBusDaemon Daemon;
-  std::optional<TLoginManagerMock> Mock{std::in_place};
+  std::optional<TLoginManagerMock> Mock{"1"};
   UnicodeString Log;
   TOwned<TZqSessionEvents> Events{New<TZqSessionEvents>(nullptr)};
   int Marks = 0;
@@ -269,9 +250,8 @@ TEST_F(SystemBus, TellsOfTheEnd) {
 
 TEST_F(SystemBus, HearsNobodyButTheLoginManager) {
   Events->SetActive(true);
-  const std::string Forged = "dbus-send --bus=" + Daemon.Address() + " --dest=" + Mock->Client() + ' ' + cManagerPath +
-                             ' ' + cManager + ".PrepareForSleep boolean:true";
-  ASSERT_EQ(std::system(Forged.c_str()), 0);
+  Daemon.Run("dbus-send --bus=" + Daemon.Address + " --dest=" + Mock->Client() + ' ' + cManagerPath + ' ' + cManager +
+             ".PrepareForSleep boolean:true");
   EXPECT_EQ(Heard(), u"");
 }
 
@@ -281,7 +261,7 @@ TEST_F(SystemBus, IsHeardAgainWhenItComesBack) {
   Daemon.End();
   ProcessMessages(100);
   Daemon.Begin();
-  Mock.emplace(std::vector<std::string>{"8"});
+  Mock.emplace("8");
   EXPECT_TRUE(Soon([&] { return Mock->Delays() == 1; }));
   EXPECT_EQ(Heard(), u"OnSessionCreate 8OnSessionLogon 8OnSessionLogoff 1OnSessionTerminate 1");
 }
@@ -295,21 +275,16 @@ TEST_F(SystemBus, RefusesWhereThereIsNone) {
   EXPECT_FALSE(ProcessMessages(10) || Events->Active());
 }
 
-TEST_F(SystemBus, WindowsOfOtherThreadsMayBeRegistered) {
+TEST_F(SystemBus, TellsWindowsThatOtherThreadsRegister) {
   const HWND Window = AllocateHWnd([&](HWND, Cardinal AMessage, NativeUInt AWParam, NativeInt ALParam) {
-    Log += IntToStr(static_cast<Int64>(AMessage + AWParam)) + u" " + IntToStr(static_cast<Int64>(ALParam));
+    Log += IntToStr(AMessage + static_cast<Int64>(AWParam) + ALParam);
     return 0;
   });
-  std::atomic<bool> Registered = false;
-  std::thread Other([&] {
-    WTSRegisterSessionNotification(Window, nsAllSessions);
-    Registered = true;
-  });
-  EXPECT_TRUE(Soon([&] { return Registered.load(); }));
+  std::thread Other([&] { WTSRegisterSessionNotification(Window, nsAllSessions); });
+  EXPECT_TRUE(Soon([&] { return Mock->Delays() == 1; }));
   Other.join();
   Mock->Session("1", "Lock");
-  EXPECT_TRUE(Soon([&] { return !Log.IsEmpty(); }));
-  EXPECT_EQ(Log, u"696 1");
+  EXPECT_TRUE(Soon([&] { return Log == u"697"; }));
   WTSUnRegisterSessionNotification(Window);
   DestroyWindow(Window);
 }

@@ -107,28 +107,21 @@ TEST(SessionRegistration, IsMadeOnceAndUndoneOnce) {
   EXPECT_FALSE(IsWindow(Window));
 }
 
-TEST(SessionRegistration, RefusedLeavesNothing) {
-  struct TCase {
-    bool Loads, Has;
-    const char16_t* Raised;
-  };
-  for (const TCase& Case : {TCase{false, false, u"Exception: Failed to load the Wtsapi32.dll!"},
-           TCase{true, false, u"Exception: Failed to locate the WTSRegisterSessionNotification function!"},
-           TCase{true, true, u"EOSError: System Error.  Code: 5"}}) {
-    TScriptedSessions System;
-    HWND Window = 0;
-    EXPECT_CALL(System, StartSystemMessages(_)).WillOnce(testing::SaveArg<0>(&Window));
-    EXPECT_CALL(System, LoadLibrary).WillOnce(Return(Case.Loads));
-    if (Case.Loads) EXPECT_CALL(System, GetProcAddress(_)).WillOnce(Return(Case.Has));
-    if (Case.Has)
-      EXPECT_CALL(System, WTSRegisterSessionNotification(_, 0)).WillOnce([](HWND, Cardinal) {
-        SetLastError(5);
-        return false;
-      });
-    EXPECT_CALL(System, FreeLibrary).Times(Case.Loads ? 1 : 0);
-    EXPECT_CALL(System, StopSystemMessages(_));
-    const TOwned<TZqSessionEvents> Events(New<TZqSessionEvents>(nullptr));
-    EXPECT_EQ(RaisedBy([&] { Events->SetActive(true); }), Case.Raised);
+TEST_F(TSessionEvents, AreRefusedInTheToldWords) {
+  EXPECT_CALL(System, LoadLibrary).WillOnce(Return(false)).WillRepeatedly(Return(true));
+  EXPECT_CALL(System, GetProcAddress(Named(cRegister))).WillOnce(Return(false)).WillRepeatedly(Return(true));
+  EXPECT_CALL(System, FreeLibrary).Times(2);
+  EXPECT_CALL(System, WTSRegisterSessionNotification(_, 0)).WillOnce([](HWND, Cardinal) {
+    SetLastError(5);
+    return false;
+  });
+  HWND Window = 0;
+  EXPECT_CALL(System, StartSystemMessages(_)).WillRepeatedly(testing::SaveArg<0>(&Window));
+  EXPECT_CALL(System, StopSystemMessages(testing::Eq(testing::ByRef(Window)))).Times(3);
+  for (const char16_t* const Words : {u"Exception: Failed to load the Wtsapi32.dll!",
+           u"Exception: Failed to locate the WTSRegisterSessionNotification function!",
+           u"EOSError: System Error.  Code: 5"}) {
+    EXPECT_EQ(RaisedBy([&] { Events->SetActive(true); }), Words);
     EXPECT_FALSE(Events->Active() || IsWindow(Window));
   }
 }
