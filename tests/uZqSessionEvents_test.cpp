@@ -3,8 +3,8 @@
 #include "runtime/sync/critical_section.h"
 #include "runtime/sync/message_window.h"
 #include "runtime/text/numbers.h"
+#include "runtime/values/values.h"
 #include "tests/fakes/sessions.h"
-#include "tests/support/session_log.h"
 
 namespace zq {
 namespace {
@@ -34,6 +34,22 @@ class TWillingSessions : public testing::NiceMock<TSessionsCalls> {
  private:
   const TPlatformOverride<TSessionService> FSeat{*this};
 };
+
+/// Gives each published callback of AEvents, but for those of the end, one that writes its name and what it was told.
+void Listen(TZqSessionEvents* AEvents, UnicodeString& ALog) {
+  for (const PPropInfo Property : GetPropList(AEvents)) {
+    const auto Tell = [&ALog, AEvents, Property](TObject* ASender, const UnicodeString& AMore) {
+      EXPECT_EQ(ASender, AEvents);
+      ALog += Property->Name + AMore;
+    };
+    if (Property->PropType == TypeInfo<TZqSessionEvent>())
+      Property->SetValue(AEvents, TValue::From(TZqSessionEvent([Tell](TObject* ASender, NativeUInt AID) {
+        Tell(ASender, u" " + IntToStr(static_cast<Int64>(AID)));
+      })));
+    if (Property->PropType == TypeInfo<TNotifyEvent>())
+      Property->SetValue(AEvents, TValue::From(TNotifyEvent([Tell](TObject* ASender) { Tell(ASender, u""); })));
+  }
+}
 
 struct TSessionEvents : testing::Test {
   TWillingSessions System;

@@ -55,6 +55,8 @@ TLoginManager::~TLoginManager() {
   Close();
 }
 
+TLoginManager::TDelay::~TDelay() { ::close(Lock); }
+
 // ---- The connection ------------------------------------------------------------------------------------------------
 
 // Null with FFailure where that fails.
@@ -120,12 +122,13 @@ int TLoginManager::ReadSessions() {
 
 // It is refused to some, who then hear all the same, but may be late.
 void TLoginManager::TakeDelay() {
+  if (FDelay != nullptr) return;
   const TMessage Reply = Call(cManager, "Inhibit", "ssss", "sleep:shutdown", program_invocation_short_name,
       "Is told before the system sleeps or ends", "delay");
   int Lock = -1;
   if (Reply == nullptr || FLibrary->sd_bus_message_read(Reply.get(), "h", &Lock) <= 0) return;
   Lock = ::fcntl(Lock, F_DUPFD_CLOEXEC, STDERR_FILENO + 1);  // the other one is the message's
-  if (Lock >= 0) FDelay = std::shared_ptr<void>(nullptr, [Lock](void*) { ::close(Lock); });
+  if (Lock >= 0) FDelay = std::make_shared<const TDelay>(Lock);
 }
 
 // A call behind those of the listener has it from now on. It may be late: the login manager doesn't wait for ever.

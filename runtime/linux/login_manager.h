@@ -49,6 +49,14 @@ class TLoginManager {
     void operator()(sd_bus_message* AMessage) const noexcept { TBusLibrary::Get()->sd_bus_message_unref(AMessage); }
   };
   using TMessage = std::unique_ptr<sd_bus_message, TUnref>;
+  // Holds up sleep and end as long as it lives.
+  struct TDelay {
+    explicit TDelay(int ALock) noexcept : Lock(ALock) {}
+    TDelay(const TDelay&) = delete;
+    TDelay& operator=(const TDelay&) = delete;
+    ~TDelay();
+    const int Lock;
+  };
   struct TPlace {
     const char *Destination, *Path, *Interface;
   };
@@ -77,9 +85,9 @@ class TLoginManager {
   TListener& FListener;
   const TThreadQueueRef FQueue = TThreadQueue::Current();
   const TBusLibrary* FLibrary = nullptr;
-  sd_bus* FBus = nullptr;             // null while there is no connection
-  int FDescriptor = -1;               // the connection's
-  std::shared_ptr<void> FDelay;       // whoever has it holds up sleep and end
+  sd_bus* FBus = nullptr;  // null while there is no connection
+  int FDescriptor = -1;    // the connection's
+  std::shared_ptr<const TDelay> FDelay;
   int FFailure = 0;                   // errno of the last call
   TThreadQueue::TTimerID FRetry = 0;  // 0: the bus has not gone
   bool FKnowsSessions = false;
