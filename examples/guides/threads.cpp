@@ -1,7 +1,27 @@
+#include <atomic>
+#include <cstdio>
+
 #include "common/uZqThreads.h"
-#include "runtime/sync/thread.h"
+#include "runtime/sync/message_window.h"
 
 using namespace zq;
+
+namespace {
+
+class TCounter : public TZqThread {
+ public:
+  TCounter() : TZqThread(false) { SetFreeOnTerminate(false); }
+  std::atomic<int> Count = 0;
+
+ protected:
+  ~TCounter() override = default;
+  void Execute(TZqThreadAction& AAction) override {
+    AAction = ++Count < 3 ? taRunAgain : taTerminate;
+    Sleep(1);
+  }
+};
+
+}  // namespace
 
 int main() {
   TZqCriticalSection Section;
@@ -26,5 +46,24 @@ int main() {
   });
   const bool Signaled = Done->WaitFor(10000) == wrSignaled;
 
-  return Signaled && Worker->WaitFor() == 0 && Stock == 8 && !Taken ? 0 : 1;
+  TZqThreadManager* const Manager = ZqThreadManager();
+  Manager->SetOnThreadError(
+      [](TZqThread* AThread) { std::printf("%s\n", AThread->FatalException().Message().ToUTF8().c_str()); });
+  const TOwned<TCounter> Counter(New<TCounter>());
+  while (!Counter->Terminated()) ProcessMessages(10);
+  Counter->WaitFor();
+
+  std::atomic<bool> Made = false;
+  const IntfRef<IZqSimpleEvent> Ready = ZqRunThreaded([&](const auto&) { Made = true; });
+  Ready->WaitFor();
+
+  const auto Step = [](TZqThread*, TZqThreadAction& AAction, Pointer AData) {
+    AAction = ++*static_cast<Integer*>(AData) < 10 ? taRunAgain : taTerminate;
+  };
+  ZqRunThreaded(Step, &Stock);
+  Manager->TerminateAllThreads(false);
+  while (Manager->ThreadCount() > 1) ProcessMessages(10);
+
+  const bool Counted = Counter->Count == 3 && Made;
+  return Signaled && Worker->WaitFor() == 0 && Stock >= 8 && !Taken && Counted ? 0 : 1;
 }
