@@ -54,7 +54,7 @@ const TPackageInfo& GetPackageInfoTable() {
                   TypeInfo<TZqDecodeType>(), TypeInfo<TZqTimeRange>(), TypeInfo<TZqTimeFormat>(),
                   TypeInfo<TZqAutoDestroy>(), TypeInfo<TZqObjectOwnership>(), TypeInfo<TZqBinEncoding>(),
                   TypeInfo<TZqNotificationScope>(), TypeInfo<TZqSessionEventType>(), TypeInfo<TZqPowerEventType>(),
-                  TypeInfo<TZqEndSessionType>()}};
+                  TypeInfo<TZqEndSessionType>(), TypeInfo<TZqThreadAction>(), TypeInfo<TZqThreadState>()}};
   return Table;
 }
 

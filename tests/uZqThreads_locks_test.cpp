@@ -77,14 +77,5 @@ TEST(LockByPointer, KeepsThreadsApartWhileLocksComeAndGo) {
   EXPECT_EQ(uZqThreads::DataLocks().Keys(), 0U);
 }
 
-TEST(LockSimpleEvent, StaysSetUntilItIsReset) {
-  const auto Event = IntfRef<IInterface>(New<TZqSimpleEvent>()).As<IZqSimpleEvent>();
-  EXPECT_EQ(Event->WaitFor(1), wrTimeout);
-  Event->SetEvent();
-  for (const Cardinal Time : {0U, INFINITE}) EXPECT_EQ(Event->WaitFor(Time), wrSignaled);
-  Event->ResetEvent();
-  EXPECT_EQ(Event->WaitFor(0), wrTimeout);
-}
-
 }  // namespace
 }  // namespace zq

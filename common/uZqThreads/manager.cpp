@@ -7,6 +7,7 @@
 
 #include "runtime/platform/session_service.h"
 #include "runtime/sync/message_window.h"
+#include "runtime/values/typeinfo.h"
 
 namespace zq {
 
@@ -74,7 +75,13 @@ void TZqThreadManager::CloseWindow() {
   }
 }
 
-void uZqThreads::StartManagers() { Managers = nullptr; }
+void uZqThreads::StartManagers() {
+  Managers = nullptr;
+  DescribeType<TZqThreadAction>(u"uZqThreads").EnumNames({u"taRunAgain", u"taSuspend", u"taTerminate"});
+  DescribeType<TZqThreadState>(u"uZqThreads")
+      .EnumNames({u"tsCreated", u"tsRunning", u"tsSuspended", u"tsSleeping", u"tsTerminating", u"tsTerminated",
+          u"tsFinished", u"tsError"});
+}
 
 void uZqThreads::StopManagers() {
   while (Managers != nullptr && Managers->Count() != 0) Managers->Items(Managers->Count() - 1)->Free();
