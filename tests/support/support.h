@@ -70,6 +70,13 @@ struct TZoneScope {
   const TEnvironmentScope Variable;
 };
 
+/// ThreadSanitizer hands a signal to its handler only where the thread makes a call that it knows.
+#if defined(__SANITIZE_THREAD__)
+inline constexpr bool cSignalsAreHeldBack = true;
+#else
+inline constexpr bool cSignalsAreHeldBack = false;
+#endif
+
 /// Runs ABody with the numbers below ACount, each on a thread of its own, and waits for their ends.
 void OnThreads(int ACount, const std::function<void(int)>& ABody);
 /// Class and message of what AAction raises, as "EClass: message"; "nothing" if it raises nothing.
