@@ -26,8 +26,10 @@ constexpr Cardinal cLong = 30'000;  // ms that no passing test waits for
 class TSteps : public TZqThread {
  public:
   using TStep = std::function<void(TSteps&, TZqThreadAction&)>;
-  TSteps(TZqThreadManager* AManager, TStep AStep, bool ASuspended = false)
-      : TZqThread(AManager, ASuspended), Step(std::move(AStep)) {}
+  TSteps(TZqThreadManager* AManager, TStep AStep, bool ASuspended = false, bool AFreesItself = true)
+      : TZqThread(AManager, ASuspended), Step(std::move(AStep)) {
+    SetFreeOnTerminate(AFreesItself);
+  }
   using TZqThread::DoQueryEndSession;
   using TZqThread::SetThreadState;
   using TZqThread::Sleep;
@@ -101,8 +103,7 @@ struct TNoted {
 
 // The caller's, and suspended.
 TSteps* Owned(TZqThreadManager* AManager, TSteps::TStep AStep) {
-  auto* const Result = New<TSteps>(AManager, std::move(AStep), true);
-  Result->SetFreeOnTerminate(false);
+  auto* const Result = New<TSteps>(AManager, std::move(AStep), true, false);
   while (Result->ThreadState() != tsSuspended && !Result->Terminated()) ProcessMessages(1);
   return Result;
 }
