@@ -12,4 +12,5 @@ set(CMAKE_FIND_ROOT_PATH_MODE_PACKAGE ONLY)
 set(CMAKE_SHARED_LINKER_FLAGS_INIT -Wl,-rpath-link,${sysroot}/usr/lib/aarch64-linux-gnu)
 set(CMAKE_EXE_LINKER_FLAGS_INIT ${CMAKE_SHARED_LINKER_FLAGS_INIT})
 set(CMAKE_CROSSCOMPILING_EMULATOR qemu-aarch64 -L /usr/aarch64-linux-gnu
-  -E LD_LIBRARY_PATH=${sysroot}/usr/lib/aarch64-linux-gnu -E GCONV_PATH=${sysroot}/usr/lib/aarch64-linux-gnu/gconv)
+  -E LD_LIBRARY_PATH=${sysroot}/usr/lib/aarch64-linux-gnu:${sysroot}/lib/aarch64-linux-gnu
+  -E GCONV_PATH=${sysroot}/usr/lib/aarch64-linux-gnu/gconv)

@@ -2,6 +2,7 @@
 
 #include <cstdint>
 #include <optional>
+#include <utility>
 
 #include "runtime/component/component.h"
 #include "runtime/core/api.h"

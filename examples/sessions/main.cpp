@@ -33,8 +33,8 @@ void Watch(TZqNotificationScope AScope, const UnicodeString& ACommand) {
   };
   const TOwned<TEvents> Events(New<TEvents>(nullptr));
   for (const auto& [Set, Words] : cOfSessions)
-    (*Events.*Set)([&Tell, Words](TObject*, NativeUInt AID) { Tell(Format(u"%s %d", {Words, AID})); });
-  for (const auto& [Set, Words] : cOfPower) (*Events.*Set)([&Tell, Words](TObject*) { Tell(Words); });
+    (*Events.*Set)([&Tell, Words = Words](TObject*, NativeUInt AID) { Tell(Format(u"%s %d", {Words, AID})); });
+  for (const auto& [Set, Words] : cOfPower) (*Events.*Set)([&Tell, Words = Words](TObject*) { Tell(Words); });
   Events->SetOnQueryEndSession([&](TObject*, const TZqEndSessionTypes&, bool&) { Tell(u"end?"); });
   Events->SetOnEndSession([&](TObject*, bool AEnding, const TZqEndSessionTypes&) {
     Tell(AEnding ? u"end" : u"no-end");

@@ -140,6 +140,7 @@ void TLoginManager::Close() noexcept {
   if (FDescriptor >= 0) FQueue->Unwatch(std::exchange(FDescriptor, -1));
   if (FBus != nullptr) FLibrary->sd_bus_flush_close_unref(std::exchange(FBus, nullptr));
   FDelay.reset();
+  for (auto& [Name, Session] : FSessions) Session.Locked.reset();  // it may change unheard
 }
 
 void TLoginManager::Pump() {
