@@ -68,7 +68,9 @@ void TPowerSupply::Hear() {
 
 void TPowerSupply::Look() {
   std::string Now = State();
-  if (std::exchange(FState, std::move(Now)) != FState) FChanged();
+  if (Now == FState) return;
+  FState = std::move(Now);
+  FChanged();
 }
 
 std::string TPowerSupply::State() const {

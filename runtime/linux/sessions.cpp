@@ -1,3 +1,5 @@
+#include <unistd.h>
+
 #include <cerrno>
 #include <charconv>
 #include <memory>
@@ -116,13 +118,23 @@ class TThreadWindows final : TLoginManager::TListener {
   std::optional<TPowerSupply> FPower;
 };
 
+// A forked child leaves its parent's alone: what the two watch is one.
 struct TOfThread {
-  ~TOfThread() { Ended = true; }
+  ~TOfThread() {
+    Ended = true;
+    LeaveToParent();
+  }
   static TOfThread& Get() {
     thread_local TOfThread Result;
+    Result.LeaveToParent();
     return Result;
   }
+  void LeaveToParent() noexcept {
+    const pid_t Now = ::getpid();
+    if (std::exchange(Process, Now) != Now) static_cast<void>(Windows.release());
+  }
   static constinit thread_local bool Ended;  // for what the thread ends behind this
+  pid_t Process = ::getpid();
   std::unique_ptr<TThreadWindows> Windows;
 };
 constinit thread_local bool TOfThread::Ended = false;
@@ -131,15 +143,15 @@ constinit thread_local bool TOfThread::Ended = false;
 template <class TCall>
 bool WithWindows(TCall ACall) {
   if (TOfThread::Ended) return false;
-  auto& Own = TOfThread::Get().Windows;
-  if (Own == nullptr) Own = std::make_unique<TThreadWindows>();
+  auto& Windows = TOfThread::Get().Windows;
+  if (Windows == nullptr) Windows = std::make_unique<TThreadWindows>();
   struct TDone {
     ~TDone() {
       if (Windows->IsDone()) Windows.reset();
     }
     std::unique_ptr<TThreadWindows>& Windows;
-  } const Done{Own};
-  ACall(*Own);
+  } const Done{Windows};
+  ACall(*Windows);
   return true;
 }
 
