@@ -1,6 +1,6 @@
 #pragma once
 
-#include "common/uZqLogAppenders.h"
+#include "common/uZqLogAppenders/base.h"
 
 namespace zq {
 
