@@ -156,9 +156,12 @@ TEST_F(LogDaily, ARollThatFailedAtTheStartIsTriedAgainAfterAMinute) {
 }
 
 TEST_F(LogDaily, AFileOfAnEarlierDayIsRolledAtTheStart) {
+  const TZoneScope Zone("XXX-2");
+  Clock.OfZone = true;
   const std::pair<const char*, const char*> cFiles[] = {
       {"Log started on : 2021-12-01 10:00:00\r\n", "app.2021-12-01.log"},
-      {"2021-02-31 10:00:00 is no date, 2021-02-28 23:59:59 is\r\n", "app.2021-02-28.log"}};
+      {"2021-02-31 10:00:00 is no date, 2021-02-28 23:59:59 is\r\n", "app.2021-02-28.log"},
+      {"<log timeStamp=\"2021-12-19T22:00:00Z\" userName=\"x\">\r\n", "app.2021-12-20.log"}};
   for (const bool Appends : {true, false})
     for (const auto& [Content, Name] : cFiles) {
       Folder.Write("app.log", Content);

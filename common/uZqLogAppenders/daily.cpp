@@ -1,6 +1,8 @@
 #include "common/uZqLogAppenders/daily.h"
 
+#include <algorithm>
 #include <cerrno>
+#include <string>
 
 #include "common/uZqDateTimeUtils.h"
 #include "common/uZqLogAppenders/internal.h"
@@ -21,14 +23,22 @@ constexpr std::size_t cHead = 1024;  // bytes of a file in which its first date 
 
 TDateTime LocalTime(Int64 AUtcMilliseconds) { return UnixMillisecondsToDateTime(LocalMilliseconds(AUtcMilliseconds)); }
 
-// "yyyy-mm-dd hh:mm:ss" at the front of AText.
+// "0" in AShape is any digit.
+bool BeginsWithShape(std::string_view AText, std::string_view AShape) noexcept {
+  if (AText.size() < AShape.size()) return false;
+  return std::equal(AShape.begin(), AShape.end(), AText.begin(),
+      [](char a, char b) { return a == '0' ? IsDigit(static_cast<Byte>(b)) : a == b; });
+}
+
+// The local time that AText begins with: as it stands in the header of a simple layout, or in UTC as in that of XML.
 std::optional<TDateTime> DateAtFront(std::string_view AText) {
-  constexpr std::string_view cShape = "0000-00-00 00:00:00";
-  if (AText.size() < cShape.size()) return {};
-  for (std::size_t i = 0; i < cShape.size(); ++i)
-    if (cShape[i] == '0' ? !IsDigit(static_cast<Byte>(AText[i])) : AText[i] != cShape[i]) return {};
+  constexpr std::string_view cLocal = "0000-00-00 00:00:00", cUtc = "0000-00-00T00:00:00Z";
+  const bool Utc = BeginsWithShape(AText, cUtc);
+  if (!Utc && !BeginsWithShape(AText, cLocal)) return {};
+  std::string Text(AText.substr(0, Utc ? cUtc.size() : cLocal.size()));
+  Text[10] = 'T';
   try {
-    return JoinDateTime(ZqISOStrToDate(FromUTF8(AText.substr(0, 10))), ZqISOStrToTime(FromUTF8(AText.substr(11, 8))));
+    return ZqISOStrToDateTime(FromUTF8(Text));
   } catch (const EConvertError&) {  // digits, but no date
     return {};
   }
