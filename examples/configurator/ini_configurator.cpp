@@ -1,7 +1,9 @@
 #include "ini_configurator.h"
 
 #include <algorithm>
+#include <iterator>
 #include <optional>
+#include <utility>
 
 #include "common/uZqClasses.h"
 #include "common/uZqSysUtils.h"
@@ -98,11 +100,25 @@ UnicodeString SectionOf(const UnicodeString& ALine) {
   return Blank == 0 ? Inner : LowerCase(Inner.Copy(1, Blank)) + Trim(Inner.Copy(Blank, Inner.Length()));
 }
 
+UnicodeString NameIn(const UnicodeString& ASection, std::u16string_view AKind) {
+  return ASection.Copy(static_cast<Integer>(AKind.size()) + 1, ASection.Length());
+}
+
+// Why there can be no such section; empty where it can.
+UnicodeString FaultOf(const UnicodeString& ASection) {
+  const std::u16string_view Section = ASection.View();
+  const UnicodeString Root = Logger()->GetName();
+  const UnicodeString Name = NameIn(ASection, Section.starts_with(cLogger) ? cLogger : cAppender);
+  if (KeysOf(ASection).empty()) return u"no section of a logger or an appender";
+  if (Section.starts_with(cAppender)) return AsIdentifier(Name) ? u"" : u"no identifier: " + Name;
+  return Name == Root || Name.View().starts_with((Root + u".").View()) ? u"" : u"below no root: " + Name;
+}
+
 }  // namespace
 
 // ---- TIniLogConfigurator --------------------------------------------------------------------------------------------
 
-TIniLogConfigurator::TSettings TIniLogConfigurator::Read(std::vector<UnicodeString>& AFaults) const {
+TIniLogConfigurator::TSettings TIniLogConfigurator::Parse(std::vector<UnicodeString>& AFaults) const {
   TZqStringStream File(65001);
   File.LoadFromFile(FFileName);
   TStringList Lines;
@@ -118,7 +134,7 @@ TIniLogConfigurator::TSettings TIniLogConfigurator::Read(std::vector<UnicodeStri
     if (Line.IsEmpty()) continue;
     if (Line[1] == u'[') {
       Section = SectionOf(Line);
-      if (KeysOf(Section).empty()) Fault(u"no section of a logger or an appender");
+      if (const UnicodeString Why = FaultOf(Section); !Why.IsEmpty()) Fault(Why);
       else Result[Section];
       continue;
     }
@@ -133,41 +149,55 @@ TIniLogConfigurator::TSettings TIniLogConfigurator::Read(std::vector<UnicodeStri
     else if (const TValue Value = Known->Read(Text)) Result[Section][Key] = *Value;
     else Fault(Format(u"no value of %s: %s", {Key, Text}));
   }
+  std::erase_if(Result, [](const auto& ASection) { return !FaultOf(ASection.first).IsEmpty(); });
   return Result;
 }
 
-std::vector<UnicodeString> TIniLogConfigurator::Load() {
+std::vector<UnicodeString> TIniLogConfigurator::Read() {
   std::vector<UnicodeString> Faults;
-  const auto Settings = std::make_shared<const TSettings>(Read(Faults));
-  {
-    const std::lock_guard Guard(FLock);
-    FSettings = Settings;
-  }
-  const IntfRef<IZqLogConfigurator> Self(this);
-  std::vector<IntfRef<IZqLogger>> Loggers;
-  for (const auto& [Section, Values] : *Settings) {
-    if (!Section.View().starts_with(cLogger)) continue;
-    const UnicodeString Name = Section.Copy(static_cast<Integer>(cLogger.size()) + 1, Section.Length());
-    const UnicodeString Root = Logger()->GetName();
-    if (Name == Root) Logger()->SetConfig(Self);
-    else if (!Name.View().starts_with((Root + u".").View())) Faults.push_back(FFileName + u": below no root: " + Name);
-    else {
-      Loggers.push_back(Logger()->GetLogger(Name.Copy(Root.Length() + 2, Name.Length())));
-      Loggers.back()->SetConfig(Self);
-    }
-  }
-  FLoggers = std::move(Loggers);
+  const auto Settings = std::make_shared<const TSettings>(Parse(Faults));
+  const std::lock_guard Guard(FLock);
+  FSettings = Settings;
   return Faults;
 }
 
-Variant TIniLogConfigurator::Find(const UnicodeString& ASection, const UnicodeString& AKey, const Variant& ADefault) {
-  std::shared_ptr<const TSettings> Settings;
-  {
-    const std::lock_guard Guard(FLock);
-    Settings = FSettings;
+// Loggers of before are let go of at the end: those that are named again must not end in between.
+void TIniLogConfigurator::Apply() {
+  const IntfRef<IZqLogConfigurator> Self(this);
+  const auto Before = static_cast<std::ptrdiff_t>(FLoggers.size());
+  const Integer Root = Logger()->GetName().Length();
+  const auto Told = Settings();
+  for (const auto& [Section, Values] : *Told) {
+    if (!Section.View().starts_with(cLogger)) continue;
+    const UnicodeString Name = NameIn(Section, cLogger);  // "root", or "root." and a path
+    FLoggers.push_back(Logger()->GetLogger(Name.Copy(Root + 2, Name.Length())));
+    FLoggers.back()->SetConfig(Self);
   }
-  const auto Section = Settings->find(ASection);
-  if (Section == Settings->end()) return ADefault;
+  FLoggers.erase(FLoggers.begin(), FLoggers.begin() + Before);
+}
+
+std::vector<UnicodeString> TIniLogConfigurator::Load() {
+  std::vector<UnicodeString> Faults = Read();
+  Apply();
+  return Faults;
+}
+
+void TIniLogConfigurator::Withdraw() {
+  for (const auto& Logger : std::exchange(FLoggers, {})) {
+    Logger->SetConfig({});
+    Logger->ClearAppenders();
+  }
+}
+
+std::shared_ptr<const TIniLogConfigurator::TSettings> TIniLogConfigurator::Settings() {
+  const std::lock_guard Guard(FLock);
+  return FSettings;
+}
+
+Variant TIniLogConfigurator::Find(const UnicodeString& ASection, const UnicodeString& AKey, const Variant& ADefault) {
+  const auto Told = Settings();
+  const auto Section = Told->find(ASection);
+  if (Section == Told->end()) return ADefault;
   const auto Value = Section->second.find(LowerCase(AKey));
   return Value == Section->second.end() ? ADefault : Value->second;
 }

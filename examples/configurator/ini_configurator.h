@@ -26,10 +26,18 @@ class TIniLogConfigurator : public zq::Implements<zq::TInterfacedObject, zq::IZq
  public:
   explicit TIniLogConfigurator(zq::UnicodeString AFileName) : FFileName(std::move(AFileName)) {}
 
-  /// Reads the file and configures each logger that has a section in it; what the file doesn't name stays as it is.
-  /// Returns what is wrong with it, "file:line: what" for each: such a setting counts as not given. Raises EFOpenError
-  /// where the file can't be read, and keeps the former settings then. One thread at a time.
+  // One thread at a time:
+
+  /// Reads the file. Returns what is wrong with it, "file:line: what" for each: such a setting counts as not given.
+  /// Raises EFOpenError where the file can't be read, and keeps the former settings then.
+  std::vector<zq::UnicodeString> Read();
+  /// Configures each logger that has a section in the file; what that doesn't name stays as it is. Raises what an
+  /// appender or a layout raises.
+  void Apply();
+  /// Both.
   std::vector<zq::UnicodeString> Load();
+  /// Takes the appenders from the loggers that were configured, and lets go of those.
+  void Withdraw();
 
   zq::Variant GetLoggerValue(const zq::UnicodeString& ALoggerName, const zq::UnicodeString& AKey,
       zq::TZqMainTypeKind AKind, const zq::Variant& ADefault) override;
@@ -46,7 +54,8 @@ class TIniLogConfigurator : public zq::Implements<zq::TInterfacedObject, zq::IZq
   using TSection = std::map<zq::UnicodeString, zq::Variant>;
   using TSettings = std::map<zq::UnicodeString, TSection>;
   zq::Variant Find(const zq::UnicodeString& ASection, const zq::UnicodeString& AKey, const zq::Variant& ADefault);
-  [[nodiscard]] TSettings Read(std::vector<zq::UnicodeString>& AFaults) const;
+  [[nodiscard]] TSettings Parse(std::vector<zq::UnicodeString>& AFaults) const;
+  std::shared_ptr<const TSettings> Settings();
 
   const zq::UnicodeString FFileName;
   std::mutex FLock;

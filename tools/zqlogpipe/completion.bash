@@ -13,7 +13,7 @@ _zqlogpipe() {
     --max-size | --backups | --pattern | --logger | --retry) return ;;
   esac
   if [[ $word == -* ]]; then
-    mapfile -t COMPREPLY < <(compgen -W '--file --syslog --max-size --backups --daily --pattern --no-append --logger --level --detect-level
+    mapfile -t COMPREPLY < <(compgen -W '--file --syslog --config --max-size --backups --daily --pattern --no-append --logger --level --detect-level
       --no-time --layout --tee --retry --quiet --version --help' -- "$word")
   else
     compopt -o filenames

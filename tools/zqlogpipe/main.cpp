@@ -7,6 +7,7 @@
 #include <chrono>
 #include <cstdio>
 #include <cstring>
+#include <memory>
 #include <stdexcept>
 #include <string>
 #include <string_view>
@@ -16,6 +17,7 @@
 #include "files.h"
 #include "options.h"
 #include "output.h"
+#include "settings.h"
 #include "signals.h"
 
 namespace {
@@ -80,26 +82,31 @@ class TPipe {
   std::size_t FRead = 0;
 };
 
+std::unique_ptr<TOutput> MakeOutput(const TOptions& AOptions, TComplaints& AComplaints) {
+  if (AOptions.Config.empty()) return std::make_unique<TFilesOutput>(AOptions, AComplaints);
+  return std::make_unique<TSettingsOutput>(AOptions.Config, AOptions.Logger, AComplaints);
+}
+
 int Pipe(const TOptions& AOptions) {
   const auto Begin = std::chrono::steady_clock::now();
   TComplaints Complaints;
   HearSignals();
-  TFilesOutput Output(AOptions, Complaints);
-  TPipe Pipe(AOptions, Output);
+  const auto Output = MakeOutput(AOptions, Complaints);
+  TPipe Pipe(AOptions, *Output);
   for (const std::string& Input : AOptions.Inputs.empty() ? std::vector<std::string>{"-"} : AOptions.Inputs) try {
       if (StopSignal != 0) break;
       Pipe.Run(Input);
     } catch (const std::runtime_error& e) {
       Complaints.Add(e.what());
     }
-  Output.Finish();
-  const TCounts& Counts = Output.Counts();
+  Output->Finish();
+  const TCounts& Counts = Output->Counts();
   if (Counts.Failed != 0)
     Complaints.Add(std::to_string(Counts.Failed) + " lines were not written: " + Counts.Failure.ToUTF8());
   const std::chrono::duration<double> Seconds = std::chrono::steady_clock::now() - Begin;
   if (!AOptions.Quiet)
     std::fprintf(
-        stderr, "zqlogpipe: %zu lines read, %s, %.3f s\n", Pipe.Read(), Output.Summary().c_str(), Seconds.count());
+        stderr, "zqlogpipe: %zu lines read, %s, %.3f s\n", Pipe.Read(), Output->Summary().c_str(), Seconds.count());
   return StopSignal != 0 ? 128 + StopSignal : Complaints.Status();
 }
 
@@ -112,6 +119,9 @@ int main(int ACount, char** AWords) {
     return Options.Help || Options.Version ? 0 : Pipe(Options);
   } catch (const TUsageError& e) {
     std::fprintf(stderr, "zqlogpipe: %s\nTry zqlogpipe --help.\n", e.what());
+    return 2;
+  } catch (const TSettingsFault& e) {
+    for (const std::string& Fault : e.Faults) TComplaints::Tell(Fault);
     return 2;
   } catch (const std::exception& e) {
     std::fprintf(stderr, "zqlogpipe: %s\n", e.what());

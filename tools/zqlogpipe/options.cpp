@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cctype>
 #include <charconv>
+#include <iterator>
 #include <limits>
 #include <utility>
 
@@ -11,7 +12,7 @@
 using namespace zq;
 
 const char cHelp[] =
-    "usage: zqlogpipe --file FILE|--syslog [option...] [INPUT...]\n"
+    "usage: zqlogpipe --file FILE|--syslog|--config FILE [option...] [INPUT...]\n"
     "\n"
     "Logs each line of the INPUT files, or of standard input. INPUT may be - for standard input.\n"
     "\n"
@@ -19,6 +20,8 @@ const char cHelp[] =
     "                    again for a further log file\n"
     "  --syslog[=NAME]   the system's log, too, or alone without --file: the journal, or syslog where there is none,\n"
     "                    from the source NAME (zqlogpipe); an entry is the text of a line, an empty line is none\n"
+    "  --config FILE     loggers and appenders as this file of settings tells, instead of the options about files and\n"
+    "                    their layout; told below\n"
     "  --max-size BYTES  a file that has reached this size is rolled, 0 for never (10M); K, M and G behind the number\n"
     "                    stand for its powers of 1024\n"
     "  --backups COUNT   files of the series, FILE among them, 1 to 65535 (5)\n"
@@ -47,12 +50,35 @@ const char cHelp[] =
     "the\n"
     "files are ended; the exit status is 128 and the signal's number then. At HUP the files are ended and begun again "
     "with\n"
-    "the next line, for who has moved them away.\n"
+    "the next line, for who has moved them away, and the FILE of --config is read again.\n"
     "\n"
     "A line ends at LF, or at the end of its input; it may have any length, and all other bytes are its text. The log "
     "is\n"
     "UTF-8: a byte that is no part of valid UTF-8 is taken as the character of that code (U+0080 to U+00FF), as in\n"
-    "ISO 8859-1. The last line on standard error tells what was done. Exit status: 0, 1 for a failure, 2 for a wrong "
+    "ISO 8859-1.\n"
+    "\n"
+    "The FILE of --config, with ';' before a comment:\n"
+    "\n"
+    "  [logger root.zqlogpipe]        ; the logger of --logger, or one above it, up to root\n"
+    "  Level = info                   ; the least for its appenders: all, trace, debug, info, warn, error, fatal, off\n"
+    "  Additive = no                  ; lines don't go on to the logger above (yes)\n"
+    "  Appenders = lines, system      ; sections of this file\n"
+    "\n"
+    "  [appender lines]\n"
+    "  class = TZqFileAppender        ; or TZqRollingFileAppender, TZqDailyRollingFileAppender\n"
+    "  Layout = TZqSimpleLayout       ; or TZqXmlLayout, best with AppendExisting = no\n"
+    "  FileName = app.log             ; also FileExt, AppendExisting, MaxFileSize, MaxBackupCount, DatePattern\n"
+    "\n"
+    "  [appender system]\n"
+    "  class = TZqEventLogAppender    ; the system's log\n"
+    "  Layout = TZqSimpleLayout\n"
+    "  ServiceName = app              ; the source of its entries\n"
+    "\n"
+    "What is wrong with it is told with its line, and nothing is read then; at HUP the former settings stay. A line "
+    "that\n"
+    "can't be written is lost and counted, by each appender.\n"
+    "\n"
+    "The last line on standard error tells what was done. Exit status: 0, 1 for a failure, 2 for a wrong "
     "use.\n";
 
 namespace {
@@ -118,7 +144,11 @@ bool IsXml(const std::string& ALayout) {
 }  // namespace
 
 TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
+  constexpr std::string_view cOfOutput[] = {"--file", "--syslog", "--max-size", "--backups", "--daily", "--pattern",
+      "--no-append", "--no-time", "--layout", "--retry"};
   TOptions Result;
+  std::string_view OfOutput;  // the first of those
+  bool Configured = false;
   for (std::size_t i = 0; i < AWords.size(); ++i) {
     const std::size_t Equals = AWords[i].starts_with("--") ? AWords[i].find('=') : std::string_view::npos;
     const std::string_view Whole = AWords[i], Word = Whole.substr(0, Equals);
@@ -128,7 +158,9 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
       if (++i == AWords.size()) throw TUsageError(std::string(Word) + " needs a value");
       return std::string(AWords[i]);
     };
-    if (Word == "--file") Result.Files.push_back(Value());
+    if (OfOutput.empty() && std::ranges::find(cOfOutput, Word) != std::end(cOfOutput)) OfOutput = Word;
+    if (Word == "--config") Result.Config = Value(), Configured = true;
+    else if (Word == "--file") Result.Files.push_back(Value());
     else if (Word == "--syslog") Result.Source = Taken ? "zqlogpipe" : Value();
     else if (Word == "--max-size") Result.MaxSize = Bytes(Word, Value());
     else if (Word == "--backups") Result.Backups = Number<zq::Word>(Word, Value(), 1);
@@ -157,11 +189,13 @@ TOptions ParseOptions(const std::vector<std::string_view>& AWords) {
     if (!Taken) throw TUsageError(std::string(Word) + " takes no value");
   }
   const auto IsBlank = [](const std::string& AName) { return Trim(FromUTF8(AName)).IsEmpty(); };
+  if (Configured && !OfOutput.empty()) throw TUsageError(std::string(OfOutput) + " doesn't go with --config");
+  if (Configured && IsBlank(Result.Config)) throw TUsageError("--config needs a name");
   if (std::any_of(Result.Files.begin(), Result.Files.end(), IsBlank)) throw TUsageError("--file needs a name");
   if (Result.Xml && !Result.Time) throw TUsageError("--no-time goes with --layout simple only");
   if (Result.Xml) Result.Append = false;  // two logs in one file are no XML
   if (Result.Source && IsBlank(*Result.Source)) throw TUsageError("--syslog= needs a name");
-  if (Result.Files.empty() && !Result.Source && !Result.Help && !Result.Version)
-    throw TUsageError("--file or --syslog is needed");
+  if (Result.Files.empty() && !Result.Source && !Configured && !Result.Help && !Result.Version)
+    throw TUsageError("--file, --syslog or --config is needed");
   return Result;
 }

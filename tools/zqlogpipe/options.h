@@ -14,6 +14,7 @@ class TUsageError : public std::runtime_error {
 };
 
 struct TOptions {
+  std::string Config;  // a file of settings; empty where the options tell of files and layouts
   std::vector<std::string> Files;
   std::optional<std::string> Source;  // in the system's log
   std::vector<std::string> Inputs;
