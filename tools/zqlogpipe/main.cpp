@@ -38,7 +38,10 @@ class TPipe {
     for (;;) {
       Wait(Handle, -1);
       if (StopSignal != 0) break;
-      if (std::exchange(ReopenSignal, 0) != 0) FOutput.Reopen();
+      if (std::exchange(ReopenSignal, 0) != 0) {
+        FOutput.Reopen();
+        continue;  // a signal that came meanwhile isn't left to wait for input
+      }
       Got = ::read(Handle, Block.data(), Block.size());
       if (Got == 0 || (Got < 0 && errno != EINTR && errno != EAGAIN)) break;
       if (Got > 0) Split(Rest, {Block.data(), static_cast<std::size_t>(Got)});
