@@ -38,12 +38,15 @@ void StayBusy(std::chrono::microseconds ATime) {
 // Seconds that one of ACalls takes, where the caller does something else between two.
 template <class TCall>
 double PerCall(int ACalls, std::chrono::microseconds AIdle, TCall ACall) {
-  double Result = 0;
-  for (int i = 0; i < ACalls; ++i) {
-    if (AIdle.count() != 0) StayBusy(AIdle);
-    Result += Seconds(ACall);
-  }
-  return Result / ACalls;
+  const auto Calls = [&](auto ABefore) {
+    for (int i = 0; i < ACalls; ++i) {
+      ABefore();
+      ACall();
+    }
+  };
+  if (AIdle.count() == 0) return Seconds([&] { Calls([] {}); }) / ACalls;
+  const std::chrono::duration<double> Idle = AIdle;
+  return Seconds([&] { Calls([&] { StayBusy(AIdle); }); }) / ACalls - Idle.count();
 }
 
 // A request and its answer by a mutex and condition variables.
@@ -87,7 +90,8 @@ class TCaller : public TZqThread {
  protected:
   ~TCaller() override = default;
   void Execute(TZqThreadAction&) override {
-    Result = PerCall(FCalls, FIdle, [&] { Synchronize([](Pointer) {}, nullptr); });
+    const TZqSyncMethod Nothing = [](Pointer) {};
+    Result = PerCall(FCalls, FIdle, [&] { Synchronize(Nothing, nullptr); });
   }
 
  private:
@@ -99,9 +103,10 @@ class TCaller : public TZqThread {
 void PairToSynchronize(benchmark::State& AState) {
   const std::chrono::microseconds Idle(AState.range(0));
   const int Calls = Idle.count() == 0 ? 5000 : 500;
-  std::vector<double> Ratios;
+  std::vector<double> Ratios, Pairs;
   for (auto _ : AState) {
     const double Pair = PerPair(Calls, Idle);
+    Pairs.push_back(Pair);
     const TOwned<TZqThreadManager> Manager(New<TZqThreadManager>(nullptr));
     const TOwned<TCaller> Caller(New<TCaller>(Manager.get(), Calls, Idle));
     while (Caller->ThreadState() == tsCreated) std::this_thread::yield();
@@ -110,6 +115,7 @@ void PairToSynchronize(benchmark::State& AState) {
     Ratios.push_back(Pair / Caller->Result);
   }
   AState.counters["ratio"] = Median(Ratios);
+  AState.counters["pair_us"] = 1e6 * Median(Pairs);
 }
 BENCHMARK(PairToSynchronize)->Arg(0)->Arg(200)->Unit(benchmark::kMillisecond)->Iterations(15);
 

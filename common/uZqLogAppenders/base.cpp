@@ -29,11 +29,6 @@ void TZqBaseAppender::Initialize() { FInitialized = true; }
 
 void TZqBaseAppender::Close() { FInitialized = false; }
 
-ZQ_HOT void TZqBaseAppender::Write(
-    const UnicodeString&, const UnicodeString&, TZqLogLevel, const UnicodeString&, PZqDataRec, TZqLogIndent) {
-  if (!FInitialized && FInitializing == 0) Initialize();
-}
-
 void TZqBaseAppender::SetConfig(const IntfRef<IZqLogConfigurator>& AConfig) {
   if (!AConfig) return;
   const UnicodeString Layout = Configured(*AConfig, *this, u"Layout", mtkString, u"", VarToUStr);

@@ -22,8 +22,10 @@ class ZQ_API TZqBaseAppender : public Implements<TZqLogBase, IZqLogAppender, IZq
   /// has registered, and what the conversion of a value raises.
   virtual void SetConfig(const IntfRef<IZqLogConfigurator>& AConfig);
   /// Initialises the appender if need be; a descendant calls it first and then writes.
-  void Write(const UnicodeString& ASender, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
-      const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
+  void Write(const UnicodeString&, const UnicodeString&, TZqLogLevel, const UnicodeString&, PZqDataRec,
+      TZqLogIndent) override {
+    if (!FInitialized && FInitializing == 0) Initialize();
+  }
   void Close() override;
   /// An empty reference takes the layout away.
   void SetLayout(const IntfRef<IZqLogLayout>& ALayout) override;

@@ -182,14 +182,14 @@ void TZqThreadManager::SyncEvent(Integer AMessage, TZqThread* AThread) {
   SendMessage(FHWND, static_cast<Cardinal>(AMessage), reinterpret_cast<NativeUInt>(AThread), 0);
 }
 
-void TZqThreadManager::SyncCall(const std::function<void()>& ACall) {
+void TZqThreadManager::SyncCall(TCallRef ACall) {
   SendMessage(FHWND, cSynchronize, reinterpret_cast<NativeUInt>(&ACall), 0);
 }
 
 NativeInt TZqThreadManager::WindowProc(Cardinal AMessage, NativeUInt AWParam, NativeInt ALParam) {
   if (AMessage == cClose) return DestroyWindow(AWParam) ? 1 : 0;
   if (AMessage == cSynchronize) {
-    (*reinterpret_cast<const std::function<void()>*>(AWParam))();
+    (*reinterpret_cast<const TCallRef*>(AWParam))();
     return 1;
   }
   if (AMessage < cFirstCallback || AMessage >= cFirstCallback + std::size(Callbacks()))

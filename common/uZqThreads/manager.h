@@ -1,7 +1,6 @@
 #pragma once
 
 #include <concepts>
-#include <functional>
 
 #include "common/uZqThreads/managed.h"
 #include "runtime/component/component.h"
@@ -108,7 +107,7 @@ class ZQ_API TZqThreadManager : public TComponent {
   }
   void Call(TField AField, TZqThread* AThread);
   void SyncEvent(Integer AMessage, TZqThread* AThread);
-  void SyncCall(const std::function<void()>& ACall);
+  void SyncCall(TCallRef ACall);
   NativeInt WindowProc(Cardinal AMessage, NativeUInt AWParam, NativeInt ALParam);
   NativeInt SystemMessage(Cardinal AMessage, NativeUInt AWParam, NativeInt ALParam);
   void DoSessionEvent(TZqSessionEventType AEventType, Cardinal ASessionID);

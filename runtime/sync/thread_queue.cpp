@@ -198,13 +198,13 @@ struct TThreadQueue::TSent {
   std::atomic<bool> Over = false;
 };
 
-void TThreadQueue::Send(const TCall& ACall, const void* AOwner, TKind AKind) {
+void TThreadQueue::Send(TCallRef ACall, const void* AOwner, TKind AKind) {
   const TThreadQueueRef Own = Current();
   if (Own.get() == this) return ACall();
   if (Own->FServing >= cMostServing)
     throw ECallRefused(u"The threads %d and %d call each other without end", {Own->FThreadID, FThreadID});
   TSent Sent{Own, this, Own->FSending, Own->FServed};
-  Add({[&] { ACall(); }, AOwner, &Sent}, AKind);
+  Add({ACall, AOwner, &Sent}, AKind);
   Own->WaitForReply(Sent);
   if (Sent.Error) Sent.Error.Raise();
 }

@@ -2,12 +2,14 @@
 
 #include <array>
 #include <atomic>
+#include <concepts>
 #include <deque>
 #include <functional>
 #include <memory>
 #include <mutex>
 #include <optional>
 #include <span>
+#include <type_traits>
 #include <vector>
 
 #include "runtime/core/exceptions.h"
@@ -22,6 +24,23 @@ struct ZQ_API EThread : Exception {
 /// A call to another thread that can't run: the thread has ended, its window is gone, or the calls go in a circle.
 struct ZQ_API ECallRefused : EThread {
   using EThread::EThread;
+};
+
+/// A callable of the caller's, for the time of a call.
+class TCallRef {
+ public:
+  template <class TCallable>
+    requires(std::invocable<TCallable&> && !std::same_as<std::remove_cvref_t<TCallable>, TCallRef>)
+  TCallRef(TCallable&& ACallable)
+  noexcept  // NOLINT(bugprone-forwarding-reference-overload): copies are left alone
+      : FCallable(const_cast<void*>(static_cast<const void*>(std::addressof(ACallable)))), FCall([](void* ACalled) {
+          static_cast<void>((*static_cast<std::remove_reference_t<TCallable>*>(ACalled))());
+        }) {}
+  void operator()() const { FCall(FCallable); }
+
+ private:
+  void* FCallable;
+  void (*FCall)(void*);
 };
 
 class TThreadQueue;
@@ -56,7 +75,7 @@ class ZQ_API TThreadQueue : public std::enable_shared_from_this<TThreadQueue> {
   /// Runs ACall on the thread and returns when it is done; at once where that is the caller. What it raises is raised
   /// here, as the same object. The caller serves calls sent to itself meanwhile. Raises ECallRefused where ACall was
   /// not run, or is under way on a thread that ended within it.
-  void Send(const TCall& ACall, const void* AOwner = nullptr, TKind AKind = TKind::Sent);
+  void Send(TCallRef ACall, const void* AOwner = nullptr, TKind AKind = TKind::Sent);
   /// Calls of AOwner that have not begun: posted ones are dropped, the senders of the others get ECallRefused with
   /// AReason.
   void Drop(const void* AOwner, const UnicodeString& AReason);
@@ -142,16 +161,17 @@ class ZQ_API TThreadQueue : public std::enable_shared_from_this<TThreadQueue> {
   };
 
   const Cardinal FThreadID;
-  TParker FParker;
-  mutable std::mutex FLock;  // innermost but for the parker
+  // What senders touch stands together, apart from what the thread looks at while it is awake and waits.
+  alignas(64) mutable std::mutex FLock;  // innermost but for the parker
   // Guarded by FLock:
-  std::array<std::deque<TEntry>, cKinds> FEntries;
-  std::atomic<UInt64> FLastNumber = 0;  // written under it
+  std::atomic<UInt64> FLastNumber = 0;             // written under it
+  std::atomic<std::size_t> FWaiting[cKinds] = {};  // sizes of FEntries, written under it
   bool FEnded = false;
   bool FTold = false;  // FHostEvent was signalled for what waits
   int FHostEvent = -1;
-  TSimpleEvent FSyncEvent;                         // set exactly while there are such entries
-  std::atomic<std::size_t> FWaiting[cKinds] = {};  // sizes of FEntries
+  std::array<std::deque<TEntry>, cKinds> FEntries;
+  TSimpleEvent FSyncEvent;  // set exactly while there are such entries
+  alignas(64) TParker FParker;
   // The thread's own:
   std::unique_ptr<TDescriptors> FDescriptors;
   std::optional<Integer> FQuit;
