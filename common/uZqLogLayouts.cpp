@@ -25,11 +25,7 @@ void AppendUtf8(UnicodeString& ALine, std::string_view AText) { ALine.Append(Fro
 }  // namespace
 
 bool TZqSimpleLayout::GetInterface(const TGUID& AIID, void** AObj) {
-  if (AIID != IZqLogByteLayout::IID || ClassType() != ClassOf<TZqSimpleLayout>())
-    return Implements::GetInterface(AIID, AObj);
-  *AObj = static_cast<IZqLogByteLayout*>(&FByteLayout);
-  _AddRef();
-  return true;
+  return FByteLayout.Answers(AIID, AObj) || Implements::GetInterface(AIID, AObj);
 }
 
 UnicodeString TZqSimpleLayout::GetHeader() { return u"Log started on : " + NowText(); }
@@ -78,11 +74,6 @@ ZQ_HOT void TZqSimpleLayout::Compose(TLine& ALine, const UnicodeString& ALoggerN
 ZQ_HOT void TZqSimpleLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   Compose(ALine, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
-}
-
-ZQ_HOT void TZqSimpleLayout::TByteLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName,
-    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
-  Layout.Compose(ALine, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
 }
 
 UnicodeString TZqSimpleLayout::FormatLine(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,

@@ -4,6 +4,7 @@
 #include <string>
 #include <string_view>
 
+#include "common/uZqLogLayouts/byte_layout.h"
 #include "common/uZqLogLayouts/time_text.h"
 #include "common/uZqLogLayouts/xml.h"
 #include "common/uZqLogger.h"
@@ -33,17 +34,6 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
   ~TZqSimpleLayout() override = default;
 
  private:
-  // An object of its own, so that no descendant's AppendLine can be overlooked and none of this class taken for one.
-  struct TByteLayout final : IZqLogByteLayout {
-    explicit TByteLayout(TZqSimpleLayout& ALayout) noexcept : Layout(ALayout) {}
-    HRESULT QueryInterface(const TGUID& AIID, void** AObj) override { return Layout.QueryInterface(AIID, AObj); }
-    Integer _AddRef() override { return Layout._AddRef(); }
-    Integer _Release() override { return Layout._Release(); }
-    void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
-        const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
-    TZqSimpleLayout& Layout;
-  };
-
   static std::string TimeText(Int64 ASecond);
   void ChangeIndent(TZqLogIndent ALogIndent);
   std::string_view Front(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel);
@@ -52,7 +42,7 @@ class ZQ_API TZqSimpleLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqL
   void Compose(TLine& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, const UnicodeString& ALogMessage,
       PZqDataRec AValue, TZqLogIndent ALogIndent);
 
-  TByteLayout FByteLayout{*this};
+  TZqByteLayoutOf<TZqSimpleLayout> FByteLayout{*this};
   UnicodeString FIndent;
   // How the last line began, in UTF-8: "yyyy-mm-dd hh:mm:ss:zzz - Level logger - ", and what that was made from.
   std::string FFront;

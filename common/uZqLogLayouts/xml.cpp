@@ -263,11 +263,7 @@ UnicodeString EscapeXml(const UnicodeString& AValue) {
 // ---------------------------------------------------------------------------------------- TZqXmlLayout
 
 bool TZqXmlLayout::GetInterface(const TGUID& AIID, void** AObj) {
-  if (AIID != IZqLogByteLayout::IID || ClassType() != ClassOf<TZqXmlLayout>())
-    return Implements::GetInterface(AIID, AObj);
-  *AObj = static_cast<IZqLogByteLayout*>(&FByteLayout);
-  _AddRef();
-  return true;
+  return FByteLayout.Answers(AIID, AObj) || Implements::GetInterface(AIID, AObj);
 }
 
 void TZqXmlLayout::Initialize(TZqLogBase* ALogBase) {
@@ -342,11 +338,6 @@ void TZqXmlLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALogger
     const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
   ALine.AppendBytes(Front(ALoggerName, ALogLevel, ALogIndent));
   AppendRest(ALine, ALogMessage, AValue);
-}
-
-void TZqXmlLayout::TByteLayout::AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName,
-    TZqLogLevel ALogLevel, const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) {
-  Layout.AppendLine(ALine, ALoggerName, ALogLevel, ALogMessage, AValue, ALogIndent);
 }
 
 }  // namespace zq

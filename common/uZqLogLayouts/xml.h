@@ -2,6 +2,7 @@
 
 #include <limits>
 
+#include "common/uZqLogLayouts/byte_layout.h"
 #include "common/uZqLogLayouts/time_text.h"
 #include "common/uZqLogger.h"
 #include "runtime/core/utf8.h"
@@ -43,24 +44,13 @@ class ZQ_API TZqXmlLayout : public Implements<TZqLogBase, _IZqLogLayout, IZqLogL
   ~TZqXmlLayout() override = default;
 
  private:
-  // An object of its own, so that no descendant's AppendLine can be overlooked and none of this class taken for one.
-  struct TByteLayout final : IZqLogByteLayout {
-    explicit TByteLayout(TZqXmlLayout& ALayout) noexcept : Layout(ALayout) {}
-    HRESULT QueryInterface(const TGUID& AIID, void** AObj) override { return Layout.QueryInterface(AIID, AObj); }
-    Integer _AddRef() override { return Layout._AddRef(); }
-    Integer _Release() override { return Layout._Release(); }
-    void AppendLine(utf8::TBuffer& ALine, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
-        const UnicodeString& ALogMessage, PZqDataRec AValue, TZqLogIndent ALogIndent) override;
-    TZqXmlLayout& Layout;
-  };
-
   static std::string TimeText(Int64 ASecond);
   void WriteStylesheet() const;
   std::string_view Front(const UnicodeString& ALoggerName, TZqLogLevel ALogLevel, TZqLogIndent ALogIndent);
   void RenewFront(Int64 AMoment, Cardinal AThread, const UnicodeString& ALoggerName, TZqLogLevel ALogLevel,
       TZqLogIndent ALogIndent);
 
-  TByteLayout FByteLayout{*this};
+  TZqByteLayoutOf<TZqXmlLayout> FByteLayout{*this};
   UnicodeString FXslFilename;
   // How the last line began, up to its message, and what that was made from.
   utf8::TBuffer FFront;
