@@ -329,6 +329,16 @@ TEST(ThreadManager, NobodyFreesTwiceOrNever) {
   EXPECT_EQ(Alive, 0);
 }
 
+TEST(ThreadManager, TheModulesStopEndsWhatIsLeft) {
+  std::atomic<bool> Gone[2] = {};
+  const auto Sleeping = [](TSteps& AThread, TZqThreadAction&) { AThread.Sleep(1'000'000); };
+  for (std::atomic<bool>& Each : Gone) New<TSteps>(New<TZqThreadManager>(nullptr), Sleeping)->Gone = &Each;
+  uZqThreads::Stop();
+  EXPECT_TRUE(Gone[0] && Gone[1]);
+  uZqThreads::Start();
+  EXPECT_EQ(ZqThreadManager()->ThreadCount(), 0);
+}
+
 TEST(ThreadManager, CantBeFreedWhereItsWorkerWaitsForThat) {
   auto* const Manager = New<TZqThreadManager>(nullptr);
   UnicodeString Told;
