@@ -31,14 +31,17 @@ class TCallRef {
  public:
   template <class TCallable>
     requires(std::invocable<TCallable&> && !std::same_as<std::remove_cvref_t<TCallable>, TCallRef>)
+  // NOLINTNEXTLINE(bugprone-forwarding-reference-overload): the constraint leaves copies alone
   TCallRef(TCallable&& ACallable)
-  noexcept  // NOLINT(bugprone-forwarding-reference-overload): copies are left alone
-      : FCallable(const_cast<void*>(static_cast<const void*>(std::addressof(ACallable)))), FCall([](void* ACalled) {
-          static_cast<void>((*static_cast<std::remove_reference_t<TCallable>*>(ACalled))());
-        }) {}
+  noexcept
+      : FCallable(const_cast<void*>(static_cast<const void*>(std::addressof(ACallable)))), FCall(&Call<TCallable>) {}
   void operator()() const { FCall(FCallable); }
 
  private:
+  template <class TCallable>
+  static void Call(void* ACalled) {
+    static_cast<void>((*static_cast<std::remove_reference_t<TCallable>*>(ACalled))());
+  }
   void* FCallable;
   void (*FCall)(void*);
 };
