@@ -33,7 +33,6 @@ class TCallRef {
     requires(std::invocable<TCallable&> && !std::same_as<std::remove_cvref_t<TCallable>, TCallRef>)
   // NOLINTNEXTLINE(bugprone-forwarding-reference-overload): the constraint leaves copies alone
   TCallRef(TCallable&& ACallable)
-  noexcept
       : FCallable(const_cast<void*>(static_cast<const void*>(std::addressof(ACallable)))), FCall(&Call<TCallable>) {}
   void operator()() const { FCall(FCallable); }
 
