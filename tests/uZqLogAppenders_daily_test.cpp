@@ -131,7 +131,8 @@ TEST_F(LogDaily, TheNewestAreKeptAndCountedFirst) {
     }
     LogAt(cMidnight - 1, "a");
     File->SetMaxBackupCount(3);
-    for (int i = 1; i < 3; ++i) EXPECT_TRUE(Folder.Names().size() == 3U && Texts(Names[i]) == std::to_string(3 - i));
+    for (const std::size_t i : {1U, 2U})
+      EXPECT_TRUE(Folder.Names().size() == 3U && Texts(Names[i]) == std::to_string(3 - i));
     Folder.Write("app." + FormatDateTime(FromUTF8(Pattern), zq::Now()).ToUTF8() + ".log", "");
     File->SetMaxBackupCount(5);
     File->RollOver();
