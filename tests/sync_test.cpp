@@ -80,7 +80,7 @@ TEST(ThreadNative, ExitCodeComesFromTheResultFromEndThreadOrFromARaise) {
 
 // Wherever a thread stands: what it waits for may be used and freed then, and who waits for it is let go.
 TEST(ThreadNative, OneThatNeverReturnsIsStopped) {
-  if (cSignalsAreHeldBack) GTEST_SKIP();
+  if (cThreadsCantBeStopped) GTEST_SKIP();
   for (const int Case : {0, 1, 2, 3}) {
     TSimpleEvent Event, Running;
     std::atomic<bool> Go = true;

@@ -352,7 +352,7 @@ TEST(ThreadManager, CantBeFreedWhereItsWorkerWaitsForThat) {
 }
 
 TEST(ThreadManager, StopsAThreadThatNeverReturns) {
-  if (cSignalsAreHeldBack) GTEST_SKIP();
+  if (cThreadsCantBeStopped) GTEST_SKIP();
   TNoted Noted;
   TSteps* const Thread = Owned(Noted, [](TSteps&, TZqThreadAction&) {
     for (std::atomic<int> i = 0;; ++i) continue;

@@ -215,10 +215,9 @@ bool TNativeThread::Kill() {
     Stopped = !std::exchange(FEnds, true);
   }
   if (!Stopped) return FEnded.WaitFor(cStopTime) == wrSignaled;  // it was about to end
-  const bool StackIsFree = FQueue->Abandon();
+  FQueue->Abandon();
   End(0);
-  if (StackIsFree) ::pthread_join(FNative, nullptr);
-  return true;
+  return true;  // its stack is never joined: the next thread on it would find what this one's libraries kept there
 }
 
 // ---- The main thread's queue ---------------------------------------------------------------------------------------

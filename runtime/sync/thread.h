@@ -64,8 +64,8 @@ class ZQ_API TNativeThread {
 
   /// Stops the thread wherever it is, with exit code 0: the last resort. Nothing of it is cleaned up: its scopes are
   /// not left, what it had locked stays locked (a lock of the allocator or of a stream among them), what it owned is
-  /// lost. Calls that wait for it are refused. False where it could not be stopped within two seconds: it has blocked
-  /// all signals, or is in a system call that can't be left.
+  /// lost, its stack included. Calls that wait for it are refused. False where it could not be stopped within two
+  /// seconds: it has blocked all signals, or is in a system call that can't be left.
   [[nodiscard]] bool Kill();
 
  private:

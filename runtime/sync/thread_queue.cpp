@@ -551,16 +551,13 @@ TThreadQueue::TEndWait::~TEndWait() {
   FWaiting.FWaitsFor.pop_back();
 }
 
-bool TThreadQueue::Abandon() {
+void TThreadQueue::Abandon() {
   {
     const std::lock_guard Guard(EndWaitsLock);
     FWaitsFor.clear();
   }
   for (TWait* Wait = FWait; Wait != nullptr; Wait = Wait->Outer) Wait->Watches.clear();
-  bool Result = true;
-  for (const TSent* Sent = FSending; Sent != nullptr; Sent = Sent->Outer)
-    Result = (Sent->Over.load(std::memory_order_acquire) || Sent->Target->Withdraw(*Sent)) && Result;
-  return Result;
+  for (const TSent* Sent = FSending; Sent != nullptr; Sent = Sent->Outer) Sent->Target->Withdraw(*Sent);
 }
 
 }  // namespace zq

@@ -144,9 +144,9 @@ class ZQ_API TThreadQueue : public std::enable_shared_from_this<TThreadQueue> {
   TDescriptors& Descriptors();
   void RequireOwn() const;
   void End() noexcept;
-  // Takes back what a thread that was stopped by force has begun to wait for; before End. False where a call that it
-  // has sent still runs, which uses its stack.
-  bool Abandon();
+  // Takes back what a thread that was stopped by force has begun to wait for, before End. A call that it has sent and
+  // that runs already goes on, with what it refers to on the stack, which stays.
+  void Abandon();
   static void AddHeld(const TSent* AServed, std::vector<const TThreadQueue*>& AHeld);
   [[nodiscard]] static std::vector<Cardinal> WayFrom(
       const TThreadQueue& AFrom, std::span<const TThreadQueue* const> AGoals);

@@ -70,11 +70,11 @@ struct TZoneScope {
   const TEnvironmentScope Variable;
 };
 
-/// ThreadSanitizer hands a signal to its handler only where the thread makes a call that it knows.
-#if defined(__SANITIZE_THREAD__)
-inline constexpr bool cSignalsAreHeldBack = true;
+/// A thread that is stopped by force never ends for the sanitizers, which then find its leaks, or hold its signal back.
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+inline constexpr bool cThreadsCantBeStopped = true;
 #else
-inline constexpr bool cSignalsAreHeldBack = false;
+inline constexpr bool cThreadsCantBeStopped = false;
 #endif
 
 /// Runs ABody with the numbers below ACount, each on a thread of its own, and waits for their ends.
