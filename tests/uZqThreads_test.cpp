@@ -156,13 +156,15 @@ TEST(ManagedThread, EachWayToTheEndHasItsStatesAndCallbacks) {
 TEST(ManagedThread, AStepMaySuspendItAndTerminateWakesIt) {
   for (const bool Resumes : {false, true}) {
     TNoted Noted;
+    Noted.Manager->SetOnThreadStateChanged(nullptr);  // both threads change it
     TSteps* const Thread = Owned(Noted, [](TSteps&, TZqThreadAction& AAction) { AAction = taSuspend; });
     Thread->Resume();
-    while (Noted.Text != "1r2s1r2s") ProcessMessages(1);
+    while (Noted.Count('s') != 2) ProcessMessages(1);
     Thread->Terminate(Resumes);
     EXPECT_EQ(Thread->WaitFor(), 0U);
+    EXPECT_EQ(Thread->ThreadState(), tsTerminated);
     EXPECT_EQ(Thread->Suspended(), !Resumes);
-    EXPECT_EQ(Noted.After(Thread), "1r2s1r2s45Dx");
+    EXPECT_EQ(Noted.After(Thread), "rsrsDx");
   }
 }
 
