@@ -36,7 +36,7 @@ class ZQ_API TZqExecThread : public TZqThread {
   const TZqEventProc FExecuteAnonymous;
   const TZqThreadProc FExecuteProc = nullptr;
   const TZqThreadMethod FExecuteMethod;
-  const Pointer FData = nullptr;
+  Pointer FData = nullptr;
 };
 
 /// TZqThreadManager::RunThreaded of the default manager.

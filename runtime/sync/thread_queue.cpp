@@ -284,7 +284,7 @@ TThreadQueueRef TThreadQueue::Current() {
   const bool IsMain = GetCurrentThreadId() == GetCurrentProcessId();
   if (TOfThread::Ended && !IsMain) return std::make_shared<TThreadQueue>(GetCurrentThreadId());
   if (TOfThread::Ended) {
-    const TThreadQueueRef Result = Main();
+    TThreadQueueRef Result = Main();
     const std::lock_guard Guard(Result->FLock);
     Result->FEnded = false;
     return Result;
@@ -349,7 +349,7 @@ std::deque<TThreadQueue::TEntry> TThreadQueue::TakeOut(TLeaves ALeaves) {
   return Result;
 }
 
-void TThreadQueue::Refuse(std::deque<TEntry> AEntries, const UnicodeString& AReason) {
+void TThreadQueue::Refuse(const std::deque<TEntry>& AEntries, const UnicodeString& AReason) {
   for (const TEntry& Entry : AEntries)
     if (Entry.Sent != nullptr) {
       Entry.Sent->Error = ExceptionRef::Of<ECallRefused>(AReason);

@@ -138,7 +138,7 @@ class ZQ_API TThreadQueue : public std::enable_shared_from_this<TThreadQueue> {
   bool WaitUntil(TReadyCall AReady, const TDeadline& ADeadline, TServe AServe, int ASpins);
   void WaitForReply(TSent& ASent);
   bool Withdraw(const TSent& ASent);
-  static void Refuse(std::deque<TEntry> AEntries, const UnicodeString& AReason);
+  static void Refuse(const std::deque<TEntry>& AEntries, const UnicodeString& AReason);
   template <class TLeaves>
   std::deque<TEntry> TakeOut(TLeaves ALeaves);
   TDescriptors& Descriptors();
