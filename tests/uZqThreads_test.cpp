@@ -338,7 +338,9 @@ TEST(ThreadManager, TheModulesStopEndsWhatIsLeft) {
   uZqThreads::Stop();
   EXPECT_TRUE(Gone[0] && Gone[1]);
   uZqThreads::Start();
-  EXPECT_EQ(ZqThreadManager()->ThreadCount(), 0);
+  TZqThreadManager* const Anew = ZqThreadManager();
+  EXPECT_EQ(Anew->ThreadCount(), 0);
+  Anew->Free();
 }
 
 TEST(ThreadManager, CantBeFreedWhereItsWorkerWaitsForThat) {
