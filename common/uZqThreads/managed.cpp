@@ -87,16 +87,22 @@ void TZqThread::RunGuarded() {
   }
 }
 
+// Each of the closing steps comes, whatever the one before has raised.
 Integer TZqThread::Close() {
+  const auto Quietly = [](auto AStep) {
+    try {
+      AStep();
+    } catch (const abi::__forced_unwind&) {
+      throw;
+    } catch (...) {  // the thread ends all the same
+    }
+  };
   const Integer Result = FReturnValue;
-  const TZqThreadState State = ThreadState();
-  SetThreadState(State == tsRunning ? tsFinished : State == tsTerminating ? tsTerminated : tsError);
-  try {
-    DoThreadDone();
-  } catch (const abi::__forced_unwind&) {
-    throw;
-  } catch (...) {  // the thread ends all the same
-  }
+  Quietly([this] {
+    const TZqThreadState State = ThreadState();
+    SetThreadState(State == tsRunning ? tsFinished : State == tsTerminating ? tsTerminated : tsError);
+  });
+  Quietly([this] { DoThreadDone(); });
   Assert(IsEnd(ThreadState()), u"An invalid threadstate was detected!");
   if (!FThreadManager->BeginsToFreeItself(this)) return Result;
   try {

@@ -39,7 +39,12 @@ TZqThreadManager::TZqThreadManager(TComponent* AOwner) : TComponent(AOwner) {
   FHWND = AllocateHWnd([this](HWND, Cardinal AMessage, NativeUInt AWParam, NativeInt ALParam) {
     return WindowProc(AMessage, AWParam, ALParam);
   });
-  Service<TSessionService>().StartSystemMessages(FHWND);
+  try {
+    Service<TSessionService>().StartSystemMessages(FHWND);
+  } catch (...) {
+    DestroyWindow(FHWND);  // it knows this object
+    throw;
+  }
 }
 
 TZqThreadManager::~TZqThreadManager() { CloseWindow(); }
@@ -94,9 +99,16 @@ Integer TZqThreadManager::ThreadCount() const { return FThreads.Locked()->Count(
 
 TZqThread* TZqThreadManager::GetThread(Integer AIndex) const { return FThreads.Locked()->Items(AIndex); }
 
+namespace {
+
+[[noreturn]] void RaiseUnknown() {
+  throw EZqThread(u"The specified thread is not managed by this ThreadManager or has already been destroyed!");
+}
+
+}  // namespace
+
 TZqThread* TZqThreadManager::Listed(TList::TScope& AList, TZqThread* AThread) {
-  if (AList->IndexOf(AThread) < 0)
-    throw EZqThread(u"The specified thread is not managed by this ThreadManager or has already been destroyed!");
+  if (AList->IndexOf(AThread) < 0) RaiseUnknown();
   return AThread;
 }
 
@@ -155,7 +167,8 @@ void TZqThreadManager::TerminateAllThreads(bool AWaitForTermination) {
 void TZqThreadManager::KillUnresponsiveThread(TZqThread* AThread) {
   const TThreadHandle Handle = [&] {
     TList::TScope List(FThreads);
-    Listed(List, AThread)->SetFreeOnTerminate(false);
+    if (Listed(List, AThread)->FFreesItself) RaiseUnknown();  // it is on its way out
+    AThread->SetFreeOnTerminate(false);
     return AThread->FHandle;
   }();
   if (!Handle->Kill()) throw EZqThread(u"The thread %d can't be stopped", {Handle->ThreadID()});
