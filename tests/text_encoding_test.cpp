@@ -224,6 +224,32 @@ TEST(TextEncoding, MalformedInputFailsOnlyWhenAsked) {
   EXPECT_EQ(Decoded(65001, "€😀", MB_ERR_INVALID_CHARS), u"€😀");
 }
 
+// Long stretches go by blocks: wherever one starts and ends it must read as its bytes do one by one, and touch no more.
+TEST(TextEncoding, AnyStretchOfSingleBytesReadsAsItsBytesDo) {
+  for (const TCodePage& Page : CodePages()) {
+    if (Page.Kind != TPageKind::SingleByte || !Page.IsServed()) continue;
+    std::string Bytes;
+    std::u16string Units;
+    for (unsigned i = 0; i < 512; ++i) {
+      Bytes += static_cast<char>(i * 37);
+      Units += Decoded(Page.Number, Bytes.substr(i));
+    }
+    for (std::size_t At = 0; At < 256; At += 11)
+      for (std::size_t Count = 1; Count <= 130; ++Count) {
+        const char* const From = Bytes.data() + At;
+        const auto Size = static_cast<int>(Count);
+        std::u16string Room(Units.size(), u'.');
+        std::u16string Expected = Room;
+        Expected.replace(At, Count, Units, At, Count);
+        const int Strict = Expected.find(u'\xFFFD') == Expected.npos ? Size : 0;
+        ASSERT_EQ(MultiByteToWideChar(Page.Number, 0, From, Size, Room.data() + At, Size), Size);
+        ASSERT_EQ(UnicodeString(Room), UnicodeString(Expected)) << Page.Number;
+        for (const int Capacity : {0, Size})
+          ASSERT_EQ(MultiByteToWideChar(Page.Number, MB_ERR_INVALID_CHARS, From, Size, Room.data(), Capacity), Strict);
+      }
+  }
+}
+
 // Every text, cut at every length and into every room: the size told first is what is written, and nothing beyond.
 TEST(TextEncoding, NoCutReadsOrWritesBeyondABuffer) {
   std::string Noise;

@@ -75,7 +75,8 @@ class TPageTable {
 
   struct TUnitWriter;
   struct TUnitCounter;
-  void DecodeSingles(const Byte* ASource, std::size_t ABytes, char16_t* ADest) const noexcept;
+  // Whether one is unassigned. ADest may be nullptr.
+  bool DecodeSingles(const Byte* ASource, std::size_t ABytes, char16_t* ADest) const noexcept;
   template <class TPut>
   TPut DecodeEach(const Byte* AAt, const Byte* AEnd, TPut APut);
   struct TByteWriter;
