@@ -103,12 +103,16 @@ constexpr bool IsPair(char16_t AFirst, const char16_t* AAt, const char16_t* AEnd
 TPageTable* TPageTable::Of(const TCodePage& APage) {
   static std::array<std::atomic<TPageTable*>, 256> Tables;
   std::atomic<TPageTable*>& Table = Tables[static_cast<std::size_t>(&APage - CodePages().data())];
-  if (TPageTable* const Known = Table.load(std::memory_order_acquire); Known != nullptr) return Known;
+  TPageTable* const Known = Table.load(std::memory_order_acquire);
+  return Known != nullptr ? Known : Make(APage, Table);
+}
+
+TPageTable* TPageTable::Make(const TCodePage& APage, std::atomic<TPageTable*>& ATable) {
   std::unique_ptr<TCharacterSource> Source = TCharacterSource::Open(APage.Data);
   if (Source == nullptr) return nullptr;
   auto Made = std::make_unique<TPageTable>(APage, std::move(Source));
   TPageTable* Expected = nullptr;
-  return Table.compare_exchange_strong(Expected, Made.get()) ? Made.release() : Expected;
+  return ATable.compare_exchange_strong(Expected, Made.get()) ? Made.release() : Expected;
 }
 
 TPageTable::TPageTable(const TCodePage& APage, std::unique_ptr<TCharacterSource> ASource)
@@ -195,16 +199,18 @@ bool TPageTable::DecodeSingles(const Byte* ASource, std::size_t ABytes, char16_t
 
 std::size_t TPageTable::Decode(const char* ASource, std::size_t ABytes, char16_t* ADest, bool& AMalformed) {
   const Byte* const At = reinterpret_cast<const Byte*>(ASource);
-  if (!FHasPairs) {
-    AMalformed |= DecodeSingles(At, ABytes, ADest);
-    return ABytes;
-  }
+  if (FHasPairs) return DecodePairs(At, At + ABytes, ADest, AMalformed);
+  AMalformed |= DecodeSingles(At, ABytes, ADest);
+  return ABytes;
+}
+
+std::size_t TPageTable::DecodePairs(const Byte* AAt, const Byte* AEnd, char16_t* ADest, bool& AMalformed) {
   if (ADest == nullptr) {
-    const auto [Count, Malformed] = DecodeEach(At, At + ABytes, TUnitCounter{});
+    const auto [Count, Malformed] = DecodeEach(AAt, AEnd, TUnitCounter{});
     AMalformed |= Malformed;
     return Count;
   }
-  const auto [End, Malformed] = DecodeEach(At, At + ABytes, TUnitWriter{ADest});
+  const auto [End, Malformed] = DecodeEach(AAt, AEnd, TUnitWriter{ADest});
   AMalformed |= Malformed;
   return static_cast<std::size_t>(End - ADest);
 }

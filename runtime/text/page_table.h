@@ -66,6 +66,7 @@ class TPageTable {
   static constexpr Word cMeets = 0xFFFE;
   static constexpr Word cNone = 0xFFFF;
 
+  static TPageTable* Make(const TCodePage& APage, std::atomic<TPageTable*>& ATable);
   template <class TAsk>
   Word Recall(TMemo& AMemo, Word AIndex, TAsk AAsk);
   [[nodiscard]] bool IsAscii(unsigned AValue) const noexcept;
@@ -77,6 +78,7 @@ class TPageTable {
   struct TUnitCounter;
   // Whether one is unassigned. ADest may be nullptr.
   bool DecodeSingles(const Byte* ASource, std::size_t ABytes, char16_t* ADest) const noexcept;
+  std::size_t DecodePairs(const Byte* AAt, const Byte* AEnd, char16_t* ADest, bool& AMalformed);
   template <class TPut>
   TPut DecodeEach(const Byte* AAt, const Byte* AEnd, TPut APut);
   struct TByteWriter;
