@@ -14,6 +14,14 @@ void uZqClasses::Start() {
   DescribeType<TZqAutoDestroy>(u"uZqClasses").EnumNames({u"radComputed", u"radFalse", u"radTrue"});
   DescribeType<TZqObjectOwnership>(u"uZqClasses").EnumNames({u"ooReference", u"ooOwned"});
   DescribeType<TZqBinEncoding>(u"uZqClasses").EnumNames({u"beBase64", u"beHexEncoded"});
+  DescribeType<TZqKeyDescStringList>(u"uZqClasses")
+      .Property(u"KeyValues", &TZqKeyDescStringList::KeyValues, &TZqKeyDescStringList::SetKeyValues)
+      .Property(u"Descriptions", &TZqKeyDescStringList::Descriptions, &TZqKeyDescStringList::SetDescriptions);
+  DescribeType<TZqMemoListItem>(u"uZqClasses")
+      .Property(u"Code", &TZqMemoListItem::Code, &TZqMemoListItem::SetCode)
+      .Property(u"Memo", &TZqMemoListItem::Memo, &TZqMemoListItem::SetMemo);
+  DescribeType<TZqMemoListItems>(u"uZqClasses").ElementType(TypeInfo<TZqMemoListItem>());
+  DescribeType<TZqMemoList>(u"uZqClasses").Property(u"Items", &TZqMemoList::Items, &TZqMemoList::SetItems);
 }
 
 void uZqClasses::Stop() { Starts.Ends(); }

@@ -54,8 +54,8 @@ class ZQ_API TListOf : public TObject {
   void SetItems(Integer AIndex, T AItem) {
     const T Old = std::exchange(FItems[Slot(AIndex, Count())], AItem);
     if (Old == AItem) return;
+    Notify(AItem, lnAdded);  // first: the old item's end may raise, or take the new one out again
     Notify(Old, lnDeleted);
-    Notify(AItem, lnAdded);
   }
   void Delete(Integer AIndex) { Notify(Take(AIndex), lnDeleted); }
   /// Deletes the first equal item and returns the index that it had; -1 if absent.
