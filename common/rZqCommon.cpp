@@ -25,6 +25,7 @@ constexpr TPackageUnit cUnits[] = {
     {u"uZqWindows", nullptr, nullptr},
     {u"uZqSessionEvents", uZqSessionEvents::Start, uZqSessionEvents::Stop},
     {u"uZqThreads", uZqThreads::Start, uZqThreads::Stop},
+    {u"uZqUUCode", nullptr, nullptr},
     {u"uZqLogLayouts", uZqLogLayouts::Start, uZqLogLayouts::Stop},
     {u"uZqLogger", uZqLogger::Start, uZqLogger::Stop},
     {u"uZqLogAppenders", uZqLogAppenders::Start, uZqLogAppenders::Stop},
