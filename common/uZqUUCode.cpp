@@ -120,7 +120,7 @@ class TLineReader {
 UnicodeString FindHeader(TLineReader& ALines, const UnicodeString& AFileName) {
   const UnicodeString Wanted = AnsiLowerCase(AFileName);
   for (;;) {
-    const UnicodeString Line = TZqEncoding::ConvertA(ALines.Next(), 0);
+    UnicodeString Line = TZqEncoding::ConvertA(ALines.Next(), 0);
     if (Wanted.IsEmpty() || AnsiLowerCase(Line).Pos(Wanted) != 0) return Line;
   }
 }
@@ -157,8 +157,7 @@ class TByteWriter {
 constexpr unsigned ValueOf(char ACharacter) noexcept { return (static_cast<unsigned char>(ACharacter) - 32U) & 63U; }
 
 void DecodeLine(std::string_view ALine, TByteWriter& AOut) {
-  constexpr std::size_t cMostCharacters = 63 / 3 * 4;
-  std::array<char, cMostCharacters> Text;
+  std::array<char, 84> Text;  // for 63 bytes, the most that a line can count
   Text.fill(' ');
   ALine.copy(Text.data(), Text.size(), 1);
   std::size_t Count = ValueOf(ALine.front());

@@ -16,11 +16,11 @@ void TZqFileStream::WriteString(const AnsiString& AString) {
 }
 
 void TZqFileStream::WriteString(const UnicodeString& AString) {
-  WriteBuffer(AString.data(), static_cast<Int64>(AString.size() * sizeof(Char)));
+  WriteBuffer(AString.data(), static_cast<Int64>(AString.size()) * Int64{sizeof(Char)});
 }
 
 void TZqStringList::Tokenize(const UnicodeString& ASource, Char ADelimiter) {
-  const UnicodeString Kept = ASource;  // it may be one of the strings
+  const UnicodeString Kept(ASource.View());  // it may be one of the strings
   SetDelimiter(ADelimiter);
   Clear();
   ZqTokenize(Kept, this, UnicodeString(ADelimiter));

@@ -36,5 +36,17 @@ int main() {
   ZqRegisterExceptionClass(u"shop", 7, EZqExceptionClass::Of<EShopClosed>());
   const ExceptionClass Found = ZqGetExceptionClass(u"shop", 7);
 
-  return Order->Number() == 7 && Found.ClassName() == u"EShopClosed" ? 0 : 1;
+  TZqObjectList Orders;
+  auto* const Shared = New<TOrder>();
+  Shared->SetAutoDestroy(true);  // before it is added: the list counts it now
+  Orders.Add(Shared);
+  IntfRef<IOrder> Kept(Shared);
+  Orders.Clear();  // Kept has the last count
+
+  const TOwned<TZqKeyDescStringList> Sizes(New<TZqKeyDescStringList>(nullptr));
+  Sizes->AddItem(38, u"small");
+  Sizes->AddItem(42, u"large");
+  const Integer Size = Sizes->GetIntKeyValue(u"large");
+
+  return Order->Number() == 7 && Kept->Number() == 7 && Size == 42 && Found.ClassName() == u"EShopClosed" ? 0 : 1;
 }
