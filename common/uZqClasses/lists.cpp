@@ -32,8 +32,9 @@ void TZqKeyDescStringList::Clear() {
 }
 
 void TZqKeyDescStringList::AddItem(const UnicodeString& AItem, const UnicodeString& ADescription) {
+  const UnicodeString Description(ADescription.View());  // it may be one of the keys
   FKeyValues.Add(AItem);
-  FDescriptions.Add(ADescription);
+  FDescriptions.Add(Description);
 }
 
 void TZqKeyDescStringList::AddItem(Integer AItem, const UnicodeString& ADescription) {
@@ -46,7 +47,7 @@ void TZqKeyDescStringList::AddItem(const UnicodeString& ADescription) {
 
 void TZqKeyDescStringList::AddItems(const TStrings& ADescriptions) {
   const Integer Count = ADescriptions.Count();  // it may be one of the two that grow here
-  for (Integer i = 0; i < Count; ++i) AddItem(UnicodeString(ADescriptions[i]));
+  for (Integer i = 0; i < Count; ++i) AddItem(ADescriptions[i]);
 }
 
 void TZqKeyDescStringList::Assign(const TPersistent* ASource) {
