@@ -29,6 +29,8 @@ constexpr TPackageUnit cUnits[] = {
     {u"uZqLogLayouts", uZqLogLayouts::Start, uZqLogLayouts::Stop},
     {u"uZqLogger", uZqLogger::Start, uZqLogger::Stop},
     {u"uZqLogAppenders", uZqLogAppenders::Start, uZqLogAppenders::Stop},
+    {u"uZqSha1", nullptr, nullptr},
+    {u"uZqMD5", nullptr, nullptr},
 };
 
 // Also linked statically, the library starts before the program's own static objects and ends after them.

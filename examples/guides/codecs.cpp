@@ -1,6 +1,21 @@
 #include "common/uZqBase64.h"
 #include "common/uZqClasses.h"
+#include "common/uZqMD5.h"
+#include "common/uZqSha1.h"
 #include "common/uZqUUCode.h"
+
+static bool ShowDigests() {
+  using namespace zq;
+  const AnsiString Program = ZqHashFile(u"/proc/self/exe", beHexEncoded);
+  const AnsiString Short = ZqHashStringA("abc", beBase64);
+
+  TMD5Context Context;
+  MD5Init(Context);
+  for (const std::string_view Piece : {"a", "bc"}) MD5Update(Context, Piece.data(), Piece.size());
+  TMD5Digest Digest;
+  MD5Final(Context, Digest);
+  return Program.Length() == 40 && Short == "qZk+NkcGgWq6PiVxeFDCbJzQ2J0=" && Digest == MD5Hash("abc", 3);
+}
 
 int main() {
   using namespace zq;
@@ -13,5 +28,5 @@ int main() {
   const TZqUUData Told = ZqUUDecode(Block, u"notes.txt", &Bytes);  // or without the name: the first line is the header
 
   const bool Right = Text == "Cv8Q" && ZqDecodeBase64(Text) == Key && Either == "0AFF10";
-  return Right && Told.Mode == 644 && Bytes.Size() == 10 ? 0 : 1;
+  return Right && ShowDigests() && Told.Mode == 644 && Bytes.Size() == 10 ? 0 : 1;
 }
