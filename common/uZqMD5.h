@@ -32,6 +32,9 @@ struct TMD5Context {
 
 ZQ_API void MD5Init(TMD5Context& AContext) noexcept;
 ZQ_API void MD5Update(TMD5Context& AContext, const void* AInput, NativeInt ALength);
+inline void MD5Update(TMD5Context& AContext, std::string_view AInput) {
+  MD5Update(AContext, AInput.data(), static_cast<NativeInt>(AInput.size()));
+}
 /// Leaves zeros in the context: MD5Init begins the next digest.
 ZQ_API void MD5Final(TMD5Context& AContext, TMD5Digest& ADigest) noexcept;
 

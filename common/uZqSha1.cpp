@@ -41,7 +41,7 @@ struct TRegisters {
   __m128i Words[4];
 };
 
-// Four steps. The words of each next four are begun as soon as those that go into them are there.
+// Four steps. The words of the next three groups go as far as they can with those of this one.
 template <std::size_t AGroup>
 [[gnu::target("sha,sse4.1"), gnu::always_inline]] inline void Group(TRegisters& A) noexcept {
   const __m128i Words = A.Words[AGroup % 4];

@@ -27,7 +27,7 @@ TEST(Md5, WideTextIsItsUnits) {
 TMD5Digest InTwo(std::string_view AText, std::size_t ACut) {
   TMD5Context Context;
   MD5Init(Context);
-  MD5Update(Context, AText.data(), static_cast<NativeInt>(ACut));
+  MD5Update(Context, AText.substr(0, ACut));
   TMD5Context Copy = Context;
   MD5Update(Copy, AText.data() + ACut, static_cast<NativeInt>(AText.size() - ACut));
   TMD5Digest Result;

@@ -69,7 +69,8 @@ struct TScriptedStream final : TStream {
   Integer Read(void* ABuffer, Integer ACount) override {
     Asked.push_back(ACount);
     if (static_cast<int>(Asked.size()) == FailAt) throw EReadError(u"broken");
-    const std::size_t Count = Content.copy(static_cast<char*>(ABuffer), std::min<std::size_t>(ACount, Step), At);
+    const std::size_t Count =
+        Content.copy(static_cast<char*>(ABuffer), std::min(static_cast<std::size_t>(ACount), Step), At);
     At += Count;
     return static_cast<Integer>(Count);
   }
@@ -118,8 +119,8 @@ TEST(Sha1, FilesAndWhatIsNone) {
   EXPECT_EQ(ZqHashFile(Folder.File("empty"), beHexEncoded), std::string(40, '0'));
   const std::pair<UnicodeString, std::string> Cases[] = {{Folder.File("none"), "EFOpenError: .*No such file.*"},
       {Folder.File("."), "EFOpenError: .*Is a directory"}, {u"/proc/self/mem", "EReadError: Input/output error"}};
-  for (const auto& [Name, Words] : Cases)
-    EXPECT_THAT(RaisedBy([&] { (void)ZqHashFile(Name, beBase64); }).ToUTF8(), testing::MatchesRegex(Words));
+  for (const auto& Case : Cases)
+    EXPECT_THAT(RaisedBy([&] { (void)ZqHashFile(Case.first, beBase64); }).ToUTF8(), testing::MatchesRegex(Case.second));
 }
 
 }  // namespace
