@@ -30,10 +30,10 @@ ZQ_API void ZqHashString(std::u16string_view AValue, TSHA1Digest& ADigest);
 [[nodiscard]] ZQ_API AnsiString ZqHashStringW(std::u16string_view AValue, TZqBinEncoding AEncoding);
 [[nodiscard]] ZQ_API AnsiString ZqHashStringA(std::string_view AValue, TZqBinEncoding AEncoding);
 
-// What is read stands in one block of the stream's size, filled by one Read; there is a second one only where that gave
-// less than the size had promised, or the size promised nothing, as that of a pipe or of a file of /proc: these are
-// read to their end. EReadError tells that the system refuses to read on, std::bad_alloc that there is no memory for
-// the block, or that more came than an Integer holds without a size that said so. Out of nothing come the zeros.
+// What is read stands in one block of the stream's size, filled by one Read. Only where that gave less than the size
+// had promised, or the size promised nothing, as that of a pipe or of a file of /proc does, reading goes on to the end.
+// EReadError says why the system refuses to read on, std::bad_alloc that there is no memory for the block, or that more
+// than 1 GiB came out of what told no size. For nothing stand the zeros.
 
 /// In Base64, of what stands behind the position, or of all. The stream stays the caller's, is left behind what was
 /// read, and is not null (EAssertionFailed).
