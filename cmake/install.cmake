@@ -14,8 +14,8 @@ install(EXPORT rZqCommonTargets NAMESPACE rZqCommon:: DESTINATION ${package_fold
 # Who links the library statically links what stands below it, too, and needs that installed; nobody else does.
 if(NOT BUILD_SHARED_LIBS)
   string(CONCAT package_dependencies "include(CMakeFindDependencyMacro)\n"
-    "find_dependency(ICU COMPONENTS uc)\nfind_dependency(Threads)\n")
-  set(pc_requires_private icu-uc)
+    "find_dependency(ICU COMPONENTS uc)\nfind_dependency(ZLIB)\nfind_dependency(Threads)\n")
+  set(pc_requires_private "icu-uc zlib")
   set(pc_libs_private ${CMAKE_THREAD_LIBS_INIT} ${CMAKE_DL_LIBS})
   list(TRANSFORM pc_libs_private REPLACE "^([^-].*)" "-l\\1")
   list(JOIN pc_libs_private " " pc_libs_private)

@@ -11,6 +11,7 @@
 #include "common/uZqSysUtils.h"
 #include "common/uZqThreads.h"
 #include "common/uZqTypes.h"
+#include "common/uZqZLib.h"
 
 namespace zq {
 
@@ -26,6 +27,7 @@ constexpr TPackageUnit cUnits[] = {
     {u"uZqSessionEvents", uZqSessionEvents::Start, uZqSessionEvents::Stop},
     {u"uZqThreads", uZqThreads::Start, uZqThreads::Stop},
     {u"uZqUUCode", nullptr, nullptr},
+    {u"uZqZLib", uZqZLib::Start, uZqZLib::Stop},
     {u"uZqLogLayouts", uZqLogLayouts::Start, uZqLogLayouts::Stop},
     {u"uZqLogger", uZqLogger::Start, uZqLogger::Stop},
     {u"uZqLogAppenders", uZqLogAppenders::Start, uZqLogAppenders::Stop},
@@ -57,7 +59,8 @@ const TPackageInfo& GetPackageInfoTable() {
                   TypeInfo<TZqDecodeType>(), TypeInfo<TZqTimeRange>(), TypeInfo<TZqTimeFormat>(),
                   TypeInfo<TZqAutoDestroy>(), TypeInfo<TZqObjectOwnership>(), TypeInfo<TZqBinEncoding>(),
                   TypeInfo<TZqNotificationScope>(), TypeInfo<TZqSessionEventType>(), TypeInfo<TZqPowerEventType>(),
-                  TypeInfo<TZqEndSessionType>(), TypeInfo<TZqThreadAction>(), TypeInfo<TZqThreadState>()}};
+                  TypeInfo<TZqEndSessionType>(), TypeInfo<TZqThreadAction>(), TypeInfo<TZqThreadState>(),
+                  TypeInfo<TZqZLibCompressionLevel>(), TypeInfo<TZqZLibStrategy>(), TypeInfo<TZqZLibFlush>()}};
   return Table;
 }
 
