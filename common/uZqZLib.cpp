@@ -353,14 +353,17 @@ Integer TZqZLibDecompressionStream::Read(void* ABuffer, Integer ACount) {
   ACount = std::max(ACount, 0);
   FZlStreamRec.next_out = static_cast<Byte*>(ABuffer);
   FZlStreamRec.avail_out = static_cast<Cardinal>(ACount);
-  while (FZlStreamRec.avail_out > 0 && !FAtEnd && Fill())
-    FAtEnd = CheckDecompression(::inflate(Rec(&FZlStreamRec), Z_NO_FLUSH)) == Z_STREAM_END;
+  while (FZlStreamRec.avail_out > 0 && !FAtEnd) {
+    // Also where there is nothing to give: zlib keeps bytes that the last call had no room for.
+    const Integer Code = ::inflate(Rec(&FZlStreamRec), Z_NO_FLUSH);
+    if (Code != Z_BUF_ERROR || FZlStreamRec.avail_in > 0) FAtEnd = CheckDecompression(Code) == Z_STREAM_END;
+    else if (!Fill()) break;
+  }
   if (FAtEnd) GiveBack();
   return ACount - static_cast<Integer>(FZlStreamRec.avail_out);
 }
 
 bool TZqZLibDecompressionStream::Fill() {
-  if (FZlStreamRec.avail_in > 0) return true;
   FZlStreamRec.avail_in = static_cast<Cardinal>(ZlStreamRead(FBuffer, cBufferSize));
   if (FZlStreamRec.avail_in == 0) return false;
   FZlStreamRec.next_in = FBuffer;
