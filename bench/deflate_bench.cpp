@@ -31,7 +31,7 @@ TBytes Noise() {
 // Lines of words, some frequent and most rare, which deflate to about a third.
 TBytes Text() {
   std::minstd_rand Chance(7);  // NOLINT: the same bytes in each run
-  std::vector<std::string> Words(4000);
+  std::vector<std::string> Words(1000);
   for (std::string& Word : Words)
     for (auto Length = 2 + Chance() % 9; Length > 0; --Length) Word += static_cast<char>('a' + Chance() % 26);
   TBytes Result;

@@ -42,9 +42,12 @@ void Stop() { Starts.Ends(); }
 
 namespace {
 
+template <class T, class TZlibs>
+constexpr bool cSame = std::is_same_v<T, TZlibs> || (std::is_pointer_v<T> && std::is_pointer_v<TZlibs>);
+
 #define ZQ_SAME(AField)                                                         \
   static_assert(offsetof(TZlStreamRec, AField) == offsetof(z_stream, AField) && \
-                sizeof(TZlStreamRec::AField) == sizeof(z_stream::AField))
+                cSame<decltype(TZlStreamRec::AField), decltype(z_stream::AField)>)
 ZQ_SAME(next_in);
 ZQ_SAME(avail_in);
 ZQ_SAME(total_in);
@@ -60,7 +63,8 @@ ZQ_SAME(data_type);
 ZQ_SAME(adler);
 ZQ_SAME(reserved);
 #undef ZQ_SAME
-static_assert(sizeof(TZlStreamRec) == sizeof(z_stream) && alignof(TZlStreamRec) == alignof(z_stream));
+static_assert(sizeof(TZlStreamRec) == sizeof(z_stream));
+static_assert(alignof(TZlStreamRec) == alignof(z_stream));
 static_assert(std::is_same_v<TZlAlloc, alloc_func> && std::is_same_v<TZlFree, free_func>);
 
 z_stream* Rec(TZlStreamRec* AStream) noexcept { return reinterpret_cast<z_stream*>(AStream); }

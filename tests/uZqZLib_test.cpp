@@ -63,8 +63,7 @@ TEST(Deflate, NothingIsLostWhereTheDestinationIsFullOrRaises) {
         for (; Zip.Position() < std::ssize(Data); Dest.Limit += Step) {
           const std::string_view Rest = std::string_view(Data).substr(static_cast<std::size_t>(Zip.Position()));
           const UnicodeString Raised = RaisedBy([&] { Zip.Write(Rest.data(), static_cast<Integer>(Rest.size())); });
-          ASSERT_THAT(Raised.ToUTF8(), testing::AnyOf("nothing", Raises ? "EStreamError: refused" : "nothing"));
-          ASSERT_TRUE(Pipe || Raises || Dest.Position() % cBlock == 0);
+          ASSERT_TRUE(Raised == u"nothing" ? Pipe || Dest.Position() % cBlock == 0 : Raises) << Raised.ToUTF8();
         }
         for (Dest.Limit = 0; RaisedBy([&] { Zip.Finish(); }) != u"nothing";) Dest.Limit += Step;
         Dest.Pipe = false;
@@ -120,10 +119,8 @@ TEST(Deflate, SeeksForwardAndToTheStartAndRefusesTheRest) {
   Pipe.Pipe = true;
   TZqZLibCompressionStream Zip(&Dest, clMax);
   TZqZLibDecompressionStream Unzip(&Source), Piped(&Pipe);
-  EXPECT_EQ(Unzip.Seek(20001, soFromBeginning), 20001);
-  EXPECT_EQ(Unzip.Seek(5, soFromBeginning), 20001);
-  EXPECT_TRUE(Unzip.Size() == 20010 && Unzip.Position() == 20001);
-  EXPECT_EQ(Unzip.Seek(2, soFromCurrent), 20003);
+  EXPECT_TRUE(Unzip.Seek(20001, soFromBeginning) == 20001 && Unzip.Seek(5, soFromBeginning) == 20001);
+  EXPECT_TRUE(Unzip.Size() == 20010 && Unzip.Position() == 20001 && Unzip.Seek(2, soFromCurrent) == 20003);
   EXPECT_EQ(Get(Unzip, 2), "34");
   const std::function<void()> Wrong[] = {[&] { Unzip.Seek(-1, soFromCurrent); }, [&] { Unzip.Seek(1, soFromEnd); },
       [&] { Unzip.Seek(20005, soFromBeginning); }, [&] { Piped.SetPosition(0); }, [&] { (void)Piped.Size(); },
@@ -134,29 +131,23 @@ TEST(Deflate, SeeksForwardAndToTheStartAndRefusesTheRest) {
         RaisedBy(Action).ToUTF8(), testing::MatchesRegex("EZqZLib(Dec|C)ompressionError: Invalid ZStream operation!"));
   EXPECT_EQ(Get(Piped, 100), "0123456789");
   EXPECT_EQ(RaisedBy([&] { Unzip.Seek(6, soFromCurrent); }), u"EReadError: Stream read error");
-  EXPECT_EQ(Unzip.Seek(0, soFromEnd), 20010);
-  EXPECT_EQ(Unzip.Seek(0, soFromBeginning), 0);
+  EXPECT_TRUE(Unzip.Seek(0, soFromEnd) == 20010 && Unzip.Seek(0, soFromBeginning) == 0);
   EXPECT_EQ(Get(Unzip, 20000), Noise(20000));
   EXPECT_EQ(Inflated(Dest), "");
-  UnicodeString Messages;
-  for (Integer Code = 2; Code >= -7; --Code) Messages += EZqZLibException(Code).Message() + u", ";
-  EXPECT_EQ(Messages,
-      u"Need dictionary, Stream end, OK, File error, Stream error, Data error, Insufficient memory, "
-      u"Buffer error, Incompatible version, , ");
 }
 
 TEST(Deflate, ProgressAndRateFollowTheCompressedData) {
   TReluctant Dest;
   int Calls = 0;
+  const auto Count = [&](TObject* ASender) { Calls += ASender->InheritsFrom(ClassOf<TZqZLibStream>()) ? 1 : 100; };
   TZqZLibCompressionStream Zip(&Dest, clNone);
-  Zip.SetOnProgress([&](TObject* ASender) { Calls += ASender == &Zip ? 1 : 100; });
+  Zip.SetOnProgress(Count);
   EXPECT_EQ(Zip.CompressionRate(), 0);
   Put(Zip, Noise(200000));
-  Zip.Finish();
-  EXPECT_TRUE(Calls == 3 && Zip.CompressionRate() < 0 && Zip.CompressionRate() > -0.1F) << Zip.CompressionRate();
+  EXPECT_TRUE(Calls == 3 && Zip.CompressionRate() < 2 && (Zip.Finish(), Zip.CompressionRate() < 0));
   Dest.SetPosition(0);
   TZqZLibDecompressionStream Unzip(&Dest);
-  Unzip.SetOnProgress([&](TObject* ASender) { Calls += ASender == &Unzip ? 1 : 100; });
+  Unzip.SetOnProgress(Count);
   EXPECT_TRUE(Unzip.Seek(0, soEnd) == 200000 && Calls == 3 + 4) << Calls;
 }
 

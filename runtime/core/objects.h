@@ -41,9 +41,9 @@ template <class T>
 
 /// Root of every class.
 ///
-/// A plain class is ordinary C++ and makes its destructor public. A class with a protocol, one that overrides
-/// AfterConstruction or BeforeDestruction or counts references, leaves it protected: New makes it, Free or its last
-/// reference ends it.
+/// A plain class is ordinary C++ and makes its destructor public, which may do without raising what BeforeDestruction
+/// does. One with a protocol, that needs AfterConstruction or BeforeDestruction or counts references, leaves it
+/// protected: New makes it, Free or its last reference ends it.
 class ZQ_API TObject {
  public:
   TObject() = default;
