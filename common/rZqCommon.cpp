@@ -57,7 +57,8 @@ const TPackageInfo& GetPackageInfoTable() {
                   TypeInfo<TZqNullableBool>(), TypeInfo<TZqCharCase>(), TypeInfo<TZqBitness>(),
                   TypeInfo<TZqWeekFormat>(), TypeInfo<TZqDatePeriod>(), TypeInfo<TZqWorkDayAdjustment>(),
                   TypeInfo<TZqDecodeType>(), TypeInfo<TZqTimeRange>(), TypeInfo<TZqTimeFormat>(),
-                  TypeInfo<TZqAutoDestroy>(), TypeInfo<TZqObjectOwnership>(), TypeInfo<TZqBinEncoding>(),
+                  TypeInfo<TZqAutoDestroy>(), TypeInfo<TZqObjectOwnership>(), TypeInfo<TZqCharacterSetType>(),
+                  TypeInfo<TZqTextParserPosType>(), TypeInfo<TZqTextParserSkipOp>(), TypeInfo<TZqBinEncoding>(),
                   TypeInfo<TZqNotificationScope>(), TypeInfo<TZqSessionEventType>(), TypeInfo<TZqPowerEventType>(),
                   TypeInfo<TZqEndSessionType>(), TypeInfo<TZqThreadAction>(), TypeInfo<TZqThreadState>(),
                   TypeInfo<TZqZLibCompressionLevel>(), TypeInfo<TZqZLibStrategy>(), TypeInfo<TZqZLibFlush>()}};

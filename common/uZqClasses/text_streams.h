@@ -2,6 +2,7 @@
 
 #include <string_view>
 
+#include "common/uZqClasses/characters.h"
 #include "common/uZqClasses/streams.h"
 #include "runtime/values/variants.h"
 
@@ -19,9 +20,6 @@ inline constexpr TResStringRec _SInvalidUTF8InStream{65534, u"The stream does no
 inline constexpr TResStringRec _SInvalidUTF8InStream1{
     65535, u"The stream does not contain valid UTF-8 code!\r\nThere are 1 or 2 bytes missing!"};
 }  // namespace uZqClasses
-
-inline constexpr AnsiChar cZqEOFA = 0;
-inline constexpr Char cZqEOFW = 0;
 
 // ---- String stream --------------------------------------------------------------------------------------------------
 

@@ -61,38 +61,28 @@ class TMethod<R(TArgs...)> {
   template <auto AMethod, class T>
   [[nodiscard]] static TMethod Of(T* AObject) noexcept {
     using TOwner = typename detail::TOwnerOf<decltype(AMethod), T>::type;
-    TMethod Result;
-    Result.FOps = &TBound<AMethod, TOwner>::Ops;
-    Result.FData = const_cast<std::remove_const_t<TOwner>*>(static_cast<TOwner*>(AObject));
-    return Result;
+    return {TBound<AMethod, TOwner>::Ops, const_cast<std::remove_const_t<TOwner>*>(static_cast<TOwner*>(AObject))};
   }
 
-  TMethod(const TMethod& AOther) noexcept : FOps(AOther.FOps), FData(AOther.FData) {
-    if (FOps != nullptr && FOps->Share != nullptr) FOps->Share(FData, 1);
-  }
+  TMethod(const TMethod& AOther) noexcept : TMethod(*AOther.FOps, AOther.FData) {}
   TMethod(TMethod&& AOther) noexcept
-      : FOps(std::exchange(AOther.FOps, nullptr)), FData(std::exchange(AOther.FData, nullptr)) {}
+      : FOps(std::exchange(AOther.FOps, &cUnset)), FData(std::exchange(AOther.FData, nullptr)) {}
   TMethod& operator=(TMethod AOther) noexcept {
     std::swap(FOps, AOther.FOps);
     std::swap(FData, AOther.FData);
     return *this;
   }
   ~TMethod() {
-    if (FOps != nullptr && FOps->Share != nullptr) FOps->Share(FData, -1);
+    if (FOps->Share != nullptr) FOps->Share(FData, -1);
   }
 
-  R operator()(TArgs... AArgs) const {
-    const TMethod Kept = *this;  // the call may overwrite or free the field it was made through
-    if (Kept.FOps == nullptr) throw std::bad_function_call();
-    return Kept.FOps->Call(Kept.FData, std::forward<TArgs>(AArgs)...);
-  }
-  explicit operator bool() const noexcept { return FOps != nullptr; }
+  /// The field that it is made through may be overwritten or freed by the call.
+  R operator()(TArgs... AArgs) const { return FOps->Call(FData, std::forward<TArgs>(AArgs)...); }
+  explicit operator bool() const noexcept { return FOps->Id != nullptr; }
   /// The object that the method is bound to; nullptr for any other callable.
-  [[nodiscard]] TObject* Object() const noexcept {
-    return FOps == nullptr || FOps->Object == nullptr ? nullptr : FOps->Object(FData);
-  }
+  [[nodiscard]] TObject* Object() const noexcept { return FOps->Object == nullptr ? nullptr : FOps->Object(FData); }
   friend bool operator==(const TMethod& A, const TMethod& B) noexcept {
-    if (A.FData != B.FData || A.FOps == nullptr || B.FOps == nullptr) return A.FOps == B.FOps && A.FData == B.FData;
+    if (A.FData != B.FData || !A || !B) return A.FData == B.FData && !A && !B;
     return *A.FOps->Id == *B.FOps->Id;  // each library may have a FOps of its own for one method
   }
 
@@ -101,7 +91,7 @@ class TMethod<R(TArgs...)> {
     R (*Call)(void*, TArgs...);
     void (*Share)(void*, int);  // adds to the count of a shared callable, which goes at 0
     TObject* (*Object)(void*);
-    const std::type_info* Id;
+    const std::type_info* Id;  // nullptr: unset
   };
 
   template <auto AMethod, class T>
@@ -122,6 +112,7 @@ class TMethod<R(TArgs...)> {
   struct TShared {
     explicit TShared(TCallable ACallable) : Callable(std::move(ACallable)) {}
     static R Call(void* AData, TArgs... AArgs) {
+      const TMethod Kept(Ops, AData);
       return detail::Invoke<R>(static_cast<TShared*>(AData)->Callable, std::forward<TArgs>(AArgs)...);
     }
     static void Share(void* AData, int ABy) {
@@ -133,7 +124,14 @@ class TMethod<R(TArgs...)> {
     std::atomic<int> Count = 1;
   };
 
-  const TOps* FOps = nullptr;
+  TMethod(const TOps& AOps, void* AData) noexcept : FOps(&AOps), FData(AData) {
+    if (FOps->Share != nullptr) FOps->Share(FData, 1);
+  }
+
+  [[noreturn]] static R Raise(void*, TArgs...) { throw std::bad_function_call(); }
+  static constexpr TOps cUnset{&Raise, nullptr, nullptr, nullptr};
+
+  const TOps* FOps = &cUnset;
   void* FData = nullptr;
 };
 
