@@ -81,7 +81,8 @@ class TZqTextParserCallback {
     FIsOwn = false;
     return *this;
   }
-  operator const TCallback&() const noexcept ZQ_LIFETIMEBOUND { return FCallback; }
+  /// What it leads to, to be kept or called by another.
+  [[nodiscard]] const TCallback& Callback() const noexcept ZQ_LIFETIMEBOUND { return FCallback; }
   decltype(auto) operator()() const { return FIsOwn ? TOwn::Run(*FParser) : FCallback(); }
 
  private:
