@@ -243,11 +243,10 @@ class ZQ_API TZqZLibDecompressionStream : public TZqZLibStream {
   Integer Write(const void* ABuffer, Integer ACount) override;
   /// The bytes delivered so far, after this has moved:
   ///   soBeginning 0     begins anew at position 0 of ASource, wherever that stood at first
-  ///   soBeginning other reads and drops up to there; nothing for a target that has been passed; raises for the
-  ///   position
-  ///                     at which it stands
+  ///   soBeginning other reads and drops up to there; nothing for a target that has been passed
   ///   soCurrent         reads and drops AOffset bytes, 0 or more
   ///   soEnd 0           reads and drops all
+  /// With soBeginning the position where it stands, but 0, is an invalid operation.
   /// EReadError where the data ends before.
   Int64 Seek(Int64 AOffset, TSeekOrigin AOrigin) override;
   using TZqZLibStream::Seek;
