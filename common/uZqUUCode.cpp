@@ -35,7 +35,7 @@ std::size_t ReadBlock(TStream& ASource, Byte* ABuffer, std::size_t ACount) {
     if (Got <= 0) break;
     Result += static_cast<std::size_t>(Got);
   }
-  if (Result < ACount && ASource.Position() < ASource.Size()) throw EReadError(u"Stream read error");
+  if (Result < ACount) ASource.RequireEnd();
   return Result;
 }
 

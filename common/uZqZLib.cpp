@@ -418,6 +418,10 @@ void TZqZLibDecompressionStream::DropAll() {
   }
 }
 
+void TZqZLibDecompressionStream::RequireEnd() {
+  if (!FAtEnd) throw EReadError(u"Stream read error");
+}
+
 Int64 TZqZLibDecompressionStream::GetSize() {
   RequireSeek();
   const Int64 Saved = Position();
@@ -460,6 +464,7 @@ void ZlCompressStream(TStream* ASource, TStream* ADest, TZqZLibCompressionLevel 
   Prepare(ASource, ADest, AResetPos);
   TZqZLibCompressionStream Stream(ADest, ACompressionLevel);
   Stream.CopyFrom(*ASource, -1, cCopyBufferSize);
+  ASource->RequireEnd();
   Stream.Finish();
 }
 

@@ -252,6 +252,8 @@ class ZQ_API TZqZLibDecompressionStream : public TZqZLibStream {
   using TZqZLibStream::Seek;
   /// Found by decompressing all, from position 0 of ASource again then, up to where it stood.
   [[nodiscard]] Int64 GetSize() override;
+  /// By AtEnd, without decompressing anything.
+  void RequireEnd() override;
 
  private:
   struct TByFirstByte {};
@@ -273,7 +275,8 @@ class ZQ_API TZqZLibDecompressionStream : public TZqZLibStream {
 // Streams stay the caller's and are two (EAssertionFailed). With AResetPos ASource is put to position 0 first. They
 // raise what the classes above and the streams raise; what has been written to ADest before stays there.
 
-/// What is left of ASource, to ADest in the zlib format. Where ASource raises, what came of it is completed in ADest.
+/// What is left of ASource, to ADest in the zlib format. Where ASource raises, or gives less than it has (EReadError),
+/// what came of it is completed in ADest.
 ZQ_API void ZlCompressStream(
     TStream* ASource, TStream* ADest, TZqZLibCompressionLevel ACompressionLevel, bool AResetPos);
 /// The text in the process's code page, which may not have all of its characters.

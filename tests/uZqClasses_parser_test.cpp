@@ -136,6 +136,7 @@ TEST(TextParser, LooksAheadWithoutAMove) {
     Result +=
         std::to_string(Ahead - AParser.CurPos()) + '|' + std::to_string(AParser.SelectedCnt(tpMarkPos1, tpPeekPos));
     EXPECT_TRUE(Counters(AParser) == Before && AParser.PrevCharA() == 'a' && AParser.GetPos(tpPeekPos) == nullptr);
+    EXPECT_TRUE(AParser.SrcPeekNext(0) == AParser.CurPos() && *AParser.SrcPeekNext(4) == ' ');
     EXPECT_EQ(RaisedBy([&] { AParser.SrcPeekNext(6); }), u"EZqTextParserEOF: Unexpected EOF");
     EXPECT_EQ(Counters(AParser), Before);
     return Result;
@@ -319,6 +320,15 @@ TEST(TextParser, WalksMemoryInPlaceAndFilesFromTheirPosition) {
   EXPECT_TRUE(InOther.CurPos() == static_cast<Byte*>(Other.Buffer()) + 1 && Other.Position() == 3);
   TZqTextParser AtTheEnd(&Memory, false, 1252);
   EXPECT_TRUE(AtTheEnd.Eof() && AtTheEnd.GetEOF());
+}
+
+TEST(TextParser, GivesBytesOfSingleByteTextAsTheyAre) {
+  const TAnsiCodePageScope Ansi(1252);
+  TZqTextParser Parser = TZqTextParser::WrapMem("\x82\x82", 2, 437);
+  EXPECT_TRUE(Parser.CurrCharA() == '\x82' && Parser.CurrCharW() == u'é' && Parser.PeekCharA() == '\x82');
+  EXPECT_EQ(Parser.PeekStringA(1) + Parser.SelectedA(tpCurPos, tpPeekPos, false), "\x82\x82");
+  Parser.SetContentCodePage(1252);
+  EXPECT_EQ(Parser.ReadCharW(), u'\u201A');
 }
 
 TEST(TextParser, CallsWhatIsAssignedToItsFields) {

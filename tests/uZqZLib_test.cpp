@@ -170,7 +170,10 @@ TEST(Deflate, OneCallTellsTheFormatByTheFirstByteAndBeginsAtTheStart) {
   ZlStringToCompressedStream(u"text", &Zipped, clLevel1);
   EXPECT_EQ(Inflated(Zipped), "text");
   Zipped.SetSize(3), Zipped.SetPosition(0);
-  EXPECT_FALSE(ZlDecompressStream(&Zipped, std::make_unique<TMemoryStream>().get(), false));  // cut
+  TMemoryStream Dest;
+  EXPECT_FALSE(ZlDecompressStream(&Zipped, &Dest, false));  // cut
+  TZqZLibDecompressionStream Cut(&Zipped);
+  EXPECT_EQ(RaisedBy([&] { ZlCompressStream(&Cut, &Dest, clMax, false); }), u"EReadError: Stream read error");
 }
 
 TEST(Deflate, ZlibsOwnFunctionsTakeTheConstantsOfTheLibrary) {

@@ -195,8 +195,7 @@ void TZqTextParser::ReadBytes(NativeUInt ACount) {
     FBufEnd += Came;
     ACount -= static_cast<NativeUInt>(Came);
   }
-  // A stream may have become shorter; one that doesn't give what it has has failed.
-  if (ACount > 0 && FStream->Position() < FStream->Size()) throw EReadError(u"Stream read error");
+  if (ACount > 0) FStream->RequireEnd();  // a stream may have become shorter
 }
 
 void TZqTextParser::GetNextChunk() {

@@ -49,6 +49,10 @@ void TStream::ReadBuffer(void* ABuffer, Int64 ACount) {
   }
 }
 
+void TStream::RequireEnd() {
+  if (Position() < Size()) throw EReadError(u"Stream read error");
+}
+
 void TStream::WriteBuffer(const void* ABuffer, Int64 ACount) {
   const auto* Source = static_cast<const Byte*>(ABuffer);
   while (ACount > 0) {

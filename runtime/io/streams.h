@@ -45,6 +45,9 @@ class ZQ_API TStream : public TObject {
   void ReadBuffer(void* ABuffer, Int64 ACount);
   /// All ACount bytes, or EWriteError.
   void WriteBuffer(const void* ABuffer, Int64 ACount);
+  /// For who has read until nothing came: raises EReadError where more should have come, because 0 bytes also stand for
+  /// a refusal. A stream that can't seek tells no end, and nothing is raised.
+  virtual void RequireEnd();
   /// Copies ACount bytes from ASource's position on, which must be there (EReadError); 0: all of ASource from its
   /// start, if it can seek; negative: whatever is left of it. Returns the number. ABufferSize is the size of the steps.
   Int64 CopyFrom(TStream& ASource, Int64 ACount = 0, Integer ABufferSize = 0x100000);
